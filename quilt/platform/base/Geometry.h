@@ -1,0 +1,29 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+namespace quilt::platform {
+
+struct Size {
+  double width = 0;
+  double height = 0;
+  bool operator==(const Size&) const = default;
+};
+
+/// Origin at the lower left, y growing upwards.
+struct Rect {
+  double x = 0;
+  double y = 0;
+  double width = 0;
+  double height = 0;
+  bool operator==(const Rect&) const = default;
+};
+
+/// The largest size with the aspect ratio of `size` that fits inside `container`; also enlarges.
+/// An empty size gives an empty size.
+Size FDYFitSizeToSize(Size size, Size container);
+
+/// The largest centred part of an image of `size` that has the aspect ratio of `container`.
+/// An empty size gives an empty rectangle.
+Rect FDYFillSizeToSize(Size size, Size container);
+
+}  // namespace quilt::platform

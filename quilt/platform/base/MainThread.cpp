@@ -1,0 +1,134 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "quilt/platform/base/MainThread.h"
+
+#include <algorithm>
+#include <atomic>
+#include <condition_variable>
+#include <deque>
+#include <exception>
+#include <mutex>
+#include <vector>
+
+namespace quilt::platform {
+
+namespace {
+
+// Lives on the stack of the thread that waits for it.
+struct QueuedBlock {
+  const std::function<void()>* block;
+  ThreadIdentity caller;
+  std::exception_ptr thrown;
+  bool done = false;
+};
+
+struct Queue {
+  std::mutex mutex;
+  std::condition_variable mainMayRun;
+  std::condition_variable blockDone;
+  std::deque<QueuedBlock*> blocks;
+  bool signalled = false;
+  std::function<void()> wake;
+};
+
+// Never destroyed: a worker may still be leaving performBlock while the process ends.
+Queue& queue() {
+  static Queue& instance = *new Queue;
+  return instance;
+}
+
+std::atomic<ThreadIdentity> mainIdentity{currentThreadIdentity()};
+
+// The threads whose blocks the main thread is running now, innermost last. Touched by the main thread alone.
+std::vector<ThreadIdentity>& actingFor() {
+  static std::vector<ThreadIdentity>& stack = *new std::vector<ThreadIdentity>;
+  return stack;
+}
+
+void run(QueuedBlock& queued) {
+  actingFor().push_back(queued.caller);
+  try {
+    (*queued.block)();
+  } catch (...) {
+    queued.thrown = std::current_exception();
+  }
+  actingFor().pop_back();
+  {
+    const std::lock_guard guard(queue().mutex);
+    queued.done = true;
+  }
+  queue().blockDone.notify_all();
+}
+
+// Blocks queued while these run wait for the next call, so that a busy worker cannot keep the main thread here.
+void runBatch(std::unique_lock<std::mutex>& lock) {
+  std::deque<QueuedBlock*> batch;
+  batch.swap(queue().blocks);
+  lock.unlock();
+  for (QueuedBlock* queued : batch) run(*queued);
+  lock.lock();
+}
+
+}  // namespace
+
+ThreadIdentity currentThreadIdentity() {
+  thread_local const char identity = 0;
+  return &identity;
+}
+
+void MainThread::adopt() { mainIdentity = currentThreadIdentity(); }
+
+bool MainThread::isCurrent() { return mainIdentity == currentThreadIdentity(); }
+
+void MainThread::performBlock(const std::function<void()>& block) {
+  if (isCurrent()) {
+    block();
+    return;
+  }
+  QueuedBlock queued{&block, currentThreadIdentity(), nullptr};
+  std::function<void()> wake;
+  {
+    const std::lock_guard guard(queue().mutex);
+    queue().blocks.push_back(&queued);
+    wake = queue().wake;
+  }
+  queue().mainMayRun.notify_all();
+  if (wake) wake();
+  {
+    std::unique_lock lock(queue().mutex);
+    queue().blockDone.wait(lock, [&queued] { return queued.done; });
+  }
+  if (queued.thrown) std::rethrow_exception(queued.thrown);
+}
+
+void MainThread::setWakeFunction(std::function<void()> wake) {
+  const std::lock_guard guard(queue().mutex);
+  queue().wake = std::move(wake);
+}
+
+void MainThread::runQueuedBlocks() {
+  std::unique_lock lock(queue().mutex);
+  runBatch(lock);
+}
+
+void MainThread::waitAndRunQueuedBlocks() {
+  std::unique_lock lock(queue().mutex);
+  queue().mainMayRun.wait(lock, [] { return queue().signalled || !queue().blocks.empty(); });
+  queue().signalled = false;
+  runBatch(lock);
+}
+
+void MainThread::signal() {
+  {
+    const std::lock_guard guard(queue().mutex);
+    queue().signalled = true;
+  }
+  queue().mainMayRun.notify_all();
+}
+
+bool MainThread::isActingFor(ThreadIdentity thread) {
+  return std::find(actingFor().begin(), actingFor().end(), thread) != actingFor().end();
+}
+
+void performBlockOnMainThread(const std::function<void()>& block) { MainThread::performBlock(block); }
+
+}  // namespace quilt::platform

@@ -1,0 +1,105 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "quilt/platform/base/Object.h"
+
+#include <algorithm>
+#include <string>
+
+#include "quilt/platform/base/MainThread.h"
+#include "quilt/platform/base/RecursiveMonitor.h"
+
+namespace quilt::platform {
+
+struct Observation::Entry {
+  Entry(std::string_view observedKey, ChangeObserver changeObserver, ObservationOptions observationOptions)
+      : key(observedKey), observer(std::move(changeObserver)), options(observationOptions) {}
+
+  const std::string key;
+  const ChangeObserver observer;
+  const ObservationOptions options;
+  RecursiveMonitor monitor;  // held while the observer runs
+  bool active = true;        // guarded by the monitor
+};
+
+struct Observation::Registry {
+  std::mutex mutex;
+  std::vector<std::shared_ptr<Entry>> entries;
+};
+
+Observation::Observation(std::weak_ptr<Registry> registry, std::shared_ptr<Entry> entry)
+    : _registry(std::move(registry)), _entry(std::move(entry)) {}
+
+Observation& Observation::operator=(Observation&& other) noexcept {
+  reset();
+  _registry = std::move(other._registry);
+  _entry = std::move(other._entry);
+  return *this;
+}
+
+void Observation::reset() {
+  const std::shared_ptr<Entry> entry = std::move(_entry);
+  if (!entry) return;
+  if (const auto registry = _registry.lock()) {
+    const std::lock_guard guard(registry->mutex);
+    std::erase(registry->entries, entry);
+  }
+  const MonitorLock lock(entry->monitor);
+  entry->active = false;
+}
+
+Observation Object::observe(std::string_view key, ChangeObserver observer, ObservationOptions options) {
+  auto entry = std::make_shared<Observation::Entry>(key, std::move(observer), options);
+  std::shared_ptr<Observation::Registry> registry;
+  {
+    const std::lock_guard guard(_mutex);
+    if (!_registry) _registry = std::make_shared<Observation::Registry>();
+    registry = _registry;
+  }
+  const std::lock_guard guard(registry->mutex);
+  registry->entries.push_back(entry);
+  return {registry, std::move(entry)};
+}
+
+bool Object::isObserved(std::string_view key) const {
+  std::shared_ptr<Observation::Registry> registry;
+  {
+    const std::lock_guard guard(_mutex);
+    registry = _registry;
+  }
+  if (!registry) return false;
+  const std::vector<std::string_view> dependents = keysDependingOn(key);
+  const std::lock_guard guard(registry->mutex);
+  return std::any_of(registry->entries.begin(), registry->entries.end(), [&](const auto& entry) {
+    return entry->key == key || std::find(dependents.begin(), dependents.end(), entry->key) != dependents.end();
+  });
+}
+
+void Object::performBlockOnMainThread(const std::function<void()>& block) { MainThread::performBlock(block); }
+
+std::vector<std::string_view> Object::keysDependingOn(std::string_view) const { return {}; }
+
+void Object::announce(std::string_view key, ChangePhase phase) {
+  std::shared_ptr<Observation::Registry> registry;
+  {
+    const std::lock_guard guard(_mutex);
+    registry = _registry;
+  }
+  if (!registry) return;
+  notify(*registry, key, phase);
+  for (const std::string_view dependent : keysDependingOn(key)) notify(*registry, dependent, phase);
+}
+
+void Object::notify(Observation::Registry& registry, std::string_view key, ChangePhase phase) {
+  std::vector<std::shared_ptr<Observation::Entry>> listeners;
+  {
+    const std::lock_guard guard(registry.mutex);
+    for (const auto& entry : registry.entries)
+      if (entry->key == key && (phase == ChangePhase::Did || entry->options == ObservationOptions::Prior))
+        listeners.push_back(entry);
+  }
+  for (const auto& entry : listeners) {
+    const MonitorLock lock(entry->monitor);
+    if (entry->active) entry->observer(ChangeNotice{*this, key, phase});
+  }
+}
+
+}  // namespace quilt::platform

@@ -1,0 +1,54 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <functional>
+#include <memory>
+#include <string_view>
+
+namespace quilt::platform {
+
+class Object;
+
+enum class ChangePhase {
+  Will,  ///< before the value changes
+  Did,   ///< after it changed
+};
+
+/// Which announcements an observer wants.
+enum class ObservationOptions {
+  None,   ///< after each change
+  Prior,  ///< before and after each change
+};
+
+struct ChangeNotice {
+  Object& object;        ///< the object that changes
+  std::string_view key;  ///< the observed key
+  ChangePhase phase;
+};
+
+/// Called on the thread that changes the value: the setting thread for a property, the main thread for a list.
+using ChangeObserver = std::function<void(const ChangeNotice&)>;
+
+/// An observation that ends with the handle. After reset() or destruction the observer is not running on any other
+/// thread and will not run again; it may end itself from inside its own notice. The observed object may die first.
+class [[nodiscard]] Observation {
+ public:
+  Observation() = default;
+  Observation(Observation&&) noexcept = default;
+  Observation& operator=(Observation&& other) noexcept;
+  ~Observation() { reset(); }
+
+  void reset();
+  explicit operator bool() const { return _entry != nullptr; }
+
+ private:
+  friend class Object;
+  struct Entry;
+  struct Registry;
+  Observation(std::weak_ptr<Registry> registry, std::shared_ptr<Entry> entry);
+
+  std::weak_ptr<Registry> _registry;
+  std::shared_ptr<Entry> _entry;
+};
+
+}  // namespace quilt::platform

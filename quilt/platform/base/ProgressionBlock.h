@@ -1,0 +1,29 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <functional>
+#include <memory>
+
+namespace quilt::platform {
+
+/// Called by a long operation, on the thread that runs it, with the percentage done (0 to 100).
+/// Answers true to go on, false to cancel. An empty block is never called and always goes on.
+using ProgressionBlock = std::function<bool(double percentage)>;
+
+/// The two-argument form of the loaders and the preview walk: the object just handled, or null, and the percentage.
+template <class T>
+using ObjectProgressionBlock = std::function<bool(const std::shared_ptr<T>& object, double percentage)>;
+
+inline bool report(const ProgressionBlock& block, double percentage) { return !block || block(percentage); }
+
+template <class T>
+bool report(const ObjectProgressionBlock<T>& block, const std::shared_ptr<T>& object, double percentage) {
+  return !block || block(object, percentage);
+}
+
+/// (done × 100) / total in unsigned integer arithmetic, the percentage of a walk over `total` steps; total is not 0.
+inline double integerPercentage(std::size_t done, std::size_t total) {
+  return static_cast<double>(done * 100 / total);
+}
+
+}  // namespace quilt::platform

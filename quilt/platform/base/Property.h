@@ -1,0 +1,60 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <memory>
+#include <mutex>
+#include <string_view>
+#include <utility>
+
+#include "quilt/platform/base/Object.h"
+
+namespace quilt::platform {
+
+/// One observable value of an object. Each get and each set is indivisible; every set announces its key, before and
+/// after, on the setting thread and with no lock held, also when the value stays the same.
+template <class T>
+class Property {
+ public:
+  /// `key` is a literal: it is kept by reference.
+  Property(Object& owner, std::string_view key, T value = T{}) : _owner(owner), _key(key), _value(std::move(value)) {}
+  Property(const Property&) = delete;
+  Property& operator=(const Property&) = delete;
+
+  [[nodiscard]] T get() const {
+    const std::lock_guard guard(_owner._mutex);
+    return _value;
+  }
+
+  void set(T value) {
+    _owner.willChangeValueForKey(_key);
+    store(std::move(value));
+    _owner.didChangeValueForKey(_key);
+  }
+
+  /// Sets the value without an announcement, for a cache that fills itself.
+  void store(T value) {
+    // The old value, now in the parameter, dies after the guard: its destructor may announce.
+    const std::lock_guard guard(_owner._mutex);
+    std::swap(_value, value);
+  }
+
+ private:
+  Object& _owner;
+  const std::string_view _key;
+  T _value;
+};
+
+/// A back-pointer that never keeps its owner alive.
+template <class T>
+class WeakProperty {
+ public:
+  WeakProperty(Object& owner, std::string_view key) : _reference(owner, key) {}
+
+  [[nodiscard]] std::shared_ptr<T> get() const { return _reference.get().lock(); }
+  void set(const std::shared_ptr<T>& value) { _reference.set(value); }
+
+ private:
+  Property<std::weak_ptr<T>> _reference;
+};
+
+}  // namespace quilt::platform

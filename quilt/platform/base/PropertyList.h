@@ -1,0 +1,115 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <utility>
+#include <variant>
+#include <vector>
+
+#include "quilt/platform/base/Date.h"
+
+namespace quilt::platform {
+
+class PropertyList;
+
+using Array = std::vector<PropertyList>;
+using Data = std::vector<std::uint8_t>;
+
+/// A property-list dictionary that keeps its keys in the order in which they were first set.
+/// Look-up is linear: records have a dozen keys.
+class Dictionary {
+ public:
+  using Entry = std::pair<std::string, PropertyList>;
+  using const_iterator = std::vector<Entry>::const_iterator;
+
+  Dictionary();
+  Dictionary(std::initializer_list<Entry> entries);
+  ~Dictionary();
+  Dictionary(const Dictionary&);
+  Dictionary(Dictionary&&) noexcept;
+  Dictionary& operator=(const Dictionary&);
+  Dictionary& operator=(Dictionary&&) noexcept;
+
+  /// Replaces the value of a key in its place, or appends the key.
+  void set(std::string key, PropertyList value);
+  /// Appends without looking for the key; the caller knows that it is not there.
+  void append(std::string key, PropertyList value);
+  void remove(std::string_view key);
+
+  /// The value of a key, or null. Valid until the dictionary changes.
+  [[nodiscard]] const PropertyList* find(std::string_view key) const;
+  [[nodiscard]] bool contains(std::string_view key) const { return find(key) != nullptr; }
+
+  /// The value of a key when it is there and of the wanted kind; otherwise none or null.
+  /// A real answers as an integer too, cut toward zero, when it is in range; a whole number answers as a real.
+  [[nodiscard]] std::optional<std::string> string(std::string_view key) const;
+  [[nodiscard]] std::optional<std::int64_t> integer(std::string_view key) const;
+  [[nodiscard]] std::optional<double> real(std::string_view key) const;
+  [[nodiscard]] std::optional<bool> boolean(std::string_view key) const;
+  [[nodiscard]] std::optional<Date> date(std::string_view key) const;
+  [[nodiscard]] const Array* array(std::string_view key) const;
+  [[nodiscard]] const Dictionary* dictionary(std::string_view key) const;
+
+  [[nodiscard]] std::size_t size() const;
+  [[nodiscard]] bool empty() const { return size() == 0; }
+  [[nodiscard]] const_iterator begin() const;
+  [[nodiscard]] const_iterator end() const;
+
+  /// Equal when both hold the same keys in the same order with equal values.
+  bool operator==(const Dictionary& other) const;
+
+ private:
+  std::vector<Entry> _entries;
+};
+
+/// One value of a property list. Booleans, whole numbers and reals are kinds of their own, and stay what they are
+/// through a file.
+class PropertyList {
+ public:
+  using Value = std::variant<bool, std::int64_t, double, std::string, Date, Data, Array, Dictionary>;
+
+  PropertyList(bool value) : _value(value) {}                        // NOLINT(google-explicit-constructor)
+  PropertyList(int value) : _value(std::int64_t{value}) {}           // NOLINT(google-explicit-constructor)
+  PropertyList(std::int64_t value) : _value(value) {}                // NOLINT(google-explicit-constructor)
+  PropertyList(double value) : _value(value) {}                      // NOLINT(google-explicit-constructor)
+  PropertyList(const char* value) : _value(std::string(value)) {}    // NOLINT(google-explicit-constructor)
+  PropertyList(std::string value) : _value(std::move(value)) {}      // NOLINT(google-explicit-constructor)
+  PropertyList(Date value) : _value(value) {}                        // NOLINT(google-explicit-constructor)
+  PropertyList(Data value) : _value(std::move(value)) {}             // NOLINT(google-explicit-constructor)
+  PropertyList(Array value) : _value(std::move(value)) {}            // NOLINT(google-explicit-constructor)
+  PropertyList(Dictionary value) : _value(std::move(value)) {}       // NOLINT(google-explicit-constructor)
+
+  /// The value as a kind, or null when it is of another.
+  template <class T>
+  [[nodiscard]] const T* as() const { return std::get_if<T>(&_value); }
+  template <class T>
+  [[nodiscard]] T* as() { return std::get_if<T>(&_value); }
+
+  [[nodiscard]] const Value& value() const { return _value; }
+
+  bool operator==(const PropertyList&) const = default;
+
+ private:
+  Value _value;
+};
+
+/// A copy of the entries of `record` whose keys are not among `known`: what a newer version of the system wrote, to be
+/// written back untouched.
+template <class Keys>
+Dictionary entriesBeyond(const Keys& known, const Dictionary& record) {
+  Dictionary rest;
+  for (const auto& [key, value] : record) {
+    bool isKnown = false;
+    for (const auto& name : known) isKnown = isKnown || key == name;
+    if (!isKnown) rest.append(key, value);
+  }
+  return rest;
+}
+
+/// Appends every entry of `rest` to `record`.
+void appendAll(Dictionary& record, const Dictionary& rest);
+
+}  // namespace quilt::platform

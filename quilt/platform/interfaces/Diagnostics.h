@@ -1,0 +1,24 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <string>
+#include <vector>
+
+namespace quilt::platform {
+
+/// One decoder, encoder, renderer or library, as the program's `doctor` lists it.
+struct Capability {
+  std::string name;     ///< "H.264 decoder"
+  bool present = false;
+  std::string version;  ///< of the library behind it; empty when absent
+  std::string remedy;   ///< what to do when it is absent; empty when present
+};
+
+/// What this build and this machine can do.
+class Diagnostics {
+ public:
+  virtual ~Diagnostics() = default;
+  [[nodiscard]] virtual std::vector<Capability> capabilities() const = 0;
+};
+
+}  // namespace quilt::platform

@@ -1,0 +1,110 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstdint>
+#include <filesystem>
+#include <memory>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "quilt/platform/base/Date.h"
+#include "quilt/platform/base/Result.h"
+
+namespace quilt::platform {
+
+enum class FileKind { Missing, File, Folder, Other };
+
+/// What tells one state of a file from another without reading it.
+struct FileIdentity {
+  std::uint64_t device = 0;
+  std::uint64_t inode = 0;
+  std::uint64_t size = 0;
+  std::int64_t changed = 0;  ///< change time in nanoseconds since 1970
+  bool operator==(const FileIdentity&) const = default;
+};
+
+struct FileAttributes {
+  FileKind kind = FileKind::Missing;
+  std::uint64_t size = 0;  ///< bytes
+  Date modified;
+  FileIdentity identity;
+};
+
+enum class CopyStage { Start, Progress, Finish, Error };
+enum class CopyAnswer { Continue, Quit };
+
+/// What a copy callback may ask about the copy under way.
+struct CopyState {
+  std::int64_t copiedBytes = 0;
+};
+
+/// Called while a file is copied: once with Start, with Progress after each stretch of data (never for an empty file),
+/// once with Finish; with Error when reading or writing failed. `what` is 0. Quit stops the copy.
+using CopyCallback = CopyAnswer (*)(int what, CopyStage stage, const CopyState& state,
+                                    const std::filesystem::path& source, const std::filesystem::path& destination,
+                                    void* context);
+
+/// An exclusive lock on a file, given up by the destructor or the end of the process.
+class FileLock {
+ public:
+  virtual ~FileLock() = default;
+};
+
+/// The file system. Paths are absolute. Every operation may be called on any thread; none leaves a partial result
+/// under a final name. Errors carry the file and a sentence for people.
+class FileManager {
+ public:
+  virtual ~FileManager() = default;
+
+  /// What is at the path, symbolic links followed; Missing also when a component cannot be searched.
+  [[nodiscard]] virtual FileKind kindOfItemAtPath(const std::filesystem::path& path) const = 0;
+  [[nodiscard]] bool fileExistsAtPath(const std::filesystem::path& path) const {
+    return kindOfItemAtPath(path) != FileKind::Missing;
+  }
+
+  /// Whether `path` lies below the folder `root` and reaches its item without any symbolic link on the way or at the
+  /// end. True also when nothing is there yet, as long as what is there is no link.
+  [[nodiscard]] virtual bool isConfined(const std::filesystem::path& path, const std::filesystem::path& root) const = 0;
+
+  [[nodiscard]] virtual Result<FileAttributes> attributesOfItemAtPath(const std::filesystem::path& path) const = 0;
+
+  /// Makes a folder with its missing parents. A folder that is there already is no error.
+  virtual Result<void> createDirectoryAtPath(const std::filesystem::path& path) = 0;
+
+  /// The names in a folder, one level, in the file system's order, without "." and "..".
+  [[nodiscard]] virtual Result<std::vector<std::string>> contentsOfDirectoryAtPath(
+      const std::filesystem::path& path) const = 0;
+
+  /// Copies a file or a folder with its content, symbolic links as links. Fails when something is at `destination`;
+  /// removes what it wrote when it fails.
+  virtual Result<void> copyItem(const std::filesystem::path& source, const std::filesystem::path& destination) = 0;
+
+  /// Renames, or copies and deletes across file systems. Fails when something is at `destination`.
+  virtual Result<void> moveItem(const std::filesystem::path& source, const std::filesystem::path& destination) = 0;
+
+  /// Deletes a file or a folder with its content, links not followed. Refuses, as Unsafe, an item that does not lie
+  /// below the folder `within` or that is reached through a link.
+  virtual Result<void> removeItem(const std::filesystem::path& path, const std::filesystem::path& within) = 0;
+
+  /// Copies one file, or a folder with its content, keeping permissions, times and extended attributes: shares the
+  /// blocks where the file system can, else copies inside the kernel, else through a large buffer. Replaces a file at
+  /// `destination`. Answers 0, or a negative number when it failed or the callback answered Quit; what it wrote is then
+  /// removed.
+  virtual int copyfile(const std::filesystem::path& source, const std::filesystem::path& destination,
+                       CopyCallback callback, void* context) = 0;
+
+  /// The whole file. Fails as Damaged when it is longer than `maximum` bytes.
+  [[nodiscard]] virtual Result<std::string> readFile(const std::filesystem::path& path, std::uint64_t maximum) const = 0;
+
+  /// Replaces the file whole: writes a hidden temporary file beside it, syncs, renames, syncs the folder. Whatever
+  /// happens, the path holds the old or the new content; the temporary file is removed on failure. Keeps the
+  /// permissions of the file that it replaces.
+  virtual Result<void> writeAtomically(const std::filesystem::path& path, std::string_view bytes) = 0;
+
+  /// Takes the lock without waiting, making the file when it is missing. `owner` is written into it for others to read.
+  /// Fails as Locked, with the holder's text in the message, while another process or lock holds it.
+  virtual Result<std::unique_ptr<FileLock>> lockFile(const std::filesystem::path& path, std::string_view owner) = 0;
+};
+
+}  // namespace quilt::platform

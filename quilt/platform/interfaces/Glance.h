@@ -1,0 +1,39 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <filesystem>
+#include <memory>
+#include <optional>
+#include <string>
+
+#include "quilt/platform/base/Url.h"
+#include "quilt/platform/interfaces/ImageWrapper.h"
+
+namespace quilt::platform {
+
+/// A page of a document: its picture and its text in reading order.
+struct DocumentPage {
+  std::shared_ptr<ImageWrapper> image;
+  std::string text;
+};
+
+/// The quick-preview service: a picture of any file, and the pages of documents.
+class Glance {
+ public:
+  virtual ~Glance() = default;
+
+  /// A picture that stands for the file, or null.
+  [[nodiscard]] virtual std::shared_ptr<ImageWrapper> thumbnailImageForURL(const Url& url) const = 0;
+  /// 0 for what is no document, cannot be opened or has no pages.
+  [[nodiscard]] virtual std::size_t documentPagesCount(const std::filesystem::path& path) const = 0;
+  /// None past the last page.
+  [[nodiscard]] virtual std::optional<DocumentPage> documentPageAtIndex(const std::filesystem::path& path,
+                                                                        std::size_t index) const = 0;
+};
+
+/// The installed service's operations.
+std::shared_ptr<ImageWrapper> FDYThumbnailImageForURL(const Url& url);
+std::size_t FDYPreviewDocumentPagesCount(const std::filesystem::path& path);
+std::optional<DocumentPage> FDYPreviewDocumentPageAtIndex(const std::filesystem::path& path, std::size_t index);
+
+}  // namespace quilt::platform

@@ -1,0 +1,80 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <memory>
+#include <utility>
+
+#include "quilt/platform/interfaces/Bundles.h"
+#include "quilt/platform/interfaces/Clock.h"
+#include "quilt/platform/interfaces/Diagnostics.h"
+#include "quilt/platform/interfaces/FDYArchive.h"
+#include "quilt/platform/interfaces/FDYAudioPreview.h"
+#include "quilt/platform/interfaces/FDYMedia.h"
+#include "quilt/platform/interfaces/FDYMediaTranscoder.h"
+#include "quilt/platform/interfaces/FileManager.h"
+#include "quilt/platform/interfaces/Glance.h"
+#include "quilt/platform/interfaces/ImageWrapper.h"
+#include "quilt/platform/interfaces/MovieToolkit.h"
+#include "quilt/platform/interfaces/PropertyLists.h"
+#include "quilt/platform/interfaces/Resources.h"
+#include "quilt/platform/interfaces/RunLoop.h"
+#include "quilt/platform/interfaces/TypeIdentifiers.h"
+#include "quilt/platform/interfaces/UuidGenerator.h"
+
+namespace quilt::platform {
+
+/// One implementation of every operation that the model requires of the world. All are present in an installed set.
+struct Services {
+  std::shared_ptr<FileManager> files;
+  std::shared_ptr<PropertyLists> propertyLists;
+  std::shared_ptr<UuidGenerator> uuids;
+  std::shared_ptr<Clock> clock;
+  std::shared_ptr<Resources> resources;
+  std::shared_ptr<TypeIdentifiers> types;
+  std::shared_ptr<MediaInspector> inspector;
+  std::shared_ptr<Images> images;
+  std::shared_ptr<MovieToolkit> movies;
+  std::shared_ptr<FDYAudioPreview> audioPreview;
+  std::shared_ptr<FDYMediaTranscoder> transcoder;
+  std::shared_ptr<FDYArchive> archive;
+  std::shared_ptr<Glance> glance;
+  std::shared_ptr<Bundles> bundles;
+  std::shared_ptr<RunLoop> runLoop;
+  std::shared_ptr<Diagnostics> diagnostics;
+};
+
+/// The process's set. Written by installServices and ScopedService only.
+const Services& services();
+
+/// Replaces the whole set. While no other thread uses the library.
+void installServices(Services set);
+
+/// Replaces one service for the life of the object, while no other thread uses the library:
+///
+///     ScopedService files(&Services::files, std::make_shared<FailingFiles>());
+template <class T>
+class [[nodiscard]] ScopedService {
+ public:
+  ScopedService(std::shared_ptr<T> Services::*member, std::shared_ptr<T> service)
+      : _member(member), _previous(services().*member) {
+    replace(std::move(service));
+  }
+  ScopedService(const ScopedService&) = delete;
+  ScopedService& operator=(const ScopedService&) = delete;
+  ~ScopedService() { replace(_previous); }
+
+ private:
+  void replace(std::shared_ptr<T> service) {
+    Services set = services();
+    set.*_member = std::move(service);
+    installServices(std::move(set));
+  }
+
+  std::shared_ptr<T> Services::*_member;
+  std::shared_ptr<T> _previous;
+};
+
+template <class T, class U>
+ScopedService(std::shared_ptr<T> Services::*, std::shared_ptr<U>) -> ScopedService<T>;
+
+}  // namespace quilt::platform
