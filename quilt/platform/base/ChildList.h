@@ -136,15 +136,7 @@ class ChildList {
 
   template <class Mutation>
   void change(const Mutation& mutation) {
-    if (!_owner.isObserved(_key)) {
-      mutation();
-      return;
-    }
-    Object::performBlockOnMainThread([&] {
-      _owner.willChangeValueForKey(_key);
-      mutation();
-      _owner.didChangeValueForKey(_key);
-    });
+    _owner.changeOnMainThread(_key, mutation);
   }
 
   Owner& _owner;

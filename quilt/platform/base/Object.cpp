@@ -73,6 +73,18 @@ bool Object::isObserved(std::string_view key) const {
   });
 }
 
+void Object::changeOnMainThread(std::string_view key, const std::function<void()>& mutation) {
+  if (!isObserved(key)) {
+    mutation();
+    return;
+  }
+  MainThread::performBlock([&] {
+    willChangeValueForKey(key);
+    mutation();
+    didChangeValueForKey(key);
+  });
+}
+
 void Object::performBlockOnMainThread(const std::function<void()>& block) { MainThread::performBlock(block); }
 
 std::vector<std::string_view> Object::keysDependingOn(std::string_view) const { return {}; }

@@ -33,6 +33,10 @@ class Object : public std::enable_shared_from_this<Object> {
   /// Whether anyone observes the key or a key that depends on it.
   [[nodiscard]] bool isObserved(std::string_view key) const;
 
+  /// Makes a change that observers see on the main thread: will-change, the mutation, did-change. When no one observes
+  /// the key, the mutation is made at once where it is.
+  void changeOnMainThread(std::string_view key, const std::function<void()>& mutation);
+
   /// Runs the block on the main thread and returns after it has run; at once when called there.
   static void performBlockOnMainThread(const std::function<void()>& block);
 

@@ -31,6 +31,17 @@ class Property {
     _owner.didChangeValueForKey(_key);
   }
 
+  /// Sets the value, with its announcements, and answers the old one; no other set comes between.
+  T exchange(T value) {
+    _owner.willChangeValueForKey(_key);
+    {
+      const std::lock_guard guard(_owner._mutex);
+      std::swap(_value, value);
+    }
+    _owner.didChangeValueForKey(_key);
+    return value;
+  }
+
   /// Sets the value without an announcement, for a cache that fills itself.
   void store(T value) {
     // The old value, now in the parameter, dies after the guard: its destructor may announce.

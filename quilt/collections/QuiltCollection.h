@@ -1,0 +1,141 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <set>
+
+#include "quilt/documents/QuiltDocument.h"
+
+namespace quilt {
+
+class QuiltCollectionsController;
+
+/// A folder of documents under one title and one set of default metadata. Owned by the controller, or free-standing.
+/// Any thread may call it; the document list has a recursive lock.
+///
+/// A collection saves itself: setting title, description, author, copyright, keywords, category, advisoryLabel,
+/// preferredTheme or lastPublishURL rewrites "collection.plist" at once, on the setting thread, unless it is loading.
+class QuiltCollection : public platform::Object {
+ public:
+  // Construction
+  /// A detached collection: fresh identity, made now, no folder.
+  static std::shared_ptr<QuiltCollection> init();
+  /// Opens the folder with its documents, or makes it when nothing is there. Null when that fails; the reason is logged.
+  static std::shared_ptr<QuiltCollection> initWithPath(const Path& path);
+
+  // Properties
+  std::string uuid() const { return _uuid.get(); }
+  void setUuid(std::string uuid) { _uuid.set(std::move(uuid)); }
+  Path path() const { return _path.get(); }
+  void setPath(Path path) { _path.set(std::move(path)); }
+  std::optional<Date> creationDate() const { return _creationDate.get(); }
+  void setCreationDate(std::optional<Date> date) { _creationDate.set(date); }
+  /// The later of the stored stamp and the latest document's; changes with the document list.
+  std::optional<Date> modifiedDate() const;
+  /// Sets the stored stamp.
+  void setModifiedDate(std::optional<Date> date) { _modifiedDate.set(date); }
+  Text title() const { return _title.get(); }
+  void setTitle(Text title) { _title.set(std::move(title)); }
+  Text description() const { return _description.get(); }
+  void setDescription(Text description) { _description.set(std::move(description)); }
+  /// New documents take it.
+  Text author() const { return _author.get(); }
+  void setAuthor(Text author) { _author.set(std::move(author)); }
+  Text copyright() const { return _copyright.get(); }
+  void setCopyright(Text copyright) { _copyright.set(std::move(copyright)); }
+  Text keywords() const { return _keywords.get(); }
+  void setKeywords(Text keywords) { _keywords.set(std::move(keywords)); }
+  Text category() const { return _category.get(); }
+  void setCategory(Text category) { _category.set(std::move(category)); }
+  Text advisoryLabel() const { return _advisoryLabel.get(); }
+  void setAdvisoryLabel(Text advisoryLabel) { _advisoryLabel.set(std::move(advisoryLabel)); }
+  /// New documents take it.
+  std::shared_ptr<QuiltTheme> preferredTheme() const { return _preferredTheme.get(); }
+  void setPreferredTheme(std::shared_ptr<QuiltTheme> theme) { _preferredTheme.set(std::move(theme)); }
+  Text lastPublishURL() const { return _lastPublishURL.get(); }
+  void setLastPublishURL(Text url) { _lastPublishURL.set(std::move(url)); }
+  std::shared_ptr<QuiltCollectionsController> collectionControllerOwner() const { return _collectionControllerOwner.get(); }
+  void setCollectionControllerOwner(const std::shared_ptr<QuiltCollectionsController>& owner) {
+    _collectionControllerOwner.set(owner);
+  }
+  bool isLoading() const { return _isLoading.get(); }
+  void setIsLoading(bool isLoading) { _isLoading.set(isLoading); }
+
+  // Poster image, kept in "poster.png" alone
+  /// Null while detached or without a poster.
+  std::shared_ptr<ImageWrapper> posterImage();
+  /// Writes or, with null, deletes the file. While detached it only clears the cache.
+  void setPosterImage(const std::shared_ptr<ImageWrapper>& image);
+  /// The file, when it exists; else empty.
+  Path posterImagePath() const;
+
+  // Loading and saving
+  Path _collectionFilepath() const;
+  Path _posterImageFilepath() const;
+  /// Reads the collection file. Never rewrites it.
+  bool loadDictionary();
+  /// Opens every document in the folder; what does not open is passed over.
+  bool _loadDocuments();
+  Dictionary dictionary() const;
+  /// Stamps and saves; true without saving while loading. False after a critical line.
+  bool update();
+  /// Whether modifiedDate and creationDate are a second or more apart.
+  bool hasBeenModified() const;
+  void resetModifiedDate();
+  void invalidateCaches();
+  /// {"documents"}.
+  static std::set<std::string> keyPathsForValuesAffectingModifiedDate();
+
+  // Documents
+  std::vector<std::shared_ptr<QuiltDocument>> documents() const { return _documents.copy(); }
+  void setDocuments(std::vector<std::shared_ptr<QuiltDocument>> documents) { _documents.assign(std::move(documents)); }
+  std::size_t documentsCount() const { return _documents.count(); }
+  std::shared_ptr<QuiltDocument> documentAtIndex(std::size_t index) const { return _documents.at(index); }
+  std::shared_ptr<QuiltDocument> documentWithUUID(const std::string& uuid) const;
+  /// Calls the block on each with the lock held; stops at the first false and answers false.
+  bool performBlockOnDocuments(const std::function<bool(const std::shared_ptr<QuiltDocument>&)>& block) const;
+  /// At most `count`, newest first.
+  std::vector<std::shared_ptr<QuiltDocument>> lastCreatedDocuments(std::size_t count) const;
+  void addDocument(const std::shared_ptr<QuiltDocument>& document);
+  /// Takes the document out of the list; with `andDelete` also deletes its package.
+  void removeDocument(const std::shared_ptr<QuiltDocument>& document, bool andDelete);
+  void removeAllDocumentsAndDelete(bool andDelete);
+  /// Deletes the packages of classic documents that hold no media.
+  void removeAllBrokenDocuments();
+  /// Makes and saves an empty document with the collection's author and theme. Null after a critical line.
+  std::shared_ptr<QuiltDocument> newDocumentWithType(const Text& type);
+  /// Makes a document of a file: inspects it, adds it as the one item, and copies it into the package. A file of a type
+  /// that cannot be imported gives an empty document. Null, after a critical line, on failure or when the block answers
+  /// false. Reports 10 to 100.
+  std::shared_ptr<QuiltDocument> importDocumentFromPath(const Path& path, const Text& withUUID,
+                                                        const ProgressionBlock& withProgressionBlock);
+  std::shared_ptr<QuiltDocument> importDocumentFromPath(const Path& path, const ProgressionBlock& withProgressionBlock);
+
+ protected:
+  QuiltCollection();
+  std::vector<std::string_view> keysDependingOn(std::string_view key) const override;
+
+ private:
+  bool fillFromFile(QuiltDocument& document, const std::shared_ptr<QuiltDocument>& shared, const Path& file) const;
+
+  platform::Property<std::string> _uuid{*this, "uuid"};
+  platform::Property<Path> _path{*this, "path"};
+  platform::Property<std::optional<Date>> _creationDate{*this, "creationDate"};
+  platform::Property<std::optional<Date>> _modifiedDate{*this, "modifiedDate"};
+  platform::Property<Text> _title{*this, "title"};
+  platform::Property<Text> _description{*this, "description"};
+  platform::Property<Text> _author{*this, "author"};
+  platform::Property<Text> _copyright{*this, "copyright"};
+  platform::Property<Text> _keywords{*this, "keywords"};
+  platform::Property<Text> _category{*this, "category"};
+  platform::Property<Text> _advisoryLabel{*this, "advisoryLabel"};
+  platform::Property<std::shared_ptr<ImageWrapper>> _posterImage{*this, "posterImage"};
+  platform::Property<std::shared_ptr<QuiltTheme>> _preferredTheme{*this, "preferredTheme"};
+  platform::ChildList<QuiltDocument, QuiltCollection> _documents{*this, "documents", &QuiltDocument::setCollectionOwner};
+  platform::Property<Text> _lastPublishURL{*this, "lastPublishURL"};
+  platform::WeakProperty<QuiltCollectionsController> _collectionControllerOwner{*this, "collectionControllerOwner"};
+  platform::Property<bool> _isLoading{*this, "isLoading"};
+  Dictionary _unknownEntries;
+  std::vector<platform::Observation> _observations;  // last: ends before the properties do
+};
+
+}  // namespace quilt

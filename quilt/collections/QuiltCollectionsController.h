@@ -1,0 +1,57 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include "quilt/collections/QuiltCollection.h"
+
+namespace quilt {
+
+/// The library: the collections found in one library folder. Any thread may call it; the list has a recursive lock.
+class QuiltCollectionsController : public platform::Object {
+ public:
+  /// The shared controller, made on first use; lives until the process ends.
+  static std::shared_ptr<QuiltCollectionsController> defaultController();
+  static std::shared_ptr<QuiltCollectionsController> init();
+
+  Path libraryPath() const { return _libraryPath.get(); }
+  void setLibraryPath(Path path) { _libraryPath.set(std::move(path)); }
+  bool loadingCollections() const { return _loadingCollections.get(); }
+  void setLoadingCollections(bool loading) { _loadingCollections.set(loading); }
+  bool isUpdating() const { return _isUpdating.get(); }
+  void setIsUpdating(bool isUpdating) { _isUpdating.set(isUpdating); }
+
+  /// Opens every collection of the library folder, reporting each (or null for one that does not open) with the
+  /// percentage, and null with 100 at the end. False while another load runs, when the folder cannot be listed (later
+  /// loads are then refused) and when the block answers false (what was opened stays).
+  bool loadLibraryPath(const Path& path, const ObjectProgressionBlock<QuiltCollection>& withProgressionBlock);
+  Path _collectionsDirectory() const;
+  /// Has every collection save itself. False while loading or updating, or without a library path.
+  bool update();
+
+  std::vector<std::shared_ptr<QuiltCollection>> collections() const { return _collections.copy(); }
+  void setCollections(std::vector<std::shared_ptr<QuiltCollection>> collections) {
+    _collections.assign(std::move(collections));
+  }
+  std::size_t collectionsCount() const { return _collections.count(); }
+  std::shared_ptr<QuiltCollection> collectionAtIndex(std::size_t index) const { return _collections.at(index); }
+  std::shared_ptr<QuiltCollection> collectionWithUUID(const std::string& uuid) const;
+  /// Calls the block on each with the lock held until it answers false.
+  void performBlockOnCollections(const std::function<bool(const std::shared_ptr<QuiltCollection>&)>& block) const;
+  void addCollection(const std::shared_ptr<QuiltCollection>& collection);
+  /// Takes the collection and its documents out; with `andDeleteDocuments` also deletes their folders.
+  void removeCollection(const std::shared_ptr<QuiltCollection>& collection, bool andDeleteDocuments);
+  /// Makes a collection in a folder named by the identity (a fresh one for none). Null after a critical line.
+  std::shared_ptr<QuiltCollection> newCollectionWithUUID(const Text& uuid);
+  std::shared_ptr<QuiltCollection> newCollection() { return newCollectionWithUUID(std::nullopt); }
+
+ protected:
+  QuiltCollectionsController() = default;
+
+ private:
+  platform::Property<Path> _libraryPath{*this, "libraryPath"};
+  platform::Property<bool> _loadingCollections{*this, "loadingCollections"};
+  platform::Property<bool> _isUpdating{*this, "isUpdating"};
+  platform::ChildList<QuiltCollection, QuiltCollectionsController> _collections{
+      *this, "collections", &QuiltCollection::setCollectionControllerOwner};
+};
+
+}  // namespace quilt

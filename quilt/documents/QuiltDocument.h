@@ -1,0 +1,220 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <atomic>
+
+#include "quilt/media/QuiltMedia.h"
+#include "quilt/platform/base/ChildList.h"
+#include "quilt/platform/base/MainThread.h"
+#include "quilt/platform/base/Property.h"
+#include "quilt/sources/ModelTypes.h"
+#include "quilt/themes/QuiltTheme.h"
+
+namespace quilt {
+
+class QuiltCollection;
+
+/// Document types, compared by string equality.
+inline constexpr const char* kQuiltDocumentTypeInteractive = "Interactive";  ///< a package built from a theme
+inline constexpr const char* kQuiltDocumentTypeClassicMovie = "Movie";
+inline constexpr const char* kQuiltDocumentTypeClassicAudio = "Audio";
+inline constexpr const char* kQuiltDocumentTypeFilePDF = "PDF";
+inline constexpr const char* kQuiltDocumentTypeFileEPUB = "EPUB";
+inline constexpr const char* kQuiltDocumentTypeStaticFile = "Static";
+
+inline constexpr const char* kQuiltDocumentExtension = "qpk";
+inline constexpr const char* kQuiltDocumentPropertiesFilename = "properties.plist";
+
+/// One document: a package folder with a properties file, a media folder and what finalizing writes. Owned by its
+/// collection, or free-standing. Any thread may call it; the media list has a recursive lock.
+///
+/// A document saves itself: setting title, description, author, keywords, category, advisoryLabel, jukeboxOrder, theme,
+/// creationDate or lastPublishURL rewrites the properties file at once, on the setting thread, unless the document is
+/// processing. While a long operation or a load runs, isProcessing is true and saving is refused.
+class QuiltDocument : public platform::Object {
+ public:
+  // Construction
+  static std::shared_ptr<QuiltDocument> init();
+  /// Opens the package, or makes an empty one when nothing is there (its properties file comes with the first save).
+  /// Null when it cannot be opened or made; the reason is logged, but for a wrong format version.
+  static std::shared_ptr<QuiltDocument> initWithPath(const Path& path);
+  /// The identity of a package, read without opening it; none when it cannot be read.
+  static Text uuidForDocumentAtPath(const Path& path);
+
+  // Which files may be imported as a new document
+  static const std::vector<std::string>& allSupportedStaticDocumentImportUTIs();
+  static const std::vector<std::string>& allSupportedClassicImportUTIs();
+  static const std::vector<std::string>& allSupportedImportUTIs();
+  static bool canImportFromPath(const Path& path);
+
+  // Properties
+  std::string uuid() const { return _uuid.get(); }
+  void setUuid(std::string uuid) { _uuid.set(std::move(uuid)); }
+  Path path() const { return _path.get(); }
+  void setPath(Path path) { _path.set(std::move(path)); }
+  Text uti() const { return _uti.get(); }
+  void setUti(Text uti) { _uti.set(std::move(uti)); }
+  Text title() const { return _title.get(); }
+  void setTitle(Text title) { _title.set(std::move(title)); }
+  Text description() const { return _description.get(); }
+  void setDescription(Text description) { _description.set(std::move(description)); }
+  Text author() const { return _author.get(); }
+  void setAuthor(Text author) { _author.set(std::move(author)); }
+  Text keywords() const { return _keywords.get(); }
+  void setKeywords(Text keywords) { _keywords.set(std::move(keywords)); }
+  Text category() const { return _category.get(); }
+  void setCategory(Text category) { _category.set(std::move(category)); }
+  Text advisoryLabel() const { return _advisoryLabel.get(); }
+  void setAdvisoryLabel(Text advisoryLabel) { _advisoryLabel.set(std::move(advisoryLabel)); }
+  std::int64_t jukeboxOrder() const { return _jukeboxOrder.get(); }
+  void setJukeboxOrder(std::int64_t order) { _jukeboxOrder.set(order); }
+  std::optional<Date> creationDate() const { return _creationDate.get(); }
+  void setCreationDate(std::optional<Date> date) { _creationDate.set(date); }
+  /// The time of the last save.
+  std::optional<Date> modifiedDate() const { return _modifiedDate.get(); }
+  void setModifiedDate(std::optional<Date> date) { _modifiedDate.set(date); }
+  Text lastPublishURL() const { return _lastPublishURL.get(); }
+  void setLastPublishURL(Text url) { _lastPublishURL.set(std::move(url)); }
+  std::shared_ptr<QuiltTheme> theme() const { return _theme.get(); }
+  void setTheme(std::shared_ptr<QuiltTheme> theme) { _theme.set(std::move(theme)); }
+  Text type() const { return _type.get(); }
+  void setType(Text type) { _type.set(std::move(type)); }
+  bool isProcessing() const { return _isProcessing.get(); }
+  void setIsProcessing(bool isProcessing) { _isProcessing.set(isProcessing); }
+  std::shared_ptr<QuiltCollection> collectionOwner() const { return _collectionOwner.get(); }
+  void setCollectionOwner(const std::shared_ptr<QuiltCollection>& owner) { _collectionOwner.set(owner); }
+
+  /// "Movie" or "Audio".
+  bool isClassic() const;
+  /// "PDF" or "EPUB"; "Static" is deliberately none.
+  bool isStaticDocument() const;
+  /// False for every document: compare the type to learn whether one is interactive.
+  bool isInteractive() const { return false; }
+
+  // Places in the package; empty without a path
+  Path propertiesPath() const;
+  Path mediaFolderPath() const;
+  Path posterImagePath() const;
+  Path dataControllerPath() const;
+  Path localizationControllerPath() const;
+  Path jukeboxArtworkPath() const;
+  Path jukeboxMetadataPath() const;
+  Path glanceThumbnailPath() const;
+
+  // Loading and saving
+  bool loadDictionary();
+  /// Adds the file's media to those held. A file whose "Media" is no array is damaged and does not load.
+  bool loadDictionaryAtPath(const Path& path);
+  /// The properties record. Gives the document its fall-back title when it has none.
+  Dictionary dictionary();
+  /// Stamps modifiedDate and saves. False, after a critical line, while processing or when the file cannot be written.
+  /// Waits for a save that another thread has begun.
+  bool update();
+  /// Reads the package again when its file is newer than the document.
+  void reload();
+  /// Whether modifiedDate and creationDate are a second or more apart.
+  bool hasBeenModified() const;
+  void resetModifiedDate();
+  void invalidateCaches();
+  void observeValueForKeyPath(std::string_view keyPath, platform::Object& ofObject, platform::ChangePhase change,
+                              void* context);
+
+  // Media
+  std::vector<std::shared_ptr<QuiltMedia>> media() const { return _media.copy(); }
+  void setMedia(std::vector<std::shared_ptr<QuiltMedia>> media) { _media.assign(std::move(media)); }
+  std::size_t mediaCount() const { return _media.count(); }
+  std::shared_ptr<QuiltMedia> mediaAtIndex(std::size_t index) const { return _media.at(index); }
+  std::shared_ptr<QuiltMedia> mediaWithUUID(const std::string& uuid) const;
+  /// Calls the block on each with the lock held; stops at the first false and answers false.
+  bool performBlockOnMedia(const std::function<bool(const std::shared_ptr<QuiltMedia>&)>& block) const;
+  void addMedia(const std::shared_ptr<QuiltMedia>& media);
+  void addMedia(const std::shared_ptr<QuiltMedia>& media, std::size_t atIndex);
+  void moveMediaAtIndexes(const IndexSet& indexes, std::size_t toIndex);
+  /// Deletes the item's folder and removes it from the list.
+  void removeMedia(const std::shared_ptr<QuiltMedia>& media);
+  void removeAllMedia();
+  /// Removes the items without sources.
+  void removeAllEmptyMedia();
+  /// Removes the items of which a source, or a montage's commentary, has lost its file.
+  void removeAllBrokenMedia();
+  void removeAllBrokenMediaExtra();
+  /// Seconds, over all items.
+  double duration() const;
+
+  // Poster image
+  /// Cached, else "poster.png", else the built-in placeholder. Null, after a warning, when "poster.png" is no image.
+  std::shared_ptr<ImageWrapper> posterImage();
+  void setPosterImage(std::shared_ptr<ImageWrapper> image) { _posterImage.set(std::move(image)); }
+  std::uint64_t posterImageVersion() const { return _posterImageVersion.get(); }
+  void setPosterImageVersion(std::uint64_t version) { _posterImageVersion.set(version); }
+  /// Keeps the image in standard definition and writes it to "poster.png"; null only caches the placeholder.
+  void updatePosterImage(const std::shared_ptr<ImageWrapper>& image);
+  /// Writes the poster as the quick-preview thumbnail.
+  bool glanceUpdate();
+
+  // Themes
+  /// Copies the theme's template into the package after clearing the previous one's files.
+  bool applyTheme(const std::shared_ptr<QuiltTheme>& theme, const ProgressionBlock& withProgressionBlock);
+  bool removeTheme();
+  /// Succeeds without writing anything.
+  bool generateLocalizationControllerFromTheme(const std::shared_ptr<QuiltTheme>& theme);
+  /// The store metadata.
+  Dictionary jukeboxMetadata() const;
+
+  // Long operations, on the calling thread; the block gets 0 to 100
+  /// Makes the document ready to be played: finalizes every item, writes what the theme reads, the thumbnail and the
+  /// properties file.
+  bool finalizeWithProgressionBlock(const ProgressionBlock& withProgressionBlock);
+  /// True when there are items and every one is flattened.
+  bool isFlattened() const;
+  /// Copies every outside file into the package.
+  bool flattenWithProgressionBlock(const ProgressionBlock& withProgressionBlock);
+  /// The formats that every item offers, in the first item's order.
+  std::vector<std::string> availableFormats() const;
+  bool convertToFormat(const std::string& format, const ProgressionBlock& withProgressionBlock);
+  /// Builds a finished copy, as a folder or zipped, in the folder `path` under a unique name made from the title. The
+  /// path of what was made, or empty. Flattens, converts and finalizes this document on the way.
+  Path exportToPath(const Path& path, bool zipped, const std::vector<std::string>& usingFormats,
+                    const ProgressionBlock& withProgressionBlock);
+  /// Copies fields, poster and items, restricted to the formats, into another document. True also when an item lacked a
+  /// format and the copy stopped there. The block is never called.
+  bool mergeIntoDocument(const std::shared_ptr<QuiltDocument>& document, const std::vector<std::string>& withFormats,
+                         const ProgressionBlock& withProgressionBlock);
+
+ protected:
+  QuiltDocument();
+
+ private:
+  Path inPackage(std::initializer_list<const char*> components) const;
+  bool isSavingElsewhere() const;
+  std::string displayTitle() const;
+  bool writeProperties();
+  bool finalizeMedia(const ProgressionBlock& block, bool& cancelled);
+  bool finalizeInteractive();
+
+  platform::Property<std::string> _uuid{*this, "uuid"};
+  platform::Property<Path> _path{*this, "path"};
+  platform::Property<Text> _uti{*this, "uti"};
+  platform::Property<Text> _title{*this, "title"};
+  platform::Property<Text> _description{*this, "description"};
+  platform::Property<Text> _author{*this, "author"};
+  platform::Property<Text> _keywords{*this, "keywords"};
+  platform::Property<Text> _category{*this, "category"};
+  platform::Property<Text> _advisoryLabel{*this, "advisoryLabel"};
+  platform::Property<std::int64_t> _jukeboxOrder{*this, "jukeboxOrder"};
+  platform::Property<std::optional<Date>> _creationDate{*this, "creationDate"};
+  platform::Property<std::optional<Date>> _modifiedDate{*this, "modifiedDate"};
+  platform::Property<std::shared_ptr<ImageWrapper>> _posterImage{*this, "posterImage"};
+  platform::Property<std::uint64_t> _posterImageVersion{*this, "posterImageVersion", 1};
+  platform::ChildList<QuiltMedia, QuiltDocument> _media{*this, "media", &QuiltMedia::setDocumentOwner};
+  platform::Property<Text> _lastPublishURL{*this, "lastPublishURL"};
+  platform::Property<std::shared_ptr<QuiltTheme>> _theme{*this, "theme"};
+  platform::Property<Text> _type{*this, "type"};
+  platform::Property<bool> _isProcessing{*this, "isProcessing"};
+  platform::WeakProperty<QuiltCollection> _collectionOwner{*this, "collectionOwner"};
+  std::atomic<platform::ThreadIdentity> _savingThread{nullptr};  // while update() runs
+  Dictionary _unknownEntries;
+  std::vector<platform::Observation> _observations;  // last: ends before the properties do
+};
+
+}  // namespace quilt

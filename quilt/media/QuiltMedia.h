@@ -1,0 +1,140 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include "quilt/media/QuiltMediaExtra.h"
+#include "quilt/platform/base/ChildList.h"
+#include "quilt/platform/base/Property.h"
+#include "quilt/sources/ModelTypes.h"
+#include "quilt/sources/QuiltMediaSource.h"
+
+namespace quilt {
+
+class QuiltDocument;
+
+/// One item of a document: a movie, audio, an image, a document file, a web page, a montage of stills or two sources
+/// shown together. Owned by its document; any thread may call it; sources and extras have a recursive lock each, never
+/// held together.
+class QuiltMedia : public platform::Object {
+ public:
+  // Construction
+  static std::shared_ptr<QuiltMedia> init();
+  /// Reads a record. Null, after a warning, when its identity is no plain folder name. Children whose records yield
+  /// nothing are skipped.
+  static std::shared_ptr<QuiltMedia> initWithDictionary(const Dictionary& dictionary,
+                                                        const std::shared_ptr<QuiltDocument>& andDocument);
+
+  // Properties
+  std::string uuid() const { return _uuid.get(); }
+  void setUuid(std::string uuid) { _uuid.set(std::move(uuid)); }
+  Text title() const { return _title.get(); }
+  void setTitle(Text title) { _title.set(std::move(title)); }
+  Text description() const { return _description.get(); }
+  void setDescription(Text description) { _description.set(std::move(description)); }
+  /// The category that was set; else, once, that of the only source; else none.
+  Text contentCategory() const;
+  void setContentCategory(Text contentCategory) { _contentCategory.set(std::move(contentCategory)); }
+  std::shared_ptr<QuiltDocument> documentOwner() const { return _documentOwner.get(); }
+  void setDocumentOwner(const std::shared_ptr<QuiltDocument>& owner) { _documentOwner.set(owner); }
+
+  // Places in the package; empty while the item is not in a document
+  Path path() const;
+  Path sourcesFolderPath() const;
+  Path extrasFolderPath() const;
+  Path posterImagePath() const;
+
+  // Derived values
+  /// Seconds.
+  double duration() const;
+  double totalSizeInMegaBytes() const;
+
+  // Poster image
+  /// The item's still in standard definition: cached, else read from the package, else drawn and saved there. Null
+  /// silently when an ordinary item's first source has no preview, else after a warning.
+  std::shared_ptr<ImageWrapper> posterImage();
+  void setPosterImage(std::shared_ptr<ImageWrapper> image) { _posterImage.set(std::move(image)); }
+  /// Rises whenever the poster is drawn anew or invalidated; 1 for a new item.
+  std::uint64_t posterImageVersion() const { return _posterImageVersion.get(); }
+  void setPosterImageVersion(std::uint64_t version) { _posterImageVersion.set(version); }
+  /// Pixels; the integer 0 without a poster, else a real.
+  platform::PropertyList posterImageWidth();
+  platform::PropertyList posterImageHeight();
+  /// Drops the cached poster, raises the version and deletes the file.
+  void invalidatePosterImage();
+  /// Drops the cached poster and every cache of the children. The file and the version stay.
+  void invalidateCaches();
+
+  // Sources
+  std::vector<std::shared_ptr<QuiltMediaSource>> sources() const { return _sources.copy(); }
+  void setSources(std::vector<std::shared_ptr<QuiltMediaSource>> sources) { _sources.assign(std::move(sources)); }
+  std::size_t sourcesCount() const { return _sources.count(); }
+  std::shared_ptr<QuiltMediaSource> sourceAtIndex(std::size_t index) const { return _sources.at(index); }
+  std::shared_ptr<QuiltMediaSource> sourceWithUUID(const std::string& uuid) const;
+  /// Calls the block on each with the lock held; stops at the first false and answers false.
+  bool performBlockOnSources(const std::function<bool(const std::shared_ptr<QuiltMediaSource>&)>& block) const;
+  void addSource(const std::shared_ptr<QuiltMediaSource>& source);
+  void addSource(const std::shared_ptr<QuiltMediaSource>& source, std::size_t atIndex);
+  void moveSourcesAtIndexes(const IndexSet& indexes, std::size_t toIndex);
+  /// Deletes the source's folder and removes it from the list.
+  void removeSource(const std::shared_ptr<QuiltMediaSource>& source);
+  void removeAllSources();
+  std::size_t totalSourcesPreviewsCount() const;
+  /// The preview at this place when those of all sources are numbered in source order; null past the last.
+  std::shared_ptr<QuiltMediaPreview> sourcePreviewAtIndex(std::size_t index) const;
+
+  // Extras
+  std::vector<std::shared_ptr<QuiltMediaExtra>> extras() const { return _extras.copy(); }
+  void setExtras(std::vector<std::shared_ptr<QuiltMediaExtra>> extras) { _extras.assign(std::move(extras)); }
+  std::size_t extraCount() const { return _extras.count(); }
+  std::shared_ptr<QuiltMediaExtra> extraAtIndex(std::size_t index) const { return _extras.at(index); }
+  bool performBlockOnExtra(const std::function<bool(const std::shared_ptr<QuiltMediaExtra>&)>& block) const;
+  void addExtra(const std::shared_ptr<QuiltMediaExtra>& extra);
+  void addExtra(const std::shared_ptr<QuiltMediaExtra>& extra, std::size_t atIndex);
+  void moveExtraAtIndexes(const IndexSet& indexes, std::size_t toIndex);
+  void removeExtra(const std::shared_ptr<QuiltMediaExtra>& extra);
+  void removeAllExtras();
+
+  // Audio commentary
+  std::shared_ptr<QuiltMediaSource> audioCommentarySource() const { return _audioCommentarySource.get(); }
+  /// Replaces the commentary; files stay, nothing is saved.
+  void setAudioCommentarySource(const std::shared_ptr<QuiltMediaSource>& source);
+
+  // Long operations, on the calling thread; the block gets 0 to 100
+  bool isFlattened() const;
+  /// Copies every child's files into the item's folder.
+  bool flattenWithProgressionBlock(const ProgressionBlock& withProgressionBlock);
+  /// Makes the poster and every child's previews.
+  bool finalizeWithProgressionBlock(const ProgressionBlock& withProgressionBlock);
+  /// Has every child make the format; stops at the first that cannot.
+  bool convertToFormat(const std::string& format, const ProgressionBlock& withProgressionBlock);
+  /// Flattens, converts and finalizes the whole document, then copies this item's sources into a folder.
+  bool exportToPath(const Path& path, const std::string& withFormat, const ProgressionBlock& withProgressionBlock);
+  /// The formats that every child offers, in the first source's order.
+  std::vector<std::string> availableFormats() const;
+
+  // Record
+  /// Reads the poster, and so may draw and save it.
+  Dictionary dictionary();
+
+ protected:
+  QuiltMedia();
+
+ private:
+  void updateDocumentUnlessProcessing() const;
+  template <class List, class Child>
+  void removeChild(List& list, const Child& child, const char* warning);
+  std::shared_ptr<ImageWrapper> drawPoster();
+
+  platform::Property<std::string> _uuid{*this, "uuid"};
+  platform::Property<Text> _title{*this, "title"};
+  platform::Property<Text> _description{*this, "description"};
+  mutable platform::Property<Text> _contentCategory;
+  platform::Property<std::shared_ptr<ImageWrapper>> _posterImage{*this, "posterImage"};
+  platform::Property<std::uint64_t> _posterImageVersion{*this, "posterImageVersion", 1};
+  platform::ChildList<QuiltMediaSource, QuiltMedia> _sources{*this, "sources", &QuiltMediaSource::setMediaOwner};
+  platform::ChildList<QuiltMediaExtra, QuiltMedia> _extras{*this, "extras", &QuiltMediaExtra::setMediaOwner};
+  platform::Property<std::shared_ptr<QuiltMediaSource>> _audioCommentarySource{*this, "audioCommentarySource"};
+  platform::WeakProperty<QuiltDocument> _documentOwner{*this, "documentOwner"};
+  Dictionary _unknownEntries;
+};
+
+}  // namespace quilt

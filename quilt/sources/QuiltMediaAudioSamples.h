@@ -1,0 +1,66 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include "quilt/platform/base/Property.h"
+#include "quilt/platform/base/RecursiveMonitor.h"
+#include "quilt/sources/ModelTypes.h"
+
+namespace quilt {
+
+class QuiltMediaSource;
+
+/// The points of a source's sound, from which a host draws a waveform. Owned by its source; its monitor is the lock of
+/// the source's samples.
+class QuiltMediaAudioSamples : public platform::Object {
+ public:
+  /// No identity, nothing set.
+  static std::shared_ptr<QuiltMediaAudioSamples> init();
+  /// Samples to be taken from a sound file, under the identity of its derivative. Nothing is extracted yet. Null for a
+  /// URL that is no file (debug line) and for a file without sound (silently).
+  static std::shared_ptr<QuiltMediaAudioSamples> initWithURL(const Url& url, const Text& uuid);
+  /// Reads a record. Null, after a warning, when its identity is no plain file name.
+  static std::shared_ptr<QuiltMediaAudioSamples> initWithDictionary(
+      const Dictionary& dictionary, const std::shared_ptr<QuiltMediaSource>& andMediaSource);
+
+  /// A second object with the same values and owner.
+  std::shared_ptr<QuiltMediaAudioSamples> copy() const;
+
+  /// The identity of the derivative that the samples were made from.
+  Text uuid() const { return _uuid.get(); }
+  void setUuid(Text uuid) { _uuid.set(std::move(uuid)); }
+  std::optional<Url> sampleURL() const { return _sampleURL.get(); }
+  void setSampleURL(std::optional<Url> url) { _sampleURL.set(std::move(url)); }
+  std::optional<Url> sourceURL() const { return _sourceURL.get(); }
+  void setSourceURL(std::optional<Url> url) { _sourceURL.set(std::move(url)); }
+  bool isFlattened() const { return _isFlattened.get(); }
+  void setIsFlattened(bool isFlattened) { _isFlattened.set(isFlattened); }
+  std::shared_ptr<QuiltMediaSource> sourceOwner() const { return _sourceOwner.get(); }
+  void setSourceOwner(const std::shared_ptr<QuiltMediaSource>& owner) { _sourceOwner.set(owner); }
+
+  platform::MonitorLock lock() const { return platform::MonitorLock(_monitor); }
+
+  /// Where the samples file lies in the package: identity and "asc"; empty without a place in a document.
+  Path path() const;
+  /// Extracts the samples into the package. True at once when they are there; false silently without a place in a
+  /// document, false after a critical line when the folder is missing, a file is in the way or extraction fails.
+  bool flatten();
+  /// 0 unless flattened.
+  double totalSizeInMegaBytes() const;
+  void invalidateCaches() {}
+
+  Dictionary dictionary() const;
+
+ protected:
+  QuiltMediaAudioSamples() = default;
+
+ private:
+  mutable platform::RecursiveMonitor _monitor;
+  platform::Property<Text> _uuid{*this, "uuid"};
+  platform::Property<std::optional<Url>> _sampleURL{*this, "sampleURL"};
+  platform::Property<std::optional<Url>> _sourceURL{*this, "sourceURL"};
+  platform::Property<bool> _isFlattened{*this, "isFlattened"};
+  platform::WeakProperty<QuiltMediaSource> _sourceOwner{*this, "sourceOwner"};
+  Dictionary _unknownEntries;
+};
+
+}  // namespace quilt

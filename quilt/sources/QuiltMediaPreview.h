@@ -1,0 +1,79 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include "quilt/platform/base/Property.h"
+#include "quilt/sources/ModelTypes.h"
+
+namespace quilt {
+
+class QuiltMediaSource;
+
+/// One still of a source: a movie's chapter or poster frame, a document's page, the picture of an image. Owned by its
+/// source; any thread may call it. Holds its image once that was asked for.
+class QuiltMediaPreview : public platform::Object {
+ public:
+  static std::shared_ptr<QuiltMediaPreview> init();
+  /// A preview of the image fitted into high definition. An absent image gives a preview without one.
+  static std::shared_ptr<QuiltMediaPreview> initWithImageWrapper(const std::shared_ptr<ImageWrapper>& imageWrapper);
+  /// Reads a record. Null, after a warning, when its identity is no plain file name.
+  static std::shared_ptr<QuiltMediaPreview> initWithDictionary(const Dictionary& dictionary,
+                                                               const std::shared_ptr<QuiltMediaSource>& andMediaSource);
+
+  std::string uuid() const { return _uuid.get(); }
+  void setUuid(std::string uuid) { _uuid.set(std::move(uuid)); }
+  /// A movie chapter's name, or a page's first line.
+  Text title() const { return _title.get(); }
+  void setTitle(Text title) { _title.set(std::move(title)); }
+  /// The text of a document page.
+  Text content() const { return _content.get(); }
+  void setContent(Text content) { _content.set(std::move(content)); }
+  /// Position among the source's previews; kNoIndex for none.
+  std::size_t index() const { return _index.get(); }
+  void setIndex(std::size_t index) { _index.set(index); }
+  /// Seconds from the movie's start; kNoTimecode for none.
+  double timecode() const { return _timecode.get(); }
+  void setTimecode(double timecode) { _timecode.set(timecode); }
+  /// The picture, read from the package when it is first asked for. Null, after a warning, when the file is missing or
+  /// no image; null silently without a place in a document.
+  std::shared_ptr<ImageWrapper> image();
+  void setImage(std::shared_ptr<ImageWrapper> image) { _image.set(std::move(image)); }
+  /// Pixels; none until the image was asked for.
+  std::optional<double> width() const { return _width.get(); }
+  void setWidth(std::optional<double> width) { _width.set(width); }
+  std::optional<double> height() const { return _height.get(); }
+  void setHeight(std::optional<double> height) { _height.set(height); }
+  bool isFlattened() const { return _isFlattened.get(); }
+  void setIsFlattened(bool isFlattened) { _isFlattened.set(isFlattened); }
+  std::shared_ptr<QuiltMediaSource> sourceOwner() const { return _sourceOwner.get(); }
+  void setSourceOwner(const std::shared_ptr<QuiltMediaSource>& owner) { _sourceOwner.set(owner); }
+
+  /// Where the picture lies in the package: index (or identity) and "jpg"; empty without a place in a document.
+  Path path() const;
+  /// Writes the picture into the package. True at once when it is there.
+  bool flatten();
+  /// 0 unless flattened.
+  double totalSizeInMegaBytes() const;
+  void invalidateCaches() {}
+
+  Dictionary dictionary() const;
+
+ protected:
+  QuiltMediaPreview();
+
+ private:
+  void adopt(const std::shared_ptr<ImageWrapper>& image);
+
+  platform::Property<std::string> _uuid{*this, "uuid"};
+  platform::Property<Text> _title{*this, "title"};
+  platform::Property<Text> _content{*this, "content"};
+  platform::Property<std::size_t> _index{*this, "index", kNoIndex};
+  platform::Property<double> _timecode{*this, "timecode", kNoTimecode};
+  platform::Property<std::shared_ptr<ImageWrapper>> _image{*this, "image"};
+  platform::Property<std::optional<double>> _width{*this, "width"};
+  platform::Property<std::optional<double>> _height{*this, "height"};
+  platform::Property<bool> _isFlattened{*this, "isFlattened"};
+  platform::WeakProperty<QuiltMediaSource> _sourceOwner{*this, "sourceOwner"};
+  Dictionary _unknownEntries;
+};
+
+}  // namespace quilt
