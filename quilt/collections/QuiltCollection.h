@@ -19,7 +19,8 @@ class QuiltCollection : public platform::Object {
   // Construction
   /// A detached collection: fresh identity, made now, no folder.
   static std::shared_ptr<QuiltCollection> init();
-  /// Opens the folder with its documents, or makes it when nothing is there. Null when that fails; the reason is logged.
+  /// Opens the folder with its documents, or makes it when nothing is there. Null when that fails; the reason is
+  /// logged.
   static std::shared_ptr<QuiltCollection> initWithPath(const Path& path);
 
   // Properties
@@ -53,7 +54,9 @@ class QuiltCollection : public platform::Object {
   void setPreferredTheme(std::shared_ptr<QuiltTheme> theme) { _preferredTheme.set(std::move(theme)); }
   Text lastPublishURL() const { return _lastPublishURL.get(); }
   void setLastPublishURL(Text url) { _lastPublishURL.set(std::move(url)); }
-  std::shared_ptr<QuiltCollectionsController> collectionControllerOwner() const { return _collectionControllerOwner.get(); }
+  std::shared_ptr<QuiltCollectionsController> collectionControllerOwner() const {
+    return _collectionControllerOwner.get();
+  }
   void setCollectionControllerOwner(const std::shared_ptr<QuiltCollectionsController>& owner) {
     _collectionControllerOwner.set(owner);
   }
@@ -130,7 +133,8 @@ class QuiltCollection : public platform::Object {
   platform::Property<Text> _advisoryLabel{*this, "advisoryLabel"};
   platform::Property<std::shared_ptr<ImageWrapper>> _posterImage{*this, "posterImage"};
   platform::Property<std::shared_ptr<QuiltTheme>> _preferredTheme{*this, "preferredTheme"};
-  platform::ChildList<QuiltDocument, QuiltCollection> _documents{*this, "documents", &QuiltDocument::setCollectionOwner};
+  platform::ChildList<QuiltDocument, QuiltCollection> _documents{*this, "documents",
+                                                                 &QuiltDocument::setCollectionOwner};
   platform::Property<Text> _lastPublishURL{*this, "lastPublishURL"};
   platform::WeakProperty<QuiltCollectionsController> _collectionControllerOwner{*this, "collectionControllerOwner"};
   platform::Property<bool> _isLoading{*this, "isLoading"};
