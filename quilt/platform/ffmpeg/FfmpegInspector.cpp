@@ -12,11 +12,10 @@ extern "C" {
 #include <string>
 #include <string_view>
 
-#include "quilt/platform/ffmpeg/Duration.h"
-#include "quilt/platform/ffmpeg/Failure.h"
 #include "quilt/platform/ffmpeg/Input.h"
 #include "quilt/platform/ffmpeg/Limits.h"
 #include "quilt/platform/ffmpeg/Metadata.h"
+#include "quilt/platform/ffmpeg/Outline.h"
 #include "quilt/platform/ffmpeg/Streams.h"
 
 namespace quilt::platform {
@@ -134,42 +133,28 @@ void describeAudio(const AVStream& stream, Details& details) {
 }
 
 Result<MediaFacts> factsOf(Input& input) {
-  if (Result<void> completed = completeStreams(input); !completed) return completed.error();
-  AVStream* video = mainVideo(input);
-  AVStream* audio = mainAudio(input);
-  if (video == nullptr && audio == nullptr) {
-    return Error{ErrorKind::Unsupported, "The file holds neither video nor audio.", input.path()};
-  }
-  if (endsBeforeItsMedia(input)) {
-    return Error{ErrorKind::Damaged, "The file ends before its first picture or sound.", input.path()};
-  }
-  MediaFacts facts;
+  Result<Outline> found = outline(input);
+  if (!found) return found.error();
+  const auto& [video, audio, duration, chapters] = *found;
   const Container container = quilt::platform::container(input, video != nullptr);
+  MediaFacts facts;
   facts.mimeType = container.mimeType;
-  facts.duration = trustedDuration(input);
+  facts.duration = duration;
+  facts.chapters = chapters;
   facts.metadataTitle = tag(input, {"title"});
   facts.metadataInformation = tag(input, {"description", "synopsis", "comment"});
   facts.metadataAuthor = tag(input, {"artist", "author", "album_artist"});
-  facts.chapters = chapters(input, facts.duration);
   facts.details.emplace_back("Container", container.name);
-  if (facts.duration > 0) {
-    const double rate = static_cast<double>(input.size()) * 8 / facts.duration;
+  if (duration > 0) {
+    const double rate = static_cast<double>(input.size()) * 8 / duration;
     facts.details.emplace_back("Bit rate", kilobits(std::llround(std::min(rate, 1e12))));
   }
   if (video != nullptr) {
-    const AVCodecParameters& parameters = *video->codecpar;
-    if (parameters.width > kMaximumPictureSide || parameters.height > kMaximumPictureSide) {
-      return Error{ErrorKind::Damaged, "The movie's pictures are larger than any that can be shown.", input.path()};
-    }
     facts.hasVideo = true;
-    facts.videoCodecName = codecName(parameters);
-    if (parameters.width > 0 && parameters.height > 0) {
-      const AVRational shape = av_guess_sample_aspect_ratio(input.context(), video, nullptr);
-      const PictureSize shown =
-          turned(withSquarePixels({parameters.width, parameters.height}, shape), orientation(*video));
-      facts.width = shown.width;
-      facts.height = shown.height;
-    }
+    facts.videoCodecName = codecName(*video->codecpar);
+    const PictureSize shown = shownSize(input, *video);
+    facts.width = shown.width;
+    facts.height = shown.height;
     describeVideo(*video, facts.details);
   }
   if (audio != nullptr) {
