@@ -13,8 +13,9 @@ namespace {
 // At 85 a still from a movie and its JPEG cannot be told apart at viewing distance, at a tenth of the size of 100.
 constexpr int kJPEGQuality = 85;
 
-// Of 0 to 9. Beyond it a photograph shrinks by one or two percent for twice the time.
-constexpr int kPNGCompression = 4;
+// Of 0 to 9. With differences of neighbours (the filter) a photograph takes three quarters of the bytes that level 6
+// needs without them, in less time; higher levels gain nothing on photographs.
+constexpr int kPNGCompression = 2;
 
 bool isTransparent(const Image& image) { return vips_image_get_bands(image.get()) == 4; }
 
@@ -55,7 +56,7 @@ Result<void> LazyImage::saveAsJPGAtPath(const std::filesystem::path& path) const
   std::size_t length = 0;
   if (!*image ||
       vips_jpegsave_buffer(image->get(), &bytes, &length, "Q", kJPEGQuality, "strip", TRUE, nullptr) != 0) {
-    return failure(ErrorKind::Damaged, "The image cannot be written as JPEG", path);
+    return failure(ErrorKind::Damaged, "The image cannot be decoded and written as JPEG", path);
   }
   return write(path, bytes, length);
 }
@@ -66,9 +67,9 @@ Result<void> LazyImage::saveAsPNGAtURL(const Url& url) const {
   if (!image) return image.error();
   void* bytes = nullptr;
   std::size_t length = 0;
-  if (vips_pngsave_buffer(image->get(), &bytes, &length, "compression", kPNGCompression, "strip", TRUE, nullptr) !=
-      0) {
-    return failure(ErrorKind::Damaged, "The image cannot be written as PNG", url.relativePath());
+  if (vips_pngsave_buffer(image->get(), &bytes, &length, "compression", kPNGCompression, "filter",
+                          VIPS_FOREIGN_PNG_FILTER_SUB, "strip", TRUE, nullptr) != 0) {
+    return failure(ErrorKind::Damaged, "The image cannot be decoded and written as PNG", url.relativePath());
   }
   return write(url.relativePath(), bytes, length);
 }
