@@ -21,7 +21,8 @@ class QuiltCollection : public platform::Object {
   // Construction
   /// A detached collection: fresh identity, made now, no folder.
   static std::shared_ptr<QuiltCollection> init();
-  /// Opens the folder with its documents, or makes it when nothing is there. Null when that fails; the reason is logged.
+  /// Opens the folder with its documents, or makes it when nothing is there. Null when that fails; the reason is
+  /// logged.
   static std::shared_ptr<QuiltCollection> initWithPath(const Path& path);
 
   // Properties
@@ -55,7 +56,9 @@ class QuiltCollection : public platform::Object {
   void setPreferredTheme(std::shared_ptr<QuiltTheme> theme) { _preferredTheme.set(std::move(theme)); }
   Text lastPublishURL() const { return _lastPublishURL.get(); }
   void setLastPublishURL(Text url) { _lastPublishURL.set(std::move(url)); }
-  std::shared_ptr<QuiltCollectionsController> collectionControllerOwner() const { return _collectionControllerOwner.get(); }
+  std::shared_ptr<QuiltCollectionsController> collectionControllerOwner() const {
+    return _collectionControllerOwner.get();
+  }
   void setCollectionControllerOwner(const std::shared_ptr<QuiltCollectionsController>& owner) {
     _collectionControllerOwner.set(owner);
   }
@@ -143,7 +146,8 @@ class QuiltCollection : public platform::Object {
   std::mutex _posterMutex;  // held from the look at the file to the change of the cache; nothing else is locked under it
   std::shared_ptr<ImageWrapper> _posterImage;
   platform::Property<std::shared_ptr<QuiltTheme>> _preferredTheme{*this, "preferredTheme"};
-  platform::ChildList<QuiltDocument, QuiltCollection> _documents{*this, "documents", &QuiltDocument::setCollectionOwner};
+  platform::ChildList<QuiltDocument, QuiltCollection> _documents{*this, "documents",
+                                                                 &QuiltDocument::setCollectionOwner};
   platform::Property<Text> _lastPublishURL{*this, "lastPublishURL"};
   platform::WeakProperty<QuiltCollectionsController> _collectionControllerOwner{*this, "collectionControllerOwner"};
   platform::Property<bool> _isLoading{*this, "isLoading"};
