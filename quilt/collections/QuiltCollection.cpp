@@ -249,23 +249,32 @@ void QuiltCollection::setPosterImage(const std::shared_ptr<ImageWrapper>& image)
   {
     const std::lock_guard guard(_posterMutex);
     _posterImage = nullptr;
-    if (!path().empty() && (image ? savePosterImage(*image) : deletePosterImage())) _posterImage = image;
+    if (!path().empty()) {
+      if (image)
+        _posterImage = savedPosterImage(image);
+      else
+        deletePosterImage();
+    }
   }
   didChangeValueForKey("posterImage");
 }
 
-bool QuiltCollection::savePosterImage(const ImageWrapper& image) const {
-  if (image.saveAsPNGAtURL(Url::fileUrl(_posterImageFilepath()))) return true;
-  FDYLogger::logCritical("Failed to update poster image for collection at path \"%@\"", _collectionFilepath());
-  return false;
+std::shared_ptr<ImageWrapper> QuiltCollection::savedPosterImage(const std::shared_ptr<ImageWrapper>& image) const {
+  const Path file = _posterImageFilepath();
+  if (!image->saveAsPNGAtURL(Url::fileUrl(file))) {
+    FDYLogger::logCritical("Failed to update poster image for collection at path \"%@\"", _collectionFilepath());
+    return nullptr;
+  }
+  // The copy is read from our own file: the given image may refer to a file that its owner moves or deletes.
+  const auto copy = ImageWrapper::imageWithPath(file);
+  return copy ? copy : image;
 }
 
-bool QuiltCollection::deletePosterImage() const {
+void QuiltCollection::deletePosterImage() const {
   const Path file = posterImagePath();
-  if (file.empty()) return true;
-  const Result<void> removed = services().files->removeItem(file, path());
-  if (!removed) FDYLogger::logCritical("Failed to clear poster image: %@", fullDescription(removed.error()));
-  return removed.hasValue();
+  if (file.empty()) return;
+  if (const Result<void> removed = services().files->removeItem(file, path()); !removed)
+    FDYLogger::logCritical("Failed to clear poster image: %@", fullDescription(removed.error()));
 }
 
 }  // namespace quilt

@@ -129,8 +129,9 @@ class QuiltCollection : public platform::Object {
   /// Where the package of that identity belongs; empty without a folder or for an identity that is no plain name.
   Path packagePath(const std::string& uuid) const;
   void deletePackage(const Path& package) const;
-  bool savePosterImage(const ImageWrapper& image) const;
-  bool deletePosterImage() const;
+  /// Writes the image and answers a copy of it to cache; null after a critical line.
+  std::shared_ptr<ImageWrapper> savedPosterImage(const std::shared_ptr<ImageWrapper>& image) const;
+  void deletePosterImage() const;
 
   platform::Property<std::string> _uuid{*this, "uuid"};
   platform::Property<Path> _path{*this, "path"};

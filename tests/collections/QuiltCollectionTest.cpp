@@ -697,6 +697,21 @@ TEST_F(QuiltCollectionTest, ThePosterIsReadFromItsFileOnFirstUse) {
   EXPECT_EQ(collection->posterImage(), image);
 }
 
+TEST_F(QuiltCollectionTest, ThePosterOutlivesTheFileThatItWasTakenFrom) {
+  const Path photo = folder() / "photo.png";
+  ASSERT_TRUE(picture(30, 20)->saveAsPNGAtURL(Url::fileUrl(photo)));
+  const auto collection = made();
+  collection->setPosterImage(ImageWrapper::imageWithPath(photo));
+  std::filesystem::remove(photo);
+
+  const auto image = collection->posterImage();
+
+  ASSERT_TRUE(image);
+  const auto pixels = image->bitmap();
+  ASSERT_TRUE(pixels);
+  EXPECT_EQ(pixels->width, 30u);
+}
+
 TEST_F(QuiltCollectionTest, ClearingThePosterDeletesItsFile) {
   const auto collection = made();
   collection->setPosterImage(picture(30, 20));

@@ -414,7 +414,7 @@ TEST_F(QuiltCollectionsControllerTest, ACollectionThatCannotBeMadeIsReportedWith
 TEST_F(QuiltCollectionsControllerTest, AnIdentityThatIsNoPlainNameIsRefused) {
   EXPECT_TRUE(load());
   for (const std::string& uuid : {std::string("../escape"), std::string("a/b"), std::string("/tmp"), std::string(".."),
-                                 std::string("."), std::string(), std::string(300, 'x')}) {
+                                  std::string("."), std::string(), std::string(300, 'x')}) {
     takeLines();
     EXPECT_FALSE(controller->newCollectionWithUUID(uuid)) << uuid;
     EXPECT_THAT(takeLines(), SizeIs(1)) << uuid;

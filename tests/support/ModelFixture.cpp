@@ -5,7 +5,6 @@
 #include <cstdlib>
 #include <fstream>
 #include <iterator>
-#include <mutex>
 #include <stdexcept>
 
 #include "quilt/platform/base/Date.h"
@@ -40,38 +39,25 @@ Date dateOf(std::string_view iso8601) {
   return *date;
 }
 
-class ModelFixture::Recorder final : public platform::LogSink {
- public:
-  void write(LogLevel level, const std::string& message) override {
-    const std::lock_guard guard(_mutex);
-    _lines.push_back({level, message});
-  }
-  Lines take() {
-    const std::lock_guard guard(_mutex);
-    return std::exchange(_lines, {});
-  }
-
- private:
-  std::mutex _mutex;
-  Lines _lines;
-};
-
-ModelFixture::ModelFixture() : _recorder(std::make_shared<Recorder>()) {
+ModelFixture::ModelFixture() {
   static const bool installed = (platform::install(), true);
   (void)installed;
   std::string name = (std::filesystem::temp_directory_path() / "quilt-test-XXXXXX").native();
   if (!mkdtemp(name.data())) throw std::runtime_error("no folder for the test: " + name);
   _folder = name;
-  platform::FDYLogger::addSink(_recorder);
 }
 
 ModelFixture::~ModelFixture() {
-  platform::FDYLogger::removeSink(_recorder);
   std::error_code ignored;
   std::filesystem::remove_all(_folder, ignored);
 }
 
-Lines ModelFixture::takeLines() { return _recorder->take(); }
+Lines ModelFixture::takeLines() {
+  Lines lines;
+  for (const auto& [level, text] : _log->lines()) lines.push_back({level, text});
+  _log->clear();
+  return lines;
+}
 
 Lines ModelFixture::takeProblems() {
   Lines lines = takeLines();

@@ -8,8 +8,8 @@
 #include <string>
 #include <vector>
 
-#include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/interfaces/Services.h"
+#include "quilt/platform/testing/RecordingLogSink.h"
 #include "quilt/sources/ModelTypes.h"
 
 namespace quilt::support {
@@ -66,10 +66,8 @@ class ModelFixture : public ::testing::Test {
   static std::shared_ptr<ImageWrapper> picture(std::size_t width, std::size_t height);
 
  private:
-  class Recorder;
-
   Path _folder;
-  std::shared_ptr<Recorder> _recorder;
+  platform::ScopedLog _log;
 };
 
 }  // namespace quilt::support
