@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <cstdint>
+#include <mutex>
 #include <set>
 
 #include "quilt/documents/QuiltDocument.h"
@@ -19,7 +21,8 @@ class QuiltCollection : public platform::Object {
   // Construction
   /// A detached collection: fresh identity, made now, no folder.
   static std::shared_ptr<QuiltCollection> init();
-  /// Opens the folder with its documents, or makes it when nothing is there. Null when that fails; the reason is logged.
+  /// Opens the folder with its documents, or makes it when nothing is there. Null when that fails; the reason is
+  /// logged.
   static std::shared_ptr<QuiltCollection> initWithPath(const Path& path);
 
   // Properties
@@ -53,7 +56,9 @@ class QuiltCollection : public platform::Object {
   void setPreferredTheme(std::shared_ptr<QuiltTheme> theme) { _preferredTheme.set(std::move(theme)); }
   Text lastPublishURL() const { return _lastPublishURL.get(); }
   void setLastPublishURL(Text url) { _lastPublishURL.set(std::move(url)); }
-  std::shared_ptr<QuiltCollectionsController> collectionControllerOwner() const { return _collectionControllerOwner.get(); }
+  std::shared_ptr<QuiltCollectionsController> collectionControllerOwner() const {
+    return _collectionControllerOwner.get();
+  }
   void setCollectionControllerOwner(const std::shared_ptr<QuiltCollectionsController>& owner) {
     _collectionControllerOwner.set(owner);
   }
@@ -96,16 +101,19 @@ class QuiltCollection : public platform::Object {
   /// At most `count`, newest first.
   std::vector<std::shared_ptr<QuiltDocument>> lastCreatedDocuments(std::size_t count) const;
   void addDocument(const std::shared_ptr<QuiltDocument>& document);
-  /// Takes the document out of the list; with `andDelete` also deletes its package.
+  /// Takes the document out of the list; with `andDelete` also deletes its package. A package that cannot be deleted, or
+  /// that lies outside the collection's folder, stays, with a warning.
   void removeDocument(const std::shared_ptr<QuiltDocument>& document, bool andDelete);
   void removeAllDocumentsAndDelete(bool andDelete);
-  /// Deletes the packages of classic documents that hold no media.
+  /// Takes out the classic documents that hold no media and deletes their packages. A package whose record names media
+  /// that did not load is damaged, not empty: it stays on disk.
   void removeAllBrokenDocuments();
   /// Makes and saves an empty document with the collection's author and theme. Null after a critical line.
   std::shared_ptr<QuiltDocument> newDocumentWithType(const Text& type);
-  /// Makes a document of a file: inspects it, adds it as the one item, and copies it into the package. A file of a type
-  /// that cannot be imported gives an empty document. Null, after a critical line, on failure or when the block answers
-  /// false. Reports 10 to 100.
+  /// Makes a document of a file: inspects it, adds it as the one item, and copies it into the package, which is named by
+  /// `withUUID` (a fresh one for none). A file of a type that cannot be imported gives an empty document. Null, after a
+  /// critical line, on failure or when the block answers false; the package is then gone, unless it was there before.
+  /// Reports 10 to 100, on the calling thread.
   std::shared_ptr<QuiltDocument> importDocumentFromPath(const Path& path, const Text& withUUID,
                                                         const ProgressionBlock& withProgressionBlock);
   std::shared_ptr<QuiltDocument> importDocumentFromPath(const Path& path, const ProgressionBlock& withProgressionBlock);
@@ -115,7 +123,15 @@ class QuiltCollection : public platform::Object {
   std::vector<std::string_view> keysDependingOn(std::string_view key) const override;
 
  private:
-  bool fillFromFile(QuiltDocument& document, const std::shared_ptr<QuiltDocument>& shared, const Path& file) const;
+  void saveWhenChanged();
+  /// A place in the folder; empty without one.
+  Path inFolder(const std::string& name) const;
+  /// Where the package of that identity belongs; empty without a folder or for an identity that is no plain name.
+  Path packagePath(const std::string& uuid) const;
+  void deletePackage(const Path& package) const;
+  /// Writes the image and answers a copy of it to cache; null after a critical line.
+  std::shared_ptr<ImageWrapper> savedPosterImage(const std::shared_ptr<ImageWrapper>& image) const;
+  void deletePosterImage() const;
 
   platform::Property<std::string> _uuid{*this, "uuid"};
   platform::Property<Path> _path{*this, "path"};
@@ -128,13 +144,18 @@ class QuiltCollection : public platform::Object {
   platform::Property<Text> _keywords{*this, "keywords"};
   platform::Property<Text> _category{*this, "category"};
   platform::Property<Text> _advisoryLabel{*this, "advisoryLabel"};
-  platform::Property<std::shared_ptr<ImageWrapper>> _posterImage{*this, "posterImage"};
+  std::mutex _posterMutex;  // held from the look at the file to the change of the cache; nothing else is locked under it
+  std::shared_ptr<ImageWrapper> _posterImage;
   platform::Property<std::shared_ptr<QuiltTheme>> _preferredTheme{*this, "preferredTheme"};
-  platform::ChildList<QuiltDocument, QuiltCollection> _documents{*this, "documents", &QuiltDocument::setCollectionOwner};
+  platform::ChildList<QuiltDocument, QuiltCollection> _documents{*this, "documents",
+                                                                 &QuiltDocument::setCollectionOwner};
   platform::Property<Text> _lastPublishURL{*this, "lastPublishURL"};
   platform::WeakProperty<QuiltCollectionsController> _collectionControllerOwner{*this, "collectionControllerOwner"};
   platform::Property<bool> _isLoading{*this, "isLoading"};
-  Dictionary _unknownEntries;
+  platform::Property<Dictionary> _unknownEntries{*this, "unknownEntries"};
+  std::uint64_t _recordsBuilt = 0;  // guarded by the document list's lock
+  std::mutex _saving;               // nothing else is locked under it
+  std::uint64_t _newestSaved = 0;   // the turn of the record on disk; guarded by _saving
   std::vector<platform::Observation> _observations;  // last: ends before the properties do
 };
 

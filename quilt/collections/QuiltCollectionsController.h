@@ -47,6 +47,8 @@ class QuiltCollectionsController : public platform::Object {
   QuiltCollectionsController() = default;
 
  private:
+  void deleteFolder(const Path& folder) const;
+
   platform::Property<Path> _libraryPath{*this, "libraryPath"};
   platform::Property<bool> _loadingCollections{*this, "loadingCollections"};
   platform::Property<bool> _isUpdating{*this, "isUpdating"};

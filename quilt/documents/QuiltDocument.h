@@ -186,11 +186,19 @@ class QuiltDocument : public platform::Object {
 
  private:
   Path inPackage(std::initializer_list<const char*> components) const;
-  bool isSavingElsewhere() const;
+  /// The title, or the fall-back for a missing or empty one.
   std::string displayTitle() const;
+  bool readProperties(const Path& file);
+  void apply(const Dictionary& record);
   bool writeProperties();
-  bool finalizeMedia(const ProgressionBlock& block, bool& cancelled);
+  /// Whether a load, a long operation or a save of this thread runs.
+  bool isBusy() const;
+  /// Sets isProcessing and answers the media lock, or none while busy. Waits for another thread's save.
+  std::optional<platform::MonitorLock> beginProcessing();
+  enum class Outcome { Done, Failed, Cancelled };
+  Outcome finalizeMedia(const ProgressionBlock& block);
   bool finalizeInteractive();
+  Outcome flattenMedia(const ProgressionBlock& block);
 
   platform::Property<std::string> _uuid{*this, "uuid"};
   platform::Property<Path> _path{*this, "path"};

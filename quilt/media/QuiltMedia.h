@@ -121,13 +121,22 @@ class QuiltMedia : public platform::Object {
  private:
   void updateDocumentUnlessProcessing() const;
   template <class List, class Child>
+  void insertChild(List& list, const Child& child, std::size_t index);
+  template <class List, class Child>
+  void appendChild(List& list, const Child& child);
+  template <class List>
+  void moveChildren(List& list, const IndexSet& indexes, std::size_t target);
+  template <class List, class Child>
   void removeChild(List& list, const Child& child, const char* warning);
-  std::shared_ptr<ImageWrapper> drawPoster();
+  bool flattenChildren(const ProgressionBlock& block);
+  bool finalizeChildren(const ProgressionBlock& block);
+  std::shared_ptr<ImageWrapper> dualSourcePoster();
+  std::shared_ptr<ImageWrapper> montagePoster();
 
   platform::Property<std::string> _uuid{*this, "uuid"};
   platform::Property<Text> _title{*this, "title"};
   platform::Property<Text> _description{*this, "description"};
-  mutable platform::Property<Text> _contentCategory;
+  mutable platform::Property<Text> _contentCategory{*this, "contentCategory"};
   platform::Property<std::shared_ptr<ImageWrapper>> _posterImage{*this, "posterImage"};
   platform::Property<std::uint64_t> _posterImageVersion{*this, "posterImageVersion", 1};
   platform::ChildList<QuiltMediaSource, QuiltMedia> _sources{*this, "sources", &QuiltMediaSource::setMediaOwner};

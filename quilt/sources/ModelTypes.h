@@ -26,8 +26,8 @@ using platform::ObjectProgressionBlock;
 using platform::ProgressionBlock;
 using platform::Url;
 
-using Path = std::filesystem::path;        ///< empty: none
-using Text = std::optional<std::string>;   ///< UTF-8
+using Path = std::filesystem::path;       ///< empty: none
+using Text = std::optional<std::string>;  ///< UTF-8
 
 /// The timecode of a source or preview that has none; it is not written to a source's record.
 inline constexpr double kNoTimecode = std::numeric_limits<float>::max();

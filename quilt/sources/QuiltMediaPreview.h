@@ -13,7 +13,7 @@ class QuiltMediaSource;
 class QuiltMediaPreview : public platform::Object {
  public:
   static std::shared_ptr<QuiltMediaPreview> init();
-  /// A preview of the image fitted into high definition. An absent image gives a preview without one.
+  /// A preview of the image fitted into high definition. Null for an absent image.
   static std::shared_ptr<QuiltMediaPreview> initWithImageWrapper(const std::shared_ptr<ImageWrapper>& imageWrapper);
   /// Reads a record. Null, after a warning, when its identity is no plain file name.
   static std::shared_ptr<QuiltMediaPreview> initWithDictionary(const Dictionary& dictionary,

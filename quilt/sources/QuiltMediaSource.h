@@ -154,7 +154,6 @@ class QuiltMediaSource : public platform::Object {
 
  protected:
   QuiltMediaSource();
-  void read(const Dictionary& dictionary);
   /// Fills a fresh object from a record; false, after a warning, when the record is refused.
   bool initializeWithDictionary(const Dictionary& dictionary, const std::shared_ptr<QuiltMedia>& andMedia);
   bool initializeWithURL(const Url& url);
@@ -162,10 +161,11 @@ class QuiltMediaSource : public platform::Object {
  private:
   std::shared_ptr<QuiltDocument> document() const;
   void updateDocumentUnlessProcessing() const;
-  std::shared_ptr<QuiltMediaPreview> makePreview(std::size_t index);
-  std::shared_ptr<QuiltMediaPreview> makeMoviePreview(std::size_t index, const QuiltMediaDerivative& main);
+  struct PreviewContent;
+  std::shared_ptr<QuiltMediaPreview> existingPreview(std::size_t index) const;
+  std::shared_ptr<QuiltMediaPreview> makePreview(const PreviewContent& content, std::size_t index);
   bool convertImage(const std::string& format);
-  bool convertAudio(const ProgressionBlock& block);
+  bool convertAudio(const std::string& format, const ProgressionBlock& block);
   bool convertMovie(const std::string& format, const ProgressionBlock& block);
   bool adoptConverted(const Path& file, const std::string& format);
   Path newHiddenFile(const std::string& extension) const;

@@ -18,9 +18,9 @@ namespace quilt::platform {
 /// An ordered list of children with its lock, its announcements and its children's back-pointers: the one shape that
 /// every list of the model has.
 ///
-/// Each operation holds the list's recursive lock for its whole run; lock() holds it over several. A change that someone
-/// observes is made on the main thread, between the will- and did-change announcements of the list's key, while the
-/// calling thread keeps the lock. A change that no one observes is made where it is.
+/// Each operation holds the list's recursive lock for its whole run; lock() holds it over several. A change that
+/// someone observes is made on the main thread, between the will- and did-change announcements of the list's key, while
+/// the calling thread keeps the lock. A change that no one observes is made where it is.
 template <class Child, class Owner>
 class ChildList {
  public:

@@ -23,8 +23,8 @@ enum class ErrorKind {
 /// An error as every layer passes it on: worded once, by whoever detected it.
 struct Error {
   ErrorKind kind;
-  std::string text;             ///< one sentence for people, without the file's name
-  std::filesystem::path file;   ///< the file concerned; empty when there is none
+  std::string text;            ///< one sentence for people, without the file's name
+  std::filesystem::path file;  ///< the file concerned; empty when there is none
 };
 
 }  // namespace quilt::platform

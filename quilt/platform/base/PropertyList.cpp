@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "quilt/platform/base/PropertyList.h"
 
-
 namespace quilt::platform {
 
 namespace {

@@ -71,22 +71,26 @@ class PropertyList {
  public:
   using Value = std::variant<bool, std::int64_t, double, std::string, Date, Data, Array, Dictionary>;
 
-  PropertyList(bool value) : _value(value) {}                        // NOLINT(google-explicit-constructor)
-  PropertyList(int value) : _value(std::int64_t{value}) {}           // NOLINT(google-explicit-constructor)
-  PropertyList(std::int64_t value) : _value(value) {}                // NOLINT(google-explicit-constructor)
-  PropertyList(double value) : _value(value) {}                      // NOLINT(google-explicit-constructor)
-  PropertyList(const char* value) : _value(std::string(value)) {}    // NOLINT(google-explicit-constructor)
-  PropertyList(std::string value) : _value(std::move(value)) {}      // NOLINT(google-explicit-constructor)
-  PropertyList(Date value) : _value(value) {}                        // NOLINT(google-explicit-constructor)
-  PropertyList(Data value) : _value(std::move(value)) {}             // NOLINT(google-explicit-constructor)
-  PropertyList(Array value) : _value(std::move(value)) {}            // NOLINT(google-explicit-constructor)
-  PropertyList(Dictionary value) : _value(std::move(value)) {}       // NOLINT(google-explicit-constructor)
+  PropertyList(bool value) : _value(value) {}                      // NOLINT(google-explicit-constructor)
+  PropertyList(int value) : _value(std::int64_t{value}) {}         // NOLINT(google-explicit-constructor)
+  PropertyList(std::int64_t value) : _value(value) {}              // NOLINT(google-explicit-constructor)
+  PropertyList(double value) : _value(value) {}                    // NOLINT(google-explicit-constructor)
+  PropertyList(const char* value) : _value(std::string(value)) {}  // NOLINT(google-explicit-constructor)
+  PropertyList(std::string value) : _value(std::move(value)) {}    // NOLINT(google-explicit-constructor)
+  PropertyList(Date value) : _value(value) {}                      // NOLINT(google-explicit-constructor)
+  PropertyList(Data value) : _value(std::move(value)) {}           // NOLINT(google-explicit-constructor)
+  PropertyList(Array value) : _value(std::move(value)) {}          // NOLINT(google-explicit-constructor)
+  PropertyList(Dictionary value) : _value(std::move(value)) {}     // NOLINT(google-explicit-constructor)
 
   /// The value as a kind, or null when it is of another.
   template <class T>
-  [[nodiscard]] const T* as() const { return std::get_if<T>(&_value); }
+  [[nodiscard]] const T* as() const {
+    return std::get_if<T>(&_value);
+  }
   template <class T>
-  [[nodiscard]] T* as() { return std::get_if<T>(&_value); }
+  [[nodiscard]] T* as() {
+    return std::get_if<T>(&_value);
+  }
 
   [[nodiscard]] const Value& value() const { return _value; }
 

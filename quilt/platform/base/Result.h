@@ -17,8 +17,8 @@ namespace quilt::platform {
 template <class T>
 class [[nodiscard]] Result {
  public:
-  Result(T value) : _content(std::in_place_index<0>, std::move(value)) {}       // NOLINT(google-explicit-constructor)
-  Result(Error error) : _content(std::in_place_index<1>, std::move(error)) {}   // NOLINT(google-explicit-constructor)
+  Result(T value) : _content(std::in_place_index<0>, std::move(value)) {}      // NOLINT(google-explicit-constructor)
+  Result(Error error) : _content(std::in_place_index<1>, std::move(error)) {}  // NOLINT(google-explicit-constructor)
 
   [[nodiscard]] bool hasValue() const { return _content.index() == 0; }
   explicit operator bool() const { return hasValue(); }

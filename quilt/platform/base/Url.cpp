@@ -13,7 +13,8 @@ constexpr char kHex[] = "0123456789ABCDEF";
 
 // The characters of RFC 3986 that a path may hold unencoded, without those that old readers trip over.
 bool standsForItself(unsigned char c) {
-  return std::isalnum(c) != 0 || std::string_view("-._~/!$&'()*+,=:@").find(static_cast<char>(c)) != std::string_view::npos;
+  return std::isalnum(c) != 0 ||
+         std::string_view("-._~/!$&'()*+,=:@").find(static_cast<char>(c)) != std::string_view::npos;
 }
 
 int hexValue(char c) {
@@ -57,7 +58,8 @@ std::string percentDecoded(std::string_view text) {
 
 std::string lowercase(std::string_view text) {
   std::string out(text);
-  std::transform(out.begin(), out.end(), out.begin(), [](unsigned char c) { return static_cast<char>(std::tolower(c)); });
+  std::transform(out.begin(), out.end(), out.begin(),
+                 [](unsigned char c) { return static_cast<char>(std::tolower(c)); });
   return out;
 }
 

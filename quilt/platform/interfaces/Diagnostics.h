@@ -8,7 +8,7 @@ namespace quilt::platform {
 
 /// One decoder, encoder, renderer or library, as the program's `doctor` lists it.
 struct Capability {
-  std::string name;     ///< "H.264 decoder"
+  std::string name;  ///< "H.264 decoder"
   bool present = false;
   std::string version;  ///< of the library behind it; empty when absent
   std::string remedy;   ///< what to do when it is absent; empty when present

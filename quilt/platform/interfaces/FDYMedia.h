@@ -20,12 +20,12 @@ struct Chapter {
 /// What an inspector saw in a file.
 struct MediaFacts {
   bool hasAudio = false;
-  bool hasVideo = false;          ///< real video; a cover picture is none
-  std::string audioCodecName;     ///< "AAC", "Kestrel Lossless", "MP3", …; empty without audio
-  std::string videoCodecName;     ///< "H.264", "HEVC", …; empty without video
-  double width = 0;               ///< displayed pixels: rotation and pixel shape applied; 0 when unknown
+  bool hasVideo = false;       ///< real video; a cover picture is none
+  std::string audioCodecName;  ///< "AAC", "Kestrel Lossless", "MP3", …; empty without audio
+  std::string videoCodecName;  ///< "H.264", "HEVC", …; empty without video
+  double width = 0;            ///< displayed pixels: rotation and pixel shape applied; 0 when unknown
   double height = 0;
-  double duration = 0;            ///< seconds; 0 when unknown
+  double duration = 0;  ///< seconds; 0 when unknown
   std::optional<std::string> mimeType;
   std::optional<std::string> metadataTitle;
   std::optional<std::string> metadataInformation;

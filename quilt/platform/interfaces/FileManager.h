@@ -95,7 +95,8 @@ class FileManager {
                        CopyCallback callback, void* context) = 0;
 
   /// The whole file. Fails as Damaged when it is longer than `maximum` bytes.
-  [[nodiscard]] virtual Result<std::string> readFile(const std::filesystem::path& path, std::uint64_t maximum) const = 0;
+  [[nodiscard]] virtual Result<std::string> readFile(const std::filesystem::path& path,
+                                                     std::uint64_t maximum) const = 0;
 
   /// Replaces the file whole: writes a hidden temporary file beside it, syncs, renames, syncs the folder. Whatever
   /// happens, the path holds the old or the new content; the temporary file is removed on failure. Keeps the

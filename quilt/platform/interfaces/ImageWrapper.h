@@ -49,9 +49,11 @@ class Images {
   virtual ~Images() = default;
 
   /// Reads the header only.
-  [[nodiscard]] virtual Result<std::shared_ptr<ImageWrapper>> imageWithPath(const std::filesystem::path& path) const = 0;
+  [[nodiscard]] virtual Result<std::shared_ptr<ImageWrapper>> imageWithPath(
+      const std::filesystem::path& path) const = 0;
   /// An encoded image in memory, copied.
-  [[nodiscard]] virtual Result<std::shared_ptr<ImageWrapper>> imageWithData(std::span<const unsigned char> data) const = 0;
+  [[nodiscard]] virtual Result<std::shared_ptr<ImageWrapper>> imageWithData(
+      std::span<const unsigned char> data) const = 0;
   [[nodiscard]] virtual Result<std::shared_ptr<ImageWrapper>> imageWithBitmap(Bitmap bitmap) const = 0;
 };
 

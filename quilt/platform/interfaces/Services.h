@@ -14,6 +14,7 @@
 #include "quilt/platform/interfaces/FileManager.h"
 #include "quilt/platform/interfaces/Glance.h"
 #include "quilt/platform/interfaces/ImageWrapper.h"
+#include "quilt/platform/interfaces/Json.h"
 #include "quilt/platform/interfaces/MovieToolkit.h"
 #include "quilt/platform/interfaces/PropertyLists.h"
 #include "quilt/platform/interfaces/Resources.h"
@@ -41,6 +42,7 @@ struct Services {
   std::shared_ptr<Bundles> bundles;
   std::shared_ptr<RunLoop> runLoop;
   std::shared_ptr<Diagnostics> diagnostics;
+  std::shared_ptr<JsonWriter> json;
 };
 
 /// The process's set. Written by installServices and ScopedService only.

@@ -1,0 +1,132 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "quilt/collections/QuiltCollectionsController.h"
+
+#include <algorithm>
+
+#include "quilt/platform/base/FDYLogger.h"
+#include "quilt/platform/base/Paths.h"
+#include "quilt/platform/interfaces/Services.h"
+
+namespace quilt {
+
+using platform::FDYLogger;
+using platform::Result;
+using platform::services;
+
+std::shared_ptr<QuiltCollectionsController> QuiltCollectionsController::defaultController() {
+  // Never destroyed: the host may use it while the process ends.
+  static const auto& controller = *new std::shared_ptr<QuiltCollectionsController>(init());
+  return controller;
+}
+
+std::shared_ptr<QuiltCollectionsController> QuiltCollectionsController::init() {
+  struct Made final : QuiltCollectionsController {};
+  return std::make_shared<Made>();
+}
+
+Path QuiltCollectionsController::_collectionsDirectory() const {
+  const Path library = libraryPath();
+  return library.empty() ? library : library / "Collections";
+}
+
+bool QuiltCollectionsController::loadLibraryPath(const Path& path,
+                                                 const ObjectProgressionBlock<QuiltCollection>& withProgressionBlock) {
+  // The exchange lets one of two threads pass; the look before it keeps a refused load from announcing anything.
+  if (loadingCollections() || _loadingCollections.exchange(true)) return false;
+  FDYLogger::logDebug("Loading collections at path \"%@\"...", path);
+  setLibraryPath(path);
+  _collections.assign({});
+
+  platform::FileManager& files = *services().files;
+  const Path directory = _collectionsDirectory();
+  if (!files.fileExistsAtPath(directory))
+    if (const Result<void> made = files.createDirectoryAtPath(directory); !made)
+      FDYLogger::logCritical("Failed to create collections directory at path \"%@\": \"%@\"", directory, made.error());
+
+  const Result<std::vector<std::string>> listing = files.contentsOfDirectoryAtPath(directory);
+  if (!listing) {
+    // The loading flag stays set: a library that cannot be listed refuses every later load.
+    FDYLogger::logCritical("Failed to load collections in directory \"%@\": \"%@\"", directory, listing.error());
+    return false;
+  }
+  const auto isVisible = [](const std::string& name) { return !name.starts_with("."); };
+  const auto total = static_cast<std::size_t>(std::count_if(listing->begin(), listing->end(), isVisible));
+  std::size_t done = 0;
+  for (const std::string& name : *listing) {
+    if (!isVisible(name)) continue;
+    const auto collection = QuiltCollection::initWithPath(directory / name);
+    addCollection(collection);
+    if (!platform::report(withProgressionBlock, collection, platform::integerPercentage(++done, total))) {
+      FDYLogger::logCritical("Loading collections at path \"%@\" has been cancelled", path);
+      setLoadingCollections(false);
+      return false;
+    }
+  }
+  platform::report(withProgressionBlock, std::shared_ptr<QuiltCollection>(), 100);
+  setLoadingCollections(false);
+  return true;
+}
+
+bool QuiltCollectionsController::update() {
+  if (loadingCollections() || isUpdating() || _isUpdating.exchange(true)) return false;
+  const bool hasLibrary = !libraryPath().empty();
+  if (hasLibrary) {
+    _collections.walk([](const std::shared_ptr<QuiltCollection>& collection) {
+      collection->update();
+      return true;
+    });
+  } else {
+    FDYLogger::logCritical("Failed to update collections because there is no library path available");
+  }
+  setIsUpdating(false);
+  return hasLibrary;
+}
+
+std::shared_ptr<QuiltCollection> QuiltCollectionsController::collectionWithUUID(const std::string& uuid) const {
+  return _collections.first(
+      [&uuid](const std::shared_ptr<QuiltCollection>& collection) { return collection->uuid() == uuid; });
+}
+
+void QuiltCollectionsController::performBlockOnCollections(
+    const std::function<bool(const std::shared_ptr<QuiltCollection>&)>& block) const {
+  _collections.walk(block);
+}
+
+void QuiltCollectionsController::addCollection(const std::shared_ptr<QuiltCollection>& collection) {
+  _collections.append(collection);
+}
+
+void QuiltCollectionsController::removeCollection(const std::shared_ptr<QuiltCollection>& collection,
+                                                  bool andDeleteDocuments) {
+  if (!collection) return;
+  const platform::MonitorLock lock = _collections.lock();
+  collection->removeAllDocumentsAndDelete(andDeleteDocuments);
+  if (andDeleteDocuments) deleteFolder(collection->path());
+  _collections.remove(collection);
+}
+
+void QuiltCollectionsController::deleteFolder(const Path& folder) const {
+  platform::FileManager& files = *services().files;
+  if (folder.empty() || !files.fileExistsAtPath(folder)) return;
+  if (const Result<void> removed = files.removeItem(folder, _collectionsDirectory()); !removed)
+    FDYLogger::logWarning("Failed to remove collection at path \"%@\": \"%@\"", folder, removed.error());
+}
+
+std::shared_ptr<QuiltCollection> QuiltCollectionsController::newCollectionWithUUID(const Text& uuid) {
+  const std::string name = uuid ? *uuid : platform::generateUUID();
+  const Path directory = _collectionsDirectory();
+  const Path folder = directory.empty() ? directory : directory / name;
+  // Without a library, or with an identity that would lead out of it, there is no place to make the folder.
+  const bool hasPlace = !folder.empty() && platform::isPlainComponent(name);
+  const auto collection = hasPlace ? QuiltCollection::initWithPath(folder) : nullptr;
+  if (!collection) {
+    FDYLogger::logCritical("Failed to create a new empty collection at path \"%@\"", folder);
+    return nullptr;
+  }
+  collection->setUuid(name);
+  addCollection(collection);
+  collection->setCreationDate(collection->modifiedDate());
+  return collection;
+}
+
+}  // namespace quilt

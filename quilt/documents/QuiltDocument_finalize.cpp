@@ -1,0 +1,130 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "quilt/collections/QuiltCollection.h"
+#include "quilt/documents/QuiltDocument.h"
+#include "quilt/platform/base/FDYLogger.h"
+#include "quilt/platform/base/Paths.h"
+#include "quilt/platform/interfaces/Services.h"
+
+namespace quilt {
+
+using platform::FDYLogger;
+using platform::integerPercentage;
+using platform::report;
+using platform::services;
+
+namespace {
+
+/// What the template learns of the collection: the pairs up to the first that has no value.
+Dictionary ownerRecord(const std::shared_ptr<QuiltCollection>& collection) {
+  Dictionary record;
+  if (!collection) return record;
+  record.append("UUID", collection->uuid());
+  const Text title = collection->title();
+  if (!title) return record;
+  record.append("Title", *title);
+  const Text description = collection->description();
+  if (!description) return record;
+  record.append("Description", *description);
+  if (const auto date = collection->creationDate()) record.append("CreationDate", *date);
+  return record;
+}
+
+}  // namespace
+
+bool QuiltDocument::finalizeWithProgressionBlock(const ProgressionBlock& withProgressionBlock) {
+  constexpr const char* busy = "Failed to finalize document at path \"%@\": \"Document is already being processed\"";
+  if (isBusy()) {
+    FDYLogger::logCritical(busy, path());
+    return false;
+  }
+  report(withProgressionBlock, 0);
+  if (!beginProcessing()) {
+    FDYLogger::logCritical(busy, path());
+    return false;
+  }
+
+  Outcome outcome = finalizeMedia(withProgressionBlock);
+  if (outcome == Outcome::Done && type() == kQuiltDocumentTypeInteractive && !finalizeInteractive())
+    outcome = Outcome::Failed;
+  if (outcome == Outcome::Done) {
+    glanceUpdate();
+    if (!writeProperties()) {
+      FDYLogger::logDebug("Failed to update document at path \"%@\": \"Properties cannot be written\"",
+                          propertiesPath());
+      outcome = Outcome::Failed;
+    }
+  }
+
+  switch (outcome) {
+    case Outcome::Done:
+      report(withProgressionBlock, 100);
+      break;
+    case Outcome::Failed:
+      FDYLogger::logCritical("Failed to finalize document at path \"%@\"", path());
+      break;
+    case Outcome::Cancelled:
+      FDYLogger::logCritical("Finalizing document at path \"%@\" has been cancelled", path());
+      break;
+  }
+  setIsProcessing(false);
+  return outcome == Outcome::Done;
+}
+
+QuiltDocument::Outcome QuiltDocument::finalizeMedia(const ProgressionBlock& block) {
+  const auto guard = _media.lock();
+  const std::size_t total = mediaCount();
+  Outcome outcome = Outcome::Done;
+  std::size_t position = 0;
+  _media.walk([&](const auto& item) {
+    const double start = integerPercentage(position++, total);
+    if (!report(block, start)) {
+      outcome = Outcome::Cancelled;
+      return false;
+    }
+    const bool done = item->finalizeWithProgressionBlock(
+        [&](double percentage) { return report(block, start + percentage / static_cast<double>(total)); });
+    if (done) return true;
+    FDYLogger::logDebug("Failed to finalize media \"%@\" during finalizing document at path \"%@\"", item->uuid(),
+                        path());
+    outcome = Outcome::Failed;
+    return false;
+  });
+  return outcome;
+}
+
+bool QuiltDocument::finalizeInteractive() {
+  const auto chosen = theme();
+  if (!chosen) {
+    FDYLogger::logCritical("Failed to finalize document at path \"%@\": \"No valid theme found\"", path());
+    return false;
+  }
+  if (!applyTheme(chosen, [](double) { return true; })) return false;
+
+  Dictionary data = dictionary();
+  data.remove("ThemePath");
+  if (const auto poster = posterImage()) {
+    data.set("PosterImagePath", platform::pathRelativeTo(posterImagePath(), path()).native());
+    if (!poster->saveAsPNGAtURL(Url::fileUrl(jukeboxArtworkPath()))) {
+      FDYLogger::logDebug("Failed to finalize document at path \"%@\": Failed to copy Jukebox Artwork into place.",
+                          path());
+      return false;
+    }
+  }
+  data.set("CollectionOwner", ownerRecord(collectionOwner()));
+
+  const std::string script = platform::formatMessage("var appData = %@;", {services().json->toJSON(data)});
+  auto written = services().files->createDirectoryAtPath(dataControllerPath().parent_path());
+  if (written) written = services().files->writeAtomically(dataControllerPath(), script);
+  if (!written) {
+    FDYLogger::logDebug("Failed to finalize document at path \"%@\" with data controller: \"%@\"", path(),
+                        written.error());
+    return false;
+  }
+  if (!services().propertyLists->writeDictionary(jukeboxMetadata(), jukeboxMetadataPath())) {
+    FDYLogger::logDebug("Failed to finalize document at path \"%@\" with Jukebox metadata", path());
+    return false;
+  }
+  return true;
+}
+
+}  // namespace quilt

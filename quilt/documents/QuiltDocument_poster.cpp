@@ -1,0 +1,71 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "quilt/documents/QuiltDocument.h"
+#include "quilt/platform/base/FDYLogger.h"
+#include "quilt/platform/interfaces/Services.h"
+#include "quilt/sources/ModelFiles.h"
+#include "quilt/sources/RecordNames.h"
+
+namespace quilt {
+
+using platform::FDYLogger;
+using platform::services;
+
+namespace {
+
+std::shared_ptr<ImageWrapper> placeholderPoster() {
+  const auto image = services().images->imageWithData(services().resources->artwork("PlaceholderPoster", "png"));
+  return image ? (*image)->convertToSD() : nullptr;
+}
+
+}  // namespace
+
+std::shared_ptr<ImageWrapper> QuiltDocument::posterImage() {
+  if (auto cached = _posterImage.get()) return cached;
+  const Path file = posterImagePath();
+  if (file.empty() || !services().files->fileExistsAtPath(file)) {
+    updatePosterImage(nullptr);
+    return _posterImage.get();
+  }
+  const bool isInside = isInsidePackage(file, shared(this), "document poster image");
+  const auto stored = isInside ? ImageWrapper::imageWithPath(file) : nullptr;
+  setPosterImage(stored);
+  if (!stored) FDYLogger::logWarning("Document poster image path \"%@\" is not a valid image", file);
+  return stored;
+}
+
+void QuiltDocument::updatePosterImage(const std::shared_ptr<ImageWrapper>& image) {
+  if (!image) {
+    setPosterImage(placeholderPoster());
+    return;
+  }
+  const auto poster = image->convertToSD();
+  setPosterImage(poster);
+  setPosterImageVersion(posterImageVersion() + 1);
+  const Path file = posterImagePath();
+  if (file.empty() || !poster) return;
+  if (const auto created = createDirectoryIfMissing(file.parent_path()); !created) {
+    FDYLogger::logCritical("Failed to create intermediate directories for document at path \"%@\": \"%@\"",
+                           file.parent_path(), created.error());
+    return;
+  }
+  // Without the file the cache still shows the poster; the next finalize or update tries again.
+  (void)poster->saveAsPNGAtURL(Url::fileUrl(file));
+}
+
+bool QuiltDocument::glanceUpdate() {
+  if (!posterImage()) return true;
+  const Path file = glanceThumbnailPath();
+  const Path folder = file.parent_path();
+  if (const auto created = createDirectoryIfMissing(folder); !created) {
+    FDYLogger::logWarning("Failed to create intermediate directory \"@\" for Glance: \"%@\"", folder, created.error());
+    return false;
+  }
+  const auto poster = posterImage();
+  if (!poster) return true;
+  const bool isInside = isInsidePackage(file, shared(this), "Glance thumbnail");
+  if (isInside && poster->saveAsPNGAtURL(Url::fileUrl(file))) return true;
+  FDYLogger::logWarning("Failed to save Glance thumbnail at path \"%@\"", file);
+  return false;
+}
+
+}  // namespace quilt

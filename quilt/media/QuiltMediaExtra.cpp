@@ -1,0 +1,34 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "quilt/media/QuiltMediaExtra.h"
+
+#include "quilt/media/QuiltMedia.h"
+
+namespace quilt {
+
+std::shared_ptr<QuiltMediaExtra> QuiltMediaExtra::init() {
+  struct Made final : QuiltMediaExtra {};
+  return std::make_shared<Made>();
+}
+
+std::shared_ptr<QuiltMediaExtra> QuiltMediaExtra::initWithURL(const Url& url) {
+  auto extra = init();
+  return extra->initializeWithURL(url) ? extra : nullptr;
+}
+
+std::shared_ptr<QuiltMediaExtra> QuiltMediaExtra::initWithPath(const Path& path) {
+  return initWithURL(Url::fileUrl(path));
+}
+
+std::shared_ptr<QuiltMediaExtra> QuiltMediaExtra::initWithDictionary(const Dictionary& dictionary,
+                                                                     const std::shared_ptr<QuiltMedia>& andMedia) {
+  auto extra = init();
+  return extra->initializeWithDictionary(dictionary, andMedia) ? extra : nullptr;
+}
+
+Path QuiltMediaExtra::path() const {
+  const auto media = mediaOwner();
+  const Path folder = media ? media->extrasFolderPath() : Path();
+  return folder.empty() ? Path() : folder / uuid();
+}
+
+}  // namespace quilt

@@ -1,0 +1,193 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "quilt/platform/ffmpeg/FrameFinder.h"
+
+#include <algorithm>
+#include <limits>
+#include <utility>
+
+#include "quilt/platform/ffmpeg/Duration.h"
+#include "quilt/platform/ffmpeg/Failure.h"
+#include "quilt/platform/ffmpeg/Limits.h"
+
+namespace quilt::platform::ffmpeg {
+
+namespace {
+
+constexpr std::int64_t kNoTime = std::numeric_limits<std::int64_t>::min();
+constexpr int kMostSteps = 12;  // backwards, each at least to the key frame before, and ever longer
+
+std::int64_t presentationTime(const AVPacket& packet) {
+  return packet.pts != AV_NOPTS_VALUE ? packet.pts : packet.dts;  // AV_NOPTS_VALUE when there is neither
+}
+
+std::int64_t presentationTime(const AVFrame& frame) {
+  return frame.best_effort_timestamp != AV_NOPTS_VALUE ? frame.best_effort_timestamp : frame.pts;
+}
+
+}  // namespace
+
+// Packets from a key frame on, in decoding order, as far as they can matter for a time.
+struct FrameFinder::Stretch {
+  std::vector<Packet> packets;
+  std::int64_t firstKey = kNoTime;  // when its first key frame is shown
+  std::int64_t wanted = kNoTime;    // when the frame to be shown starts; none when the packets do not tell
+  int reordering = 0;               // how many packets may come before one that is shown earlier
+};
+
+FrameFinder::FrameFinder(Input& input, AVStream& stream) : _input(input), _stream(stream) {
+  for (unsigned i = 0; i < input.context()->nb_streams; ++i) {
+    AVStream* other = input.context()->streams[i];
+    if (other != &stream) other->discard = AVDISCARD_ALL;
+  }
+}
+
+bool FrameFinder::seekBackward(std::int64_t time) {
+  return av_seek_frame(_input.context(), _stream.index, time, AVSEEK_FLAG_BACKWARD) >= 0;
+}
+
+// The stream's next intact packet; null at the end, on damage and when the time is over.
+Packet FrameFinder::readPacket() {
+  Packet packet(av_packet_alloc());
+  while (packet && !_input.outOfTime() && av_read_frame(_input.context(), packet.get()) >= 0) {
+    if (packet->stream_index == _stream.index && (packet->flags & AV_PKT_FLAG_CORRUPT) == 0) return packet;
+    av_packet_unref(packet.get());
+  }
+  return nullptr;
+}
+
+std::optional<std::int64_t> FrameFinder::keyFrameAtOrBefore(std::int64_t time) {
+  std::int64_t target = time;
+  for (int step = 0; step < kMostSteps && seekBackward(target); ++step) {
+    std::int64_t first = kNoTime;
+    while (const Packet packet = readPacket()) {
+      const std::int64_t shown = presentationTime(*packet);
+      if (shown == AV_NOPTS_VALUE) continue;
+      if (first == kNoTime) first = shown;
+      if ((packet->flags & AV_PKT_FLAG_KEY) == 0) {
+        if (shown > time) break;
+        continue;
+      }
+      if (shown <= time) return shown;
+      break;
+    }
+    if (first == kNoTime || first > target) first = target;
+    const std::int64_t back = (_stream.time_base.den / std::max(1, _stream.time_base.num)) << step;
+    target = std::min(first - 1, target - back / 4);
+  }
+  return std::nullopt;
+}
+
+FrameFinder::Stretch FrameFinder::readStretch(std::int64_t time) {
+  constexpr std::size_t lookBack = 16;  // no codec holds back more frames
+  Stretch stretch;
+  std::size_t bytes = 0;
+  bool areAllTimed = true;
+  while (Packet packet = readPacket()) {
+    const std::int64_t shown = presentationTime(*packet);
+    const bool isKey = (packet->flags & AV_PKT_FLAG_KEY) != 0;
+    if (isKey && stretch.firstKey == kNoTime && shown != AV_NOPTS_VALUE) stretch.firstKey = shown;
+    // Nothing is shown before it is decoded: from here on all is later. One packet past the time is kept, so that there
+    // is a frame even when the time lies before the first.
+    const bool isPast = packet->dts != AV_NOPTS_VALUE && packet->dts > time && !stretch.packets.empty();
+    if (isPast) break;
+    if (packet->pts == AV_NOPTS_VALUE) areAllTimed = false;
+    if (packet->pts != AV_NOPTS_VALUE && packet->pts <= time) stretch.wanted = std::max(stretch.wanted, packet->pts);
+    bytes += static_cast<std::size_t>(packet->size);
+    stretch.packets.push_back(std::move(packet));
+    if (bytes > kHeldPacketBytes) break;
+    int later = 0;
+    const std::size_t count = stretch.packets.size() - 1;
+    for (std::size_t i = count > lookBack ? count - lookBack : 0; i < count; ++i) {
+      const std::int64_t other = presentationTime(*stretch.packets[i]);
+      if (other != AV_NOPTS_VALUE && shown != AV_NOPTS_VALUE && other > shown) ++later;
+    }
+    stretch.reordering = std::max(stretch.reordering, later);
+  }
+  if (!areAllTimed) stretch.wanted = kNoTime;
+  return stretch;
+}
+
+Result<void> FrameFinder::prepareDecoder(const Stretch& stretch) {
+  if (_decoder) {
+    avcodec_flush_buffers(_decoder.get());
+  } else {
+    Result<CodecContext> opened = openDecoder(_stream, 1, _input.path());
+    if (!opened) return opened.error();
+    _decoder = *std::move(opened);
+  }
+  // Some streams do not say how far they reorder, and the decoder then drops frames until it has found out.
+  if (_stream.codecpar->codec_id == AV_CODEC_ID_H264) {
+    _decoder->has_b_frames = std::max(_decoder->has_b_frames, stretch.reordering);
+  }
+  return {};
+}
+
+// Leaves in `best` the last frame up to `time`, and in `first` the earliest frame of all.
+void FrameFinder::decode(const Stretch& stretch, std::int64_t time, Skipping skipping, Frame& best, Frame& first) {
+  const Frame frame(av_frame_alloc());
+  const auto isFound = [&] { return best && stretch.wanted != kNoTime && presentationTime(*best) == stretch.wanted; };
+  const auto receive = [&] {
+    while (frame && !isFound() && avcodec_receive_frame(_decoder.get(), frame.get()) >= 0) {
+      const std::int64_t shown = presentationTime(*frame);
+      const bool isTimed = shown != AV_NOPTS_VALUE;
+      if ((!isTimed || shown <= time) && (!best || !isTimed || shown >= presentationTime(*best))) {
+        best.reset(av_frame_clone(frame.get()));
+      }
+      if (!first || (isTimed && shown < presentationTime(*first))) first.reset(av_frame_clone(frame.get()));
+      av_frame_unref(frame.get());
+    }
+  };
+  for (const Packet& packet : stretch.packets) {
+    if (_input.outOfTime() || isFound()) return;
+    // Frames that no other refers to need no decoding, but for the one to be shown.
+    const bool isNeeded = skipping == Skipping::Nothing || packet->pts == stretch.wanted;
+    _decoder->skip_frame = isNeeded ? AVDISCARD_DEFAULT : AVDISCARD_NONREF;
+    avcodec_send_packet(_decoder.get(), packet.get());  // a damaged packet is one frame less
+    receive();
+  }
+  if (isFound()) return;
+  _decoder->skip_frame = AVDISCARD_DEFAULT;
+  avcodec_send_packet(_decoder.get(), nullptr);
+  receive();
+}
+
+Result<Frame> FrameFinder::frameAtOrBefore(std::int64_t time) {
+  std::int64_t target = time;
+  // Past the last key frame whose data are there, nothing decodes.
+  if (const std::optional<std::int64_t> last = lastCompleteKeyFrame(_input, _stream)) target = std::min(target, *last);
+  const std::int64_t second = _stream.time_base.den / std::max(1, _stream.time_base.num);
+  Frame earliest;
+  for (int step = 0; step < kMostSteps; ++step) {
+    if (!seekBackward(target) && !seekBackward(kNoTime + 1) && step > 0) break;
+    const Stretch stretch = readStretch(time);
+    const std::int64_t reached = stretch.firstKey != kNoTime ? std::min(stretch.firstKey, target) : target;
+    const bool isAtStart =
+        step + 1 == kMostSteps || (_stream.start_time != AV_NOPTS_VALUE && reached <= _stream.start_time);
+    const bool isTooLate = stretch.firstKey == kNoTime || stretch.firstKey > time;
+    if (isAtStart || !isTooLate) {
+      Result<Frame> best = lastFrame(stretch, time, earliest);
+      if (!best || *best) return best;
+      if (isAtStart) break;
+    }
+    target = std::min(reached - 1, target - (second << step) / 4);
+  }
+  if (earliest) return earliest;
+  return Error{ErrorKind::Damaged, "No picture of the movie can be decoded.", _input.path()};
+}
+
+// The last frame of the stretch up to `time`, null when none decodes.
+Result<Frame> FrameFinder::lastFrame(const Stretch& stretch, std::int64_t time, Frame& earliest) {
+  if (Result<void> prepared = prepareDecoder(stretch); !prepared) return prepared.error();
+  Frame best;
+  const bool isTold = stretch.wanted != kNoTime;
+  decode(stretch, time, isTold ? Skipping::FramesNobodyNeeds : Skipping::Nothing, best, earliest);
+  if (isTold && (!best || presentationTime(*best) != stretch.wanted)) {
+    // The wanted frame does not decode: the one before it may be among those that were skipped.
+    avcodec_flush_buffers(_decoder.get());
+    decode(stretch, time, Skipping::Nothing, best, earliest);
+  }
+  if (_input.outOfTime()) return failure(AVERROR_EXIT, _input.path());
+  return best;
+}
+
+}  // namespace quilt::platform::ffmpeg

@@ -1,0 +1,41 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <functional>
+#include <string>
+#include <string_view>
+
+#include "quilt/platform/files/SystemCalls.h"
+
+namespace quilt::platform {
+
+/// A hidden name beside `name`, at most 255 bytes long, that ends differently at each call.
+std::string hiddenNameBeside(std::string_view name);
+
+/// An item in the making, under a hidden name beside the final one. Removed by the destructor unless it was put in
+/// place. The folder stays open while this lives. Operations answer 0 or an error number.
+class TemporaryItem {
+ public:
+  TemporaryItem(SystemCalls& system, int folder, std::string finalName);
+  TemporaryItem(const TemporaryItem&) = delete;
+  TemporaryItem& operator=(const TemporaryItem&) = delete;
+  ~TemporaryItem();
+
+  /// Calls `make` with fresh names until it no longer answers EEXIST.
+  int create(const std::function<int(const std::string& name)>& make);
+
+  /// Renames to the final name: over a file that is there, or only when nothing is there.
+  int replace();
+  int putIfFree();
+
+  [[nodiscard]] const std::string& name() const { return _name; }
+
+ private:
+  SystemCalls& _system;
+  const int _folder;
+  const std::string _finalName;
+  std::string _name;
+  bool _exists = false;
+};
+
+}  // namespace quilt::platform

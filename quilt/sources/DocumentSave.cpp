@@ -1,0 +1,39 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "quilt/sources/DocumentSave.h"
+
+#include <algorithm>
+#include <utility>
+#include <vector>
+
+#include "quilt/documents/QuiltDocument.h"
+
+namespace quilt {
+
+namespace {
+
+struct Deferred {
+  std::size_t depth = 0;
+  std::vector<std::shared_ptr<QuiltDocument>> documents;
+};
+
+thread_local Deferred deferred;
+
+}  // namespace
+
+void requestSave(const std::shared_ptr<QuiltDocument>& document) {
+  if (!document || document->isProcessing()) return;
+  if (deferred.depth == 0) {
+    document->update();
+  } else if (std::find(deferred.documents.begin(), deferred.documents.end(), document) == deferred.documents.end()) {
+    deferred.documents.push_back(document);
+  }
+}
+
+SaveDeferral::SaveDeferral() { ++deferred.depth; }
+
+SaveDeferral::~SaveDeferral() {
+  if (--deferred.depth > 0) return;
+  for (const auto& document : std::exchange(deferred.documents, {})) requestSave(document);
+}
+
+}  // namespace quilt

@@ -1,0 +1,57 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "quilt/sources/ModelFiles.h"
+
+#include <algorithm>
+
+#include "quilt/documents/QuiltDocument.h"
+#include "quilt/platform/base/FDYLogger.h"
+#include "quilt/platform/interfaces/Services.h"
+#include "quilt/sources/copyfile_callback.h"
+
+namespace quilt {
+
+using platform::services;
+
+platform::Result<void> createDirectoryIfMissing(const Path& path) {
+  if (services().files->fileExistsAtPath(path)) return {};
+  return services().files->createDirectoryAtPath(path);
+}
+
+void deleteFromPackage(const Path& path, const std::shared_ptr<QuiltDocument>& document, const char* warning) {
+  if (path.empty() || !services().files->fileExistsAtPath(path)) return;
+  const auto removed = services().files->removeItem(path, document ? document->path() : Path());
+  if (!removed) platform::FDYLogger::logWarning(warning, path, removed.error());
+}
+
+platform::Result<double> megaBytesOfFile(const Path& path) {
+  const auto attributes = services().files->attributesOfItemAtPath(path);
+  if (!attributes) return attributes.error();
+  constexpr float kilo = 1.0F / 1024.0F;
+  return static_cast<double>(static_cast<float>(attributes->size) * kilo * kilo);
+}
+
+std::string fileNameForTitle(const std::string& title) {
+  constexpr std::size_t longest = 200;
+  std::string name = title;
+  std::erase(name, '\0');
+  std::replace(name.begin(), name.end(), '.', '_');
+  std::replace(name.begin(), name.end(), '/', '-');
+  if (name.size() <= longest) return name;
+  std::size_t end = longest;
+  const auto continuesCharacter = [&name](std::size_t at) {
+    return (static_cast<unsigned char>(name[at]) & 0xC0) == 0x80;
+  };
+  while (end > 0 && continuesCharacter(end)) --end;
+  return name.substr(0, end);
+}
+
+std::string untitledEpisode() { return services().resources->localizedString("Untitled Episode", "Untitled Episode"); }
+
+int copyReportingPercentage(const Path& source, const Path& destination, std::uint64_t size,
+                            const ProgressionBlock& block) {
+  // Sizes beyond 2 GiB wrap, and so do the percentages reported for them; the copy itself does not depend on either.
+  CopyContext context{static_cast<std::int32_t>(size), block};
+  return services().files->copyfile(source, destination, copyfile_callback, &context);
+}
+
+}  // namespace quilt

@@ -1,0 +1,37 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <string>
+
+#include "quilt/platform/base/Result.h"
+#include "quilt/sources/ModelTypes.h"
+
+namespace quilt {
+
+class QuiltDocument;
+
+/// The file routines that several classes of the model share. Any thread.
+
+/// Makes the folder with its parents unless something is there.
+platform::Result<void> createDirectoryIfMissing(const Path& path);
+
+/// Deletes a file or folder of the document's package, when something is there. A failure (also: the item lies outside
+/// the package, or there is no document) logs `warning` with the path and the error's text.
+void deleteFromPackage(const Path& path, const std::shared_ptr<QuiltDocument>& document, const char* warning);
+
+/// A size in megabytes: the bytes in single precision, divided twice by 1024.
+platform::Result<double> megaBytesOfFile(const Path& path);
+
+/// A title as the base of a file name: "." becomes "_" and "/" becomes "-". Cut, between characters, to leave room for
+/// a counter and an extension in a file name's 255 bytes.
+std::string fileNameForTitle(const std::string& title);
+
+/// The localised "Untitled Episode".
+std::string untitledEpisode();
+
+/// Copies one file with copyfile_callback, which hands the percentage copied to the block. `size` is the file's size in
+/// bytes. The copy routine's result: negative when it failed or the block answered false; nothing is left then.
+int copyReportingPercentage(const Path& source, const Path& destination, std::uint64_t size,
+                            const ProgressionBlock& block);
+
+}  // namespace quilt

@@ -1,0 +1,288 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "quilt/sources/QuiltMediaDerivative.h"
+
+#include <algorithm>
+
+#include "quilt/documents/QuiltDocument.h"
+#include "quilt/media/QuiltMedia.h"
+#include "quilt/platform/base/FDYLogger.h"
+#include "quilt/platform/base/Paths.h"
+#include "quilt/platform/interfaces/Services.h"
+#include "quilt/sources/ModelFiles.h"
+#include "quilt/sources/QuiltMediaSource.h"
+#include "quilt/sources/RecordNames.h"
+
+namespace quilt {
+
+using platform::FDYLogger;
+using platform::FDYMedia;
+using platform::FDYTypePreferredIdentifier;
+using platform::services;
+namespace types = platform::types;
+
+namespace {
+
+constexpr const char* kDesktop = kQuiltMediaDerivativeCompatibilityTagDesktop;
+constexpr const char* k720p = kQuiltMediaDerivativeCompatibilityTag720p;
+constexpr const char* k480p = kQuiltMediaDerivativeCompatibilityTag480p;
+
+constexpr std::string_view kKeys[] = {
+    "UUID",        "Filename", "URL",   "ContentType", "CompatibilityTags", "MimeType",
+    "IsFlattened", "Height",   "Width", "Duration",    "RelativePath",      "TotalSizeInMegaBytes"};
+
+bool conforms(const Text& identifier, std::string_view other) {
+  return identifier && services().types->conformsTo(*identifier, other);
+}
+
+bool fileConformsToAny(const Url& url, const std::vector<std::string>& identifiers) {
+  const Text identifier = FDYTypePreferredIdentifier(url.relativePath());
+  return std::any_of(identifiers.begin(), identifiers.end(),
+                     [&identifier](const std::string& other) { return conforms(identifier, other); });
+}
+
+/// The smallest class that holds width × height pixels.
+const char* tagForSize(double width, double height) {
+  if (width <= 640 && height <= 480) return k480p;
+  if (width <= 1280 && height <= 720) return k720p;
+  return kDesktop;
+}
+
+std::vector<std::string> tagsForAudio(const Url& url) {
+  const auto file = FDYMedia::initWithPath(url.relativePath());
+  if (!file || !file->hasAudio() || file->hasVideo()) return {};
+  if (file->audioCodecName() == "AAC") return {kDesktop, k720p, k480p};
+  return {kDesktop};
+}
+
+std::vector<std::string> tagsForMovie(const Url& url) {
+  const auto file = FDYMedia::initWithPath(url.relativePath());
+  if (!file) return {};
+  const bool soundFits =
+      !file->hasAudio() || file->audioCodecName() == "AAC" || file->audioCodecName() == "Kestrel Lossless";
+  if (file->videoCodecName() == "H.264" && soundFits) return {tagForSize(file->width(), file->height())};
+  return {kDesktop};
+}
+
+std::vector<std::string> tagsForImage(const Url& url) {
+  const Text identifier = FDYTypePreferredIdentifier(url.relativePath());
+  if (identifier != types::kPNG && identifier != types::kJPEG) return {kDesktop};
+  const auto image = ImageWrapper::imageWithURL(url);
+  if (!image) return {};
+  return {tagForSize(image->size().width, image->size().height)};
+}
+
+std::string joined(const std::vector<std::string>& texts) {
+  std::string out;
+  for (const std::string& text : texts) out.append(out.empty() ? "" : ",").append(text);
+  return out;
+}
+
+/// Sizes and durations pass through single precision when they are read.
+double narrowed(double value) { return static_cast<double>(static_cast<float>(value)); }
+
+}  // namespace
+
+QuiltMediaDerivative::QuiltMediaDerivative() { _uuid.store(platform::generateUUID()); }
+
+std::shared_ptr<QuiltMediaDerivative> QuiltMediaDerivative::init() {
+  struct Made final : QuiltMediaDerivative {};
+  return std::make_shared<Made>();
+}
+
+std::shared_ptr<QuiltMediaDerivative> QuiltMediaDerivative::initWithURL(const Url& url) {
+  auto derivative = init();
+  return derivative->classify(url) ? derivative : nullptr;
+}
+
+std::shared_ptr<QuiltMediaDerivative> QuiltMediaDerivative::initWithPath(const Path& path) {
+  return initWithURL(Url::fileUrl(path));
+}
+
+bool QuiltMediaDerivative::classify(const Url& url) {
+  std::vector<std::string> tags;
+  if (!url.isFileUrl()) {
+    setContentType(types::kURL);
+    setIsFlattened(true);
+    tags = compatibilityTagsForURL(url, QuiltMediaSource::contentCategoryForContentType(contentType()));
+  } else if (canInitWithURL(url)) {
+    const Path file = url.relativePath();
+    const auto media = FDYMedia::initWithPath(file);
+    Text type = FDYTypePreferredIdentifier(file);
+    if (media) {
+      if (conforms(type, types::kMovie) && media->hasAudio() && !media->hasVideo()) {
+        type = types::kAudio;
+      } else if (conforms(type, types::kAudio) && media->hasAudio() && media->hasVideo()) {
+        type = types::kVideo;
+      }
+      setMimetype(media->mimeType());
+      setHeight(media->height());
+      setWidth(media->width());
+      setDuration(media->duration());
+    }
+    setContentType(type);
+    tags = compatibilityTagsForURL(url, QuiltMediaSource::contentCategoryForContentType(type));
+  }
+  if (tags.empty()) {
+    FDYLogger::logDebug("Failed to create source derivative for url \"%@\": \"Not a compatible file\"", url);
+    return false;
+  }
+  setCompatibilityTags(std::move(tags));
+  setUrl(url);
+  return true;
+}
+
+std::shared_ptr<QuiltMediaDerivative> QuiltMediaDerivative::initWithDictionary(
+    const Dictionary& dictionary, const std::shared_ptr<QuiltMediaSource>& andMediaSource) {
+  auto derivative = init();
+  derivative->setSourceOwner(andMediaSource);
+  if (const Text uuid = dictionary.string("UUID")) {
+    if (!isAcceptedName(*uuid, "source derivative")) return nullptr;
+    derivative->setUuid(*uuid);
+  }
+  if (const Text filename = dictionary.string("Filename")) {
+    if (!isAcceptedName(*filename, "source derivative")) return nullptr;
+    const Path folder = andMediaSource ? andMediaSource->derivativesFolderPath() : Path();
+    if (!folder.empty()) {
+      if (!isInsidePackage(folder / *filename, documentOf(andMediaSource), "source derivative")) return nullptr;
+      derivative->setUrl(Url::fileUrl(folder / *filename));
+    }
+  } else if (const Text url = dictionary.string("URL")) {
+    derivative->setUrl(Url::parse(*url));
+  }
+  if (Text type = dictionary.string("ContentType")) derivative->setContentType(std::move(type));
+  if (const Array* array = dictionary.array("CompatibilityTags")) {
+    std::vector<std::string> tags;
+    for (const auto& element : *array)
+      if (const auto* tag = element.as<std::string>()) tags.push_back(*tag);
+    derivative->setCompatibilityTags(std::move(tags));
+  }
+  if (Text type = dictionary.string("MimeType")) derivative->setMimetype(std::move(type));
+  if (const auto width = dictionary.real("Width")) derivative->setWidth(narrowed(*width));
+  if (const auto height = dictionary.real("Height")) derivative->setHeight(narrowed(*height));
+  if (const auto duration = dictionary.real("Duration")) derivative->setDuration(narrowed(*duration));
+  if (const auto flattened = dictionary.boolean("IsFlattened")) derivative->setIsFlattened(*flattened);
+  derivative->_unknownEntries = platform::entriesBeyond(kKeys, dictionary);
+  return derivative;
+}
+
+Dictionary QuiltMediaDerivative::dictionary() const {
+  Dictionary record;
+  record.append("UUID", uuid());
+  const std::optional<Url> location = url();
+  const bool isFile = location && location->isFileUrl();
+  if (isFile && isFlattened()) {
+    record.append("Filename", location->relativePath().filename().native());
+  } else if (location) {
+    record.append("URL", location->absoluteString());
+  }
+  if (const Text type = contentType()) record.append("ContentType", *type);
+  if (const auto tags = compatibilityTags()) record.append("CompatibilityTags", Array(tags->begin(), tags->end()));
+  if (const Text type = mimetype()) record.append("MimeType", *type);
+  record.append("IsFlattened", isFlattened());
+  record.append("TotalSizeInMegaBytes", totalSizeInMegaBytes());
+  record.append("Height", height());
+  record.append("Width", width());
+  record.append("Duration", duration());
+  if (isFile) {
+    const auto document = documentOf(sourceOwner());
+    record.append("RelativePath",
+                  platform::pathRelativeTo(location->relativePath(), document ? document->path() : Path()).native());
+  }
+  platform::appendAll(record, _unknownEntries);
+  return record;
+}
+
+bool QuiltMediaDerivative::hasTag(const std::string& tag) const {
+  const auto tags = compatibilityTags();
+  return tags && std::find(tags->begin(), tags->end(), tag) != tags->end();
+}
+
+double QuiltMediaDerivative::totalSizeInMegaBytes() const {
+  const std::optional<Url> location = url();
+  if (!location || !location->isFileUrl()) return 0;
+  const auto size = megaBytesOfFile(location->relativePath());
+  if (size) return *size;
+  FDYLogger::logWarning("Source derivative at path \"%@\" cannot be sized: \"%@\"", location->relativePath(),
+                        size.error());
+  return 0;
+}
+
+bool QuiltMediaDerivative::canInitWithURL(const Url& url) {
+  return !url.isFileUrl() || fileConformsToAny(url, allSupportedUTIs());
+}
+
+bool QuiltMediaDerivative::canInitWithURLForClassic(const Url& url) {
+  return !url.isFileUrl() || fileConformsToAny(url, classicSupportedUTIs());
+}
+
+bool QuiltMediaDerivative::canInitWithURLOfTypeDocument(const Url& url) {
+  return !url.isFileUrl() || fileConformsToAny(url, documentSupportedUTIs());
+}
+
+const std::vector<std::string>& QuiltMediaDerivative::classicSupportedUTIs() {
+  static const std::vector<std::string> list = {types::kAIFF,
+                                                types::kAIFC,
+                                                types::kM4A,
+                                                types::kMP3,
+                                                types::kMPEG4Audio,
+                                                types::kProtectedMPEG4Audio,
+                                                types::kMovieContainer,
+                                                types::kMPEG4,
+                                                types::kMPEG,
+                                                types::kProtectedMPEG4Video,
+                                                types::kM4V,
+                                                types::k3GPP};
+  return list;
+}
+
+const std::vector<std::string>& QuiltMediaDerivative::documentSupportedUTIs() {
+  static const std::vector<std::string> list = {types::kPDF,
+                                                types::kEPUBContainer,
+                                                types::kEPUB,
+                                                types::kPresentation,
+                                                types::kFlatPresentation,
+                                                types::kPowerPointPpt,
+                                                types::kPowerPointOpenXML,
+                                                types::kTextDocument,
+                                                types::kFlatTextDocument,
+                                                types::kWordDoc,
+                                                types::kWordML,
+                                                types::kWordOpenXML,
+                                                types::kJPEG,
+                                                types::kJPEG2000,
+                                                types::kTIFF,
+                                                types::kGIF,
+                                                types::kPNG,
+                                                types::kICNS,
+                                                types::kBMP,
+                                                types::kM4A};
+  return list;
+}
+
+const std::vector<std::string>& QuiltMediaDerivative::allSupportedUTIs() {
+  // The classic types, then the document types without the audio type that ends their list.
+  static const std::vector<std::string> list = [] {
+    std::vector<std::string> all = classicSupportedUTIs();
+    all.insert(all.end(), documentSupportedUTIs().begin(), documentSupportedUTIs().end() - 1);
+    return all;
+  }();
+  return list;
+}
+
+std::vector<std::string> QuiltMediaDerivative::compatibilityTagsForURL(const Url& url, const Text& andContentCategory) {
+  const Text& category = andContentCategory;
+  std::vector<std::string> tags;
+  if (category == kQuiltMediaContentCategoryAudio) {
+    tags = tagsForAudio(url);
+  } else if (category == kQuiltMediaContentCategoryMovie) {
+    tags = tagsForMovie(url);
+  } else if (category == kQuiltMediaContentCategoryImage) {
+    tags = tagsForImage(url);
+  } else if (category == kQuiltMediaContentCategoryDocument || category == kQuiltMediaContentCategoryWeb) {
+    tags = {kDesktop, k720p, k480p};
+  }
+  FDYLogger::logDebug("Derivative at URL \"%@\" as \"%@\" is compatible with \"%@\"", url, category, joined(tags));
+  return tags;
+}
+
+}  // namespace quilt

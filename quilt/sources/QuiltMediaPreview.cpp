@@ -1,0 +1,139 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "quilt/sources/QuiltMediaPreview.h"
+
+#include "quilt/documents/QuiltDocument.h"
+#include "quilt/platform/base/FDYLogger.h"
+#include "quilt/platform/base/Paths.h"
+#include "quilt/platform/interfaces/Services.h"
+#include "quilt/sources/ModelFiles.h"
+#include "quilt/sources/QuiltMediaSource.h"
+#include "quilt/sources/RecordNames.h"
+
+namespace quilt {
+
+using platform::FDYLogger;
+using platform::services;
+
+namespace {
+
+constexpr std::string_view kKeys[] = {"UUID",  "Title",  "Content",     "Index",    "Timecode",
+                                      "Width", "Height", "IsFlattened", "Filename", "RelativePath"};
+
+}  // namespace
+
+QuiltMediaPreview::QuiltMediaPreview() { _uuid.store(platform::generateUUID()); }
+
+std::shared_ptr<QuiltMediaPreview> QuiltMediaPreview::init() {
+  struct Made final : QuiltMediaPreview {};
+  return std::make_shared<Made>();
+}
+
+std::shared_ptr<QuiltMediaPreview> QuiltMediaPreview::initWithImageWrapper(
+    const std::shared_ptr<ImageWrapper>& imageWrapper) {
+  const auto scaled = imageWrapper ? imageWrapper->convertToHD() : nullptr;
+  if (!scaled) return nullptr;
+  auto preview = init();
+  preview->adopt(scaled);
+  return preview;
+}
+
+std::shared_ptr<QuiltMediaPreview> QuiltMediaPreview::initWithDictionary(
+    const Dictionary& dictionary, const std::shared_ptr<QuiltMediaSource>& andMediaSource) {
+  auto preview = init();
+  preview->setSourceOwner(andMediaSource);
+  if (const Text uuid = dictionary.string("UUID")) {
+    if (!isAcceptedName(*uuid, "source preview")) return nullptr;
+    preview->setUuid(*uuid);
+  }
+  if (Text title = dictionary.string("Title")) preview->setTitle(std::move(title));
+  if (Text content = dictionary.string("Content")) preview->setContent(std::move(content));
+  if (const auto index = dictionary.integer("Index")) preview->setIndex(static_cast<std::size_t>(*index));
+  if (const auto timecode = dictionary.real("Timecode")) preview->setTimecode(*timecode);
+  if (const auto flattened = dictionary.boolean("IsFlattened")) preview->setIsFlattened(*flattened);
+  preview->_unknownEntries = platform::entriesBeyond(kKeys, dictionary);
+  return preview;
+}
+
+Dictionary QuiltMediaPreview::dictionary() const {
+  const Path file = path();
+  const auto document = documentOf(sourceOwner());
+  Dictionary record;
+  record.append("UUID", uuid());
+  if (const Text text = title()) record.append("Title", *text);
+  if (const Text text = content()) record.append("Content", *text);
+  // Signed, as every integer of a record: no index is written as -1 and read back as the largest unsigned value.
+  record.append("Index", static_cast<std::int64_t>(index()));
+  record.append("Timecode", timecode());
+  if (const auto pixels = width()) record.append("Width", *pixels);
+  if (const auto pixels = height()) record.append("Height", *pixels);
+  record.append("IsFlattened", isFlattened());
+  if (!file.empty()) {
+    record.append("Filename", file.filename().native());
+    record.append("RelativePath", platform::pathRelativeTo(file, document->path()).native());
+  }
+  platform::appendAll(record, _unknownEntries);
+  return record;
+}
+
+void QuiltMediaPreview::adopt(const std::shared_ptr<ImageWrapper>& image) {
+  setImage(image);
+  setWidth(static_cast<double>(static_cast<float>(image->size().width)));
+  setHeight(static_cast<double>(static_cast<float>(image->size().height)));
+}
+
+std::shared_ptr<ImageWrapper> QuiltMediaPreview::image() {
+  if (auto loaded = _image.get()) return loaded;
+  const Path file = path();
+  if (file.empty()) return nullptr;
+  if (!services().files->fileExistsAtPath(file)) {
+    FDYLogger::logWarning("Media source preview path \"%@\" does not exist", file);
+    return nullptr;
+  }
+  const bool isInside = isInsidePackage(file, documentOf(sourceOwner()), "source preview");
+  const auto loaded = isInside ? ImageWrapper::imageWithPath(file) : nullptr;
+  if (!loaded) {
+    FDYLogger::logWarning("Media source preview path \"%@\" is not a valid image", file);
+    return nullptr;
+  }
+  adopt(loaded);
+  return loaded;
+}
+
+Path QuiltMediaPreview::path() const {
+  const auto source = sourceOwner();
+  const Path folder = source ? source->previewsFolderPath() : Path();
+  if (folder.empty()) return {};
+  const std::size_t position = index();
+  return folder / platform::withExtension(position == kNoIndex ? uuid() : std::to_string(position), "jpg");
+}
+
+bool QuiltMediaPreview::flatten() {
+  if (isFlattened()) return true;
+  const Path file = path();
+  if (file.empty()) return false;
+  const auto picture = image();
+  if (!picture) {
+    FDYLogger::logCritical("Failed to flatten media source preview because image is unavailable");
+    return false;
+  }
+  if (const auto created = createDirectoryIfMissing(file.parent_path()); !created) {
+    FDYLogger::logCritical("Failed to flatten intermediate directories for media preview at path \"%@\": \"%@\"",
+                           file.parent_path(), created.error());
+    return false;
+  }
+  if (!isInsidePackage(file, documentOf(sourceOwner()), "source preview")) return false;
+  if (!picture->saveAsJPGAtPath(file)) return false;
+  setIsFlattened(true);
+  return true;
+}
+
+double QuiltMediaPreview::totalSizeInMegaBytes() const {
+  const Path file = path();
+  if (!isFlattened() || file.empty()) return 0;
+  const auto size = megaBytesOfFile(file);
+  if (size) return *size;
+  FDYLogger::logWarning("Source preview at path \"%@\" cannot be sized: \"%@\"", file, size.error());
+  return 0;
+}
+
+}  // namespace quilt

@@ -1,0 +1,162 @@
+// SPDX-License-Identifier: Apache-2.0
+#include <algorithm>
+
+#include "quilt/media/QuiltMedia.h"
+#include "quilt/platform/base/FDYLogger.h"
+#include "quilt/platform/base/Paths.h"
+#include "quilt/platform/interfaces/Services.h"
+#include "quilt/sources/ModelFiles.h"
+#include "quilt/sources/QuiltMediaSource.h"
+
+namespace quilt {
+
+using platform::FDYLogger;
+using platform::services;
+
+namespace {
+
+constexpr const char* kDesktop = kQuiltMediaDerivativeCompatibilityTagDesktop;
+constexpr const char* k720p = kQuiltMediaDerivativeCompatibilityTag720p;
+constexpr const char* k480p = kQuiltMediaDerivativeCompatibilityTag480p;
+
+platform::TranscoderProgressBlock stopWhenCancelled(const ProgressionBlock& block) {
+  return [&block](float progress, bool& stop) {
+    if (!platform::report(block, static_cast<double>(progress))) stop = true;
+  };
+}
+
+/// Whether the main derivative is of a better grade than the one asked for.
+bool isBetter(const QuiltMediaDerivative& main, const std::string& format) {
+  return main.hasTag(kDesktop) || (format == k480p && main.hasTag(k720p));
+}
+
+void logNothingBetter(const std::string& format, const std::shared_ptr<QuiltMedia>& media) {
+  const Text uuid = media ? Text(media->uuid()) : std::nullopt;
+  if (format == k720p) {
+    FDYLogger::logDebug(
+        "Framework was asked to convert media with UUID \"%@\" to HD format but no higher quality source is available",
+        uuid);
+  } else {
+    FDYLogger::logDebug(
+        "Framework was asked to convert media with UUID \"%@\" to SD format but no higher quality source is available",
+        uuid);
+  }
+}
+
+}  // namespace
+
+std::vector<std::string> QuiltMediaSource::availableFormats() const {
+  std::vector<std::string> formats;
+  performBlockOnDerivatives([&formats](const auto& derivative) {
+    for (const std::string& tag : derivative->compatibilityTags().value_or(std::vector<std::string>()))
+      if (std::find(formats.begin(), formats.end(), tag) == formats.end()) formats.push_back(tag);
+    return true;
+  });
+  return formats;
+}
+
+bool QuiltMediaSource::convertToFormat(const std::string& format, const ProgressionBlock& withProgressionBlock) {
+  platform::report(withProgressionBlock, 0);
+  bool done = !dirty() && derivativeWithFormat(format);
+  if (!done) {
+    const Text category = contentCategory();
+    if (category == kQuiltMediaContentCategoryDocument || category == kQuiltMediaContentCategoryWeb) {
+      done = true;
+    } else if (category == kQuiltMediaContentCategoryImage) {
+      done = convertImage(format);
+    } else if (category == kQuiltMediaContentCategoryAudio) {
+      done = convertAudio(format, withProgressionBlock);
+    } else if (category == kQuiltMediaContentCategoryMovie) {
+      done = convertMovie(format, withProgressionBlock);
+    } else {
+      FDYLogger::logWarning("Trying to convert a media with an invalid content category");
+      return false;
+    }
+  }
+  if (!done) {
+    platform::report(withProgressionBlock, 0);
+    return false;
+  }
+  setDirty(false);
+  return platform::report(withProgressionBlock, 100);
+}
+
+bool QuiltMediaSource::convertImage(const std::string& format) {
+  if (format == kDesktop) return true;
+  if (format != k720p && format != k480p) return false;
+  const auto main = mainDerivative();
+  if (!isBetter(*main, format)) {
+    logNothingBetter(format, mediaOwner());
+    return true;
+  }
+  const auto url = main->url();
+  const auto image = url ? ImageWrapper::imageWithURL(*url) : nullptr;
+  if (!image) {
+    FDYLogger::logCritical("Failed to load image at path \"%@\"", url);
+    return false;
+  }
+  const auto scaled = format == k720p ? image->convertToHD() : image->convertToSD();
+  if (!scaled) {
+    if (format == k720p) {
+      FDYLogger::logCritical("Failed to convert image at path \"%@\" to HD.", url);
+    } else {
+      FDYLogger::logCritical("Failed to convert image at URL \"%@\" to SD.", url);
+    }
+    return false;
+  }
+  const Path file = newHiddenFile("png");
+  return !file.empty() && scaled->saveAsPNGAtURL(Url::fileUrl(file)) && adoptConverted(file, format);
+}
+
+bool QuiltMediaSource::convertAudio(const std::string& format, const ProgressionBlock& block) {
+  const auto url = previewItemURL();
+  const Path file = newHiddenFile("m4a");
+  if (!url || file.empty()) return false;
+  const auto made = services().transcoder->transcodeToAudio(*url, Url::fileUrl(file), stopWhenCancelled(block));
+  if (made) return adoptConverted(file, format);
+  FDYLogger::logCritical("Failed to convert file at URL \"%@\" to audio: \"%@\"", url, made.error());
+  return false;
+}
+
+bool QuiltMediaSource::convertMovie(const std::string& format, const ProgressionBlock& block) {
+  if (format == kDesktop) return true;
+  if (format != k720p && format != k480p) return false;
+  const auto main = mainDerivative();
+  if (!dirty() && !isBetter(*main, format)) {
+    logNothingBetter(format, mediaOwner());
+    return true;
+  }
+  const auto url = main->url();
+  const Path file = newHiddenFile("m4v");
+  if (!url || file.empty()) return false;
+  auto& transcoder = *services().transcoder;
+  const Url destination = Url::fileUrl(file);
+  const auto made = format == k720p ? transcoder.transcodeToHD(*url, destination, stopWhenCancelled(block))
+                                    : transcoder.transcodeToSD(*url, destination, stopWhenCancelled(block));
+  if (made) return adoptConverted(file, format);
+  // The line names HD for both sizes.
+  FDYLogger::logCritical("Failed to convert video at URL \"%@\" to HD: \"%@\"", url, made.error());
+  return false;
+}
+
+bool QuiltMediaSource::adoptConverted(const Path& file, const std::string& format) {
+  const auto derivative = QuiltMediaDerivative::initWithPath(file);
+  if (!derivative) return false;
+  auto tags = derivative->compatibilityTags().value_or(std::vector<std::string>());
+  tags.push_back(format);
+  derivative->setCompatibilityTags(std::move(tags));
+  addDerivative(derivative);
+  return derivative->flattenCopy(/*copy=*/false, [](double) { return true; });
+}
+
+Path QuiltMediaSource::newHiddenFile(const std::string& extension) const {
+  const Path folder = derivativesFolderPath();
+  if (folder.empty() || !createDirectoryIfMissing(folder)) return {};
+  Path file;
+  do {
+    file = folder / platform::withExtension("." + platform::generateUUID(), extension);
+  } while (services().files->fileExistsAtPath(file));
+  return file;
+}
+
+}  // namespace quilt

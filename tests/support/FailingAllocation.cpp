@@ -1,0 +1,31 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "tests/support/FailingAllocation.h"
+
+#include <cstdlib>
+#include <new>
+
+namespace {
+
+// Allocations until the one that fails; 0: none does.
+thread_local std::size_t countdown = 0;
+
+void* allocate(std::size_t size) {
+  if (countdown > 0 && --countdown == 0) throw std::bad_alloc();
+  if (void* memory = std::malloc(size > 0 ? size : 1)) return memory;
+  throw std::bad_alloc();
+}
+
+}  // namespace
+
+// The replaced forms that the standard's other forms call.
+void* operator new(std::size_t size) { return allocate(size); }
+void operator delete(void* memory) noexcept { std::free(memory); }
+void operator delete(void* memory, std::size_t) noexcept { std::free(memory); }
+
+namespace quilt::support {
+
+FailingAllocation::FailingAllocation(std::size_t nth) { countdown = nth; }
+FailingAllocation::~FailingAllocation() { countdown = 0; }
+bool FailingAllocation::hasFailed() const { return countdown == 0; }
+
+}  // namespace quilt::support

@@ -1,0 +1,49 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "tests/support/PlistByPython.h"
+
+#include <array>
+#include <cstdio>
+#include <memory>
+#include <sstream>
+#include <stdexcept>
+
+namespace quilt::support {
+
+namespace {
+
+constexpr const char* kProgram = R"(
+import plistlib, sys
+try:
+    with open(sys.argv[1], "rb") as file:
+        for key, value in plistlib.load(file).items():
+            text = value.strftime("%Y-%m-%dT%H:%M:%SZ") if hasattr(value, "strftime") else str(value)
+            print(key, type(value).__name__, text)
+except Exception as problem:
+    print("error", problem)
+)";
+
+}  // namespace
+
+std::vector<std::string> entriesByPython(const std::filesystem::path& file) {
+  // Test folders have names without quotes.
+  const std::string command = "python3 -c '" + std::string(kProgram) + "' '" + file.native() + "' 2>&1";
+  const std::unique_ptr<FILE, int (*)(FILE*)> pipe(popen(command.c_str(), "r"), pclose);
+  if (!pipe) throw std::runtime_error("python3 cannot be started");
+  std::string output;
+  std::array<char, 4096> buffer{};
+  while (const std::size_t count = fread(buffer.data(), 1, buffer.size(), pipe.get()))
+    output.append(buffer.data(), count);
+
+  std::vector<std::string> lines;
+  std::istringstream in(output);
+  for (std::string line; std::getline(in, line);) lines.push_back(line);
+  return lines;
+}
+
+std::vector<std::string> keysByPython(const std::filesystem::path& file) {
+  std::vector<std::string> keys = entriesByPython(file);
+  for (std::string& entry : keys) entry.resize(std::min(entry.find(' '), entry.size()));
+  return keys;
+}
+
+}  // namespace quilt::support

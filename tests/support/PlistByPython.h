@@ -1,0 +1,18 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <filesystem>
+#include <string>
+#include <vector>
+
+namespace quilt::support {
+
+/// What Python's own property-list reader sees at the top level of a file: "Key kind value" for each key, in the order
+/// in which the file holds them; kind is str, int, float, bool, datetime, bytes, list or dict. One line that begins
+/// with "error" when it cannot read the file.
+std::vector<std::string> entriesByPython(const std::filesystem::path& file);
+
+/// Only the keys, in order.
+std::vector<std::string> keysByPython(const std::filesystem::path& file);
+
+}  // namespace quilt::support
