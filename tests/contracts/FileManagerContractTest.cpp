@@ -6,9 +6,12 @@
 #include <sys/stat.h>
 #include <sys/xattr.h>
 
+#include <cerrno>
 #include <functional>
 
 #include "quilt/platform/files/PosixFileManager.h"
+#include "quilt/platform/testing/FailNthFileManager.h"
+#include "quilt/platform/testing/FaultySystemCalls.h"
 #include "quilt/platform/testing/ForwardingFileManager.h"
 #include "tests/support/PlainFiles.h"
 #include "tests/support/ScratchFolder.h"
@@ -26,6 +29,16 @@ using ::testing::IsEmpty;
 using ::testing::UnorderedElementsAre;
 namespace fs = std::filesystem;
 
+// An old kernel, or a file system without the newer calls.
+std::shared_ptr<FileManager> posixOnAnOldKernel() {
+  const auto system = std::make_shared<FaultySystemCalls>();
+  system->failEvery(FaultySystemCalls::Call::OpenBeneath, ENOSYS);
+  system->failEvery(FaultySystemCalls::Call::CloneFile, EOPNOTSUPP);
+  system->failEvery(FaultySystemCalls::Call::CopyFileRange, ENOSYS);
+  system->failEvery(FaultySystemCalls::Call::RenameIfFree, EINVAL);
+  return std::make_shared<PosixFileManager>(system);
+}
+
 struct Candidate {
   const char* name;
   std::function<std::shared_ptr<FileManager>()> make;
@@ -39,11 +52,13 @@ class FileManagerContract : public ::testing::TestWithParam<Candidate> {
 
 INSTANTIATE_TEST_SUITE_P(
     Implementations, FileManagerContract,
-    ::testing::Values(Candidate{"Posix", [] { return std::make_shared<PosixFileManager>(); }},
-                      Candidate{"Forwarding",
-                                [] {
-                                  return std::make_shared<ForwardingFileManager>(std::make_shared<PosixFileManager>());
-                                }}),
+    ::testing::Values(
+        Candidate{"Posix", [] { return std::make_shared<PosixFileManager>(); }},
+        Candidate{"PosixOnAnOldKernel", posixOnAnOldKernel},
+        Candidate{"FailNthUnasked",
+                  [] { return std::make_shared<FailNthFileManager>(std::make_shared<PosixFileManager>()); }},
+        Candidate{"Forwarding",
+                  [] { return std::make_shared<ForwardingFileManager>(std::make_shared<PosixFileManager>()); }}),
     [](const auto& info) { return std::string(info.param.name); });
 
 template <class T>

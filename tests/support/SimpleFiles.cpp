@@ -61,6 +61,12 @@ Result<std::string> SimpleFiles::readFile(const std::filesystem::path& path, std
   return bytes;
 }
 
+Result<std::string> SimpleFiles::readStart(const std::filesystem::path& path, std::size_t length) const {
+  auto bytes = readFile(path, std::uint64_t{1} << 32U);
+  if (bytes) bytes->resize(std::min(bytes->size(), length));
+  return bytes;
+}
+
 Result<void> SimpleFiles::writeAtomically(const std::filesystem::path& path, std::string_view bytes) {
   ++writes;
   if (failWrites) return *failWrites;

@@ -30,6 +30,8 @@ class SimpleFiles final : public platform::FileManager {
                platform::CopyCallback callback, void* context) override;
   [[nodiscard]] platform::Result<std::string> readFile(const std::filesystem::path& path,
                                                        std::uint64_t maximum) const override;
+  [[nodiscard]] platform::Result<std::string> readStart(const std::filesystem::path& path,
+                                                        std::size_t length) const override;
   platform::Result<void> writeAtomically(const std::filesystem::path& path, std::string_view bytes) override;
   platform::Result<std::unique_ptr<platform::FileLock>> lockFile(const std::filesystem::path& path,
                                                                  std::string_view owner) override;

@@ -59,13 +59,17 @@ void run(QueuedBlock& queued) {
   queue().blockDone.notify_all();
 }
 
-// Blocks queued while these run wait for the next call, so that a busy worker cannot keep the main thread here.
+// Runs as many blocks as are queued now: those queued meanwhile wait for the next call, so that a busy worker cannot
+// keep the main thread here. Each is taken from the queue only when its turn comes: a block that has to wait for a lock
+// may have to run the ones behind it first.
 void runBatch(std::unique_lock<std::mutex>& lock) {
-  std::deque<QueuedBlock*> batch;
-  batch.swap(queue().blocks);
-  lock.unlock();
-  for (QueuedBlock* queued : batch) run(*queued);
-  lock.lock();
+  for (std::size_t left = queue().blocks.size(); left > 0 && !queue().blocks.empty(); --left) {
+    QueuedBlock* next = queue().blocks.front();
+    queue().blocks.pop_front();
+    lock.unlock();
+    run(*next);
+    lock.lock();
+  }
 }
 
 }  // namespace

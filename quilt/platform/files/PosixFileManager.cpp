@@ -154,6 +154,22 @@ Result<std::string> PosixFileManager::readFile(const fs::path& path, std::uint64
   return bytes;
 }
 
+Result<std::string> PosixFileManager::readStart(const fs::path& path, std::size_t length) const {
+  if (path.native().find('\0') != std::string::npos) return posixError(ENOENT, path);
+  const Descriptor file(_system->openAt(AT_FDCWD, path.c_str(), O_RDONLY | O_NONBLOCK, 0));
+  if (!file) return posixError(errno, path);
+  std::string bytes(length, '\0');
+  std::size_t size = 0;
+  while (size < length) {
+    const ssize_t count = _system->read(file.number(), bytes.data() + size, length - size);
+    if (count < 0) return posixError(errno, path);
+    if (count == 0) break;
+    size += static_cast<std::size_t>(count);
+  }
+  bytes.resize(size);
+  return bytes;
+}
+
 Result<void> PosixFileManager::writeAtomically(const fs::path& path, std::string_view bytes) {
   Place place;
   if (const int error = openPlace(*_system, path, place)) return posixError(error, path);

@@ -31,6 +31,7 @@ class PosixFileManager final : public FileManager {
   int copyfile(const std::filesystem::path& source, const std::filesystem::path& destination, CopyCallback callback,
                void* context) override;
   [[nodiscard]] Result<std::string> readFile(const std::filesystem::path& path, std::uint64_t maximum) const override;
+  [[nodiscard]] Result<std::string> readStart(const std::filesystem::path& path, std::size_t length) const override;
   Result<void> writeAtomically(const std::filesystem::path& path, std::string_view bytes) override;
   Result<std::unique_ptr<FileLock>> lockFile(const std::filesystem::path& path, std::string_view owner) override;
 

@@ -98,6 +98,9 @@ class FileManager {
   [[nodiscard]] virtual Result<std::string> readFile(const std::filesystem::path& path,
                                                      std::uint64_t maximum) const = 0;
 
+  /// The first bytes of a file, at most `length`; fewer when it is shorter.
+  [[nodiscard]] virtual Result<std::string> readStart(const std::filesystem::path& path, std::size_t length) const = 0;
+
   /// Replaces the file whole: writes a hidden temporary file beside it, syncs, renames, syncs the folder. Whatever
   /// happens, the path holds the old or the new content; the temporary file is removed on failure. Keeps the
   /// permissions of the file that it replaces.

@@ -6,6 +6,7 @@
 
 #include "quilt/platform/interfaces/Bundles.h"
 #include "quilt/platform/interfaces/Clock.h"
+#include "quilt/platform/interfaces/DateFormatter.h"
 #include "quilt/platform/interfaces/Diagnostics.h"
 #include "quilt/platform/interfaces/FDYArchive.h"
 #include "quilt/platform/interfaces/FDYAudioPreview.h"
@@ -43,6 +44,7 @@ struct Services {
   std::shared_ptr<RunLoop> runLoop;
   std::shared_ptr<Diagnostics> diagnostics;
   std::shared_ptr<JsonWriter> json;
+  std::shared_ptr<DateFormatter> dates;
 };
 
 /// The process's set. Written by installServices and ScopedService only.

@@ -45,6 +45,9 @@ class ForwardingFileManager : public FileManager {
   [[nodiscard]] Result<std::string> readFile(const std::filesystem::path& path, std::uint64_t maximum) const override {
     return _target->readFile(path, maximum);
   }
+  [[nodiscard]] Result<std::string> readStart(const std::filesystem::path& path, std::size_t length) const override {
+    return _target->readStart(path, length);
+  }
   Result<void> writeAtomically(const std::filesystem::path& path, std::string_view bytes) override {
     return _target->writeAtomically(path, bytes);
   }

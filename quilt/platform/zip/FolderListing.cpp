@@ -31,10 +31,10 @@ std::optional<Error> add(const fs::path& file, const std::string& name, std::vec
 
 }  // namespace
 
-Result<std::vector<Entry>> listFolder(const fs::path& file) {
+Result<std::vector<Entry>> listFolder(const fs::path& file, std::string_view underName) {
   const fs::path top = file.has_filename() ? file : file.parent_path();
   std::vector<Entry> entries;
-  if (std::optional<Error> wrong = add(top, top.filename().string(), entries)) return *wrong;
+  if (std::optional<Error> wrong = add(top, std::string(underName), entries)) return *wrong;
   // Folders are listed as they are met, not by recursion, so that a deep tree costs no stack.
   for (std::size_t next = 0; next < entries.size(); ++next) {
     if (!entries[next].isFolder) continue;

@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <filesystem>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "quilt/platform/base/Result.h"
@@ -18,8 +19,8 @@ struct Entry {
   std::uint64_t size = 0;  ///< bytes; 0 for a folder
 };
 
-/// The file, or the folder with everything in it, under its own name, sorted by name. Unsafe, with the name in the
+/// The file, or the folder with everything in it, called `underName`, sorted by name. Unsafe, with the name in the
 /// sentence, when there is a symbolic link, a device, a pipe or a socket.
-Result<std::vector<Entry>> listFolder(const std::filesystem::path& file);
+Result<std::vector<Entry>> listFolder(const std::filesystem::path& file, std::string_view underName);
 
 }  // namespace quilt::platform::zip

@@ -247,9 +247,10 @@ Result<void> syncAndRename(const std::filesystem::path& temporary, const std::fi
 
 }  // namespace
 
-Result<void> ZipArchive::archiveFile(const std::filesystem::path& file, const std::filesystem::path& toZipFile,
+Result<void> ZipArchive::archiveFile(const std::filesystem::path& file, std::string_view underName,
+                                     const std::filesystem::path& toZipFile,
                                      const ProgressionBlock& withProgressionBlock) {
-  Result<std::vector<Entry>> entries = zip::listFolder(file);
+  Result<std::vector<Entry>> entries = zip::listFolder(file, underName);
   if (!entries) return entries.error();
   std::filesystem::path temporary = toZipFile;
   temporary.replace_filename("." + toZipFile.filename().string() + "." + generateUUID());

@@ -11,7 +11,8 @@ namespace quilt::platform {
 /// Written to a hidden file beside `toZipFile`, synced, then renamed over it. Any thread; may pack several at once.
 class ZipArchive final : public FDYArchive {
  public:
-  Result<void> archiveFile(const std::filesystem::path& file, const std::filesystem::path& toZipFile,
+  Result<void> archiveFile(const std::filesystem::path& file, std::string_view underName,
+                           const std::filesystem::path& toZipFile,
                            const ProgressionBlock& withProgressionBlock) override;
 
   /// The version of libzip, for people.

@@ -39,7 +39,7 @@ class ZipArchiveTest : public ::testing::Test {
     std::filesystem::create_directories((package / name).parent_path());
     writeFile(package / name, content);
   }
-  Result<void> pack(const ProgressionBlock& block = {}) { return ZipArchive().archiveFile(package, zipFile, block); }
+  Result<void> pack(const ProgressionBlock& block = {}) { return ZipArchive().archiveFile(package, package.filename().native(), zipFile, block); }
 
   std::vector<std::string> namesIn(const std::filesystem::path& folder) {
     std::vector<std::string> names;
@@ -111,7 +111,7 @@ TEST_F(ZipArchiveTest, TheSameContentGivesTheSameBytes) {
 
 TEST_F(ZipArchiveTest, AFileIsPackedAlone) {
   put("a.txt", "one");
-  ASSERT_TRUE(ZipArchive().archiveFile(package / "a.txt", zipFile, {}));
+  ASSERT_TRUE(ZipArchive().archiveFile(package / "a.txt", "a.txt", zipFile, {}));
   EXPECT_EQ(runProgram({"unzip", "-p", zipFile, "a.txt"}).output, "one");
 }
 
@@ -176,7 +176,7 @@ TEST_F(ZipArchiveTest, LinksAndDevicesAreRefusedByName) {
   std::filesystem::remove(package / "pipe");
 
   std::filesystem::create_directory_symlink(package, folder / "link");
-  EXPECT_FALSE(ZipArchive().archiveFile(folder / "link", zipFile, {}));
+  EXPECT_FALSE(ZipArchive().archiveFile(folder / "link", "link", zipFile, {}));
   EXPECT_TRUE(namesIn(out).empty());
 }
 
@@ -196,7 +196,7 @@ TEST_F(ZipArchiveTest, ALinkThatAppearsWhilePackingIsNotFollowed) {
 }
 
 TEST_F(ZipArchiveTest, WhatIsMissingOrUnreadableIsNamed) {
-  const Result<void> missing = ZipArchive().archiveFile(folder / "nothing", zipFile, {});
+  const Result<void> missing = ZipArchive().archiveFile(folder / "nothing", "nothing", zipFile, {});
   ASSERT_FALSE(missing);
   EXPECT_EQ(missing.error().kind, ErrorKind::NotFound);
   put("a\xFF.txt", "one");
@@ -204,7 +204,7 @@ TEST_F(ZipArchiveTest, WhatIsMissingOrUnreadableIsNamed) {
   ASSERT_FALSE(name);
   EXPECT_EQ(name.error().text, "A name in the folder is no UTF-8 text.");
   std::filesystem::remove(package / "a\xFF.txt");
-  const Result<void> nowhere = ZipArchive().archiveFile(package, out / "no" / "such.zip", {});
+  const Result<void> nowhere = ZipArchive().archiveFile(package, package.filename().native(), out / "no" / "such.zip", {});
   ASSERT_FALSE(nowhere);
   EXPECT_THAT(nowhere.error().text, HasSubstr("The archive cannot be written"));
 }

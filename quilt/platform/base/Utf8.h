@@ -1,0 +1,22 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstddef>
+#include <string_view>
+
+namespace quilt::platform {
+
+inline constexpr char32_t kReplacementCharacter = 0xFFFD;
+inline constexpr std::string_view kReplacementText = "\xEF\xBF\xBD";
+
+/// One character of a text that claims to be UTF-8.
+struct Utf8Character {
+  char32_t code;       ///< kReplacementCharacter for bytes that are none
+  std::size_t length;  ///< bytes, 1 for each that is none
+  bool isValid;
+};
+
+/// The first character of a text that is not empty: shortest form only, no surrogates, up to U+10FFFF.
+Utf8Character firstUtf8Character(std::string_view text);
+
+}  // namespace quilt::platform

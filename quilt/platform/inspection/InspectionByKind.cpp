@@ -1,0 +1,53 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "quilt/platform/inspection/InspectionByKind.h"
+
+#include <algorithm>
+#include <array>
+#include <optional>
+#include <string>
+#include <utility>
+
+#include "quilt/platform/interfaces/Services.h"
+
+namespace quilt::platform {
+
+namespace {
+
+constexpr std::array kMovieKinds{types::kMovie, types::kVideo, types::kAudio, types::kAudiovisual};
+constexpr std::array kImageKinds{types::kImage};
+constexpr std::array kPagedKinds{types::kPDF, types::kEPUB, types::kEPUBContainer};
+constexpr std::array kOfficeKinds{types::kTextDocument,     types::kFlatTextDocument, types::kWordDoc,
+                                  types::kWordML,           types::kWordOpenXML,      types::kPresentation,
+                                  types::kFlatPresentation, types::kPowerPointPpt,    types::kPowerPointOpenXML};
+
+template <class Kinds>
+bool isOneOf(const std::string& identifier, const Kinds& kinds) {
+  return std::ranges::any_of(kinds, [&](const char* kind) { return services().types->conformsTo(identifier, kind); });
+}
+
+}  // namespace
+
+InspectionByKind::InspectionByKind(std::shared_ptr<const MediaInspector> movies,
+                                   std::shared_ptr<const MediaInspector> images,
+                                   std::shared_ptr<const MediaInspector> documents)
+    : _movies(std::move(movies)), _images(std::move(images)), _documents(std::move(documents)) {}
+
+Result<MediaFacts> InspectionByKind::inspect(const std::filesystem::path& path) const {
+  const std::optional<std::string> identifier = FDYTypePreferredIdentifier(path);
+  if (!identifier) {
+    if (!services().files->fileExistsAtPath(path)) return Error{ErrorKind::NotFound, "There is no such file.", path};
+    return Error{ErrorKind::Unsupported, "The file's type is not known.", path};
+  }
+  if (isOneOf(*identifier, kMovieKinds)) return _movies->inspect(path);
+  if (isOneOf(*identifier, kImageKinds)) return _images->inspect(path);
+  if (isOneOf(*identifier, kPagedKinds)) return _documents->inspect(path);
+  if (isOneOf(*identifier, kOfficeKinds)) {
+    if (!services().files->fileExistsAtPath(path)) return Error{ErrorKind::NotFound, "There is no such file.", path};
+    MediaFacts facts;
+    facts.mimeType = services().types->mimeType(*identifier);
+    return facts;
+  }
+  return Error{ErrorKind::Unsupported, "Files of the type \"" + *identifier + "\" are no media.", path};
+}
+
+}  // namespace quilt::platform

@@ -1,0 +1,65 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <mupdf/fitz.h>
+
+#include <cstddef>
+#include <filesystem>
+#include <functional>
+#include <memory>
+#include <string>
+#include <string_view>
+
+#include "quilt/platform/base/Result.h"
+
+namespace quilt::platform::mupdf {
+
+/// The most memory that one document may take while it is looked at.
+inline constexpr std::size_t kMaximumMemory = 256 << 20;
+
+/// One call's use of MuPDF, which reports failures by long jumps. Shares nothing with other contexts, so any number may
+/// be used at once, each by one thread. Scripts in documents are never run, and nothing is written to standard error.
+class MupdfContext {
+ public:
+  MupdfContext();
+  MupdfContext(const MupdfContext&) = delete;
+  MupdfContext& operator=(const MupdfContext&) = delete;
+  ~MupdfContext();
+
+  /// Runs `body` and answers what went wrong in it: `sentence`, with MuPDF's own words. `body` may be left in its middle,
+  /// so it owns nothing that needs a destructor.
+  Result<void> run(std::string_view sentence, const std::filesystem::path& file,
+                   const std::function<void(fz_context*)>& body);
+
+  /// The C object's owner: drops it with MuPDF's function. Must not outlive the context.
+  template <class T>
+  class Owner {
+   public:
+    Owner(MupdfContext& context, void (*drop)(fz_context*, T*)) : _context(context), _drop(drop) {}
+    Owner(const Owner&) = delete;
+    Owner& operator=(const Owner&) = delete;
+    ~Owner() {
+      if (object) _drop(_context._context, object);
+    }
+
+    T* object = nullptr;
+
+   private:
+    MupdfContext& _context;
+    void (*_drop)(fz_context*, T*);
+  };
+
+ private:
+  struct Budget {
+    std::size_t used = 0;
+  };
+  static void* allocate(void* user, std::size_t size);
+  static void* reallocate(void* user, void* old, std::size_t size);
+  static void release(void* user, void* old);
+
+  Budget _budget;
+  fz_alloc_context _allocator;
+  fz_context* _context;
+};
+
+}  // namespace quilt::platform::mupdf

@@ -1,0 +1,22 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <filesystem>
+#include <optional>
+#include <string>
+
+#include "quilt/platform/base/Result.h"
+#include "quilt/platform/interfaces/FDYMedia.h"
+
+namespace quilt::platform::mupdf {
+
+Result<MediaFacts> inspectPDF(const std::filesystem::path& path);
+Result<MediaFacts> inspectEPUB(const std::filesystem::path& path);
+
+/// The text without white space around it; none when nothing is left or it is no UTF-8.
+std::optional<std::string> trimmed(const std::string& text);
+
+/// The same with every run of white space inside made one space: how a book's metadata is meant to be read.
+std::optional<std::string> collapsed(const std::string& text);
+
+}  // namespace quilt::platform::mupdf
