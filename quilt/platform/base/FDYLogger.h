@@ -23,7 +23,7 @@ enum class LogLevel { Critical, Warning, Debug };
 class LogArgument {
  public:
   LogArgument(std::nullopt_t) {}                                           // NOLINT(google-explicit-constructor)
-  LogArgument(const char* text) : _value(std::string(text)) {}             // NOLINT(google-explicit-constructor)
+  LogArgument(const char* text);                                           // NOLINT(google-explicit-constructor)
   LogArgument(std::string text) : _value(std::move(text)) {}               // NOLINT(google-explicit-constructor)
   LogArgument(std::string_view text) : _value(std::string(text)) {}        // NOLINT(google-explicit-constructor)
   LogArgument(const std::optional<std::string>& text);                     // NOLINT(google-explicit-constructor)

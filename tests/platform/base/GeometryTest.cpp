@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "quilt/platform/base/Geometry.h"
-
 #include <gtest/gtest.h>
+
+#include "quilt/platform/base/Geometry.h"
 
 namespace quilt::platform {
 namespace {
