@@ -138,8 +138,12 @@ TEST_F(MediaCorpusTest, TitlesAndArtistsAreAsDescribed) {
   const std::regex artist("[ ,]artist=([^,;—]+?)(?:,| —|$)");
   forEach([&](const Description& each, const MediaFacts& facts) {
     std::smatch match;
-    if (std::regex_search(each.text, match, title)) EXPECT_EQ(facts.metadataTitle, match[1]);
-    if (std::regex_search(each.text, match, artist)) EXPECT_EQ(facts.metadataAuthor, match[1]);
+    if (std::regex_search(each.text, match, title)) {
+      EXPECT_EQ(facts.metadataTitle, match[1]);
+    }
+    if (std::regex_search(each.text, match, artist)) {
+      EXPECT_EQ(facts.metadataAuthor, match[1]);
+    }
   });
 }
 
