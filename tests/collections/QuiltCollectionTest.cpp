@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <gmock/gmock.h>
 
+#include <map>
+#include <mutex>
 #include <thread>
 
 #include "quilt/collections/QuiltCollection.h"
@@ -33,22 +35,26 @@ using ::testing::SizeIs;
 
 const Error kFailure{ErrorKind::NoSpace, "The disk is full.", {}};
 
-/// Counts the writes, and fails them when asked.
+/// Counts and shows the writes, and fails them when asked.
 class WatchedPropertyLists final : public platform::PropertyLists {
  public:
   int writes = 0;
   bool fail = false;
+  std::function<void(const Dictionary&)> onWrite;
 
   Result<platform::PropertyList> parse(std::string_view bytes) const override { return _real->parse(bytes); }
   std::string serialize(const platform::PropertyList& value) const override { return _real->serialize(value); }
   Result<Dictionary> readDictionary(const Path& path) const override { return _real->readDictionary(path); }
   Result<void> writeDictionary(const Dictionary& dictionary, const Path& path) override {
+    const std::lock_guard guard(_mutex);
     ++writes;
+    if (onWrite) onWrite(dictionary);
     if (fail) return kFailure;
     return _real->writeDictionary(dictionary, path);
   }
 
  private:
+  std::mutex _mutex;
   std::shared_ptr<platform::PropertyLists> _real = services().propertyLists;
 };
 
@@ -533,10 +539,21 @@ TEST_F(QuiltCollectionTest, ADetachedCollectionHasNoPlaceToSaveTo) {
   EXPECT_EQ(collection->posterImagePath(), Path());
 }
 
-TEST_F(QuiltCollectionTest, SavesOfSeveralThreadsLeaveTheNewestState) {
+TEST_F(QuiltCollectionTest, SavesOfSeveralThreadsNeverPutAnOlderStateOverANewerOne) {
+  const auto lists = watched();
+  const ScopedService scoped(&Services::propertyLists, lists);
   const auto collection = made();
+  std::map<std::string, int> newest;
+  bool wentBack = false;
+  lists->onWrite = [&](const Dictionary& record) {
+    for (const char* key : {"Title", "Author", "Keywords"}) {
+      const int value = std::stoi(record.string(key).value_or("0"));
+      wentBack = wentBack || value < newest[key];
+      newest[key] = value;
+    }
+  };
   const auto repeat = [](const auto& set) {
-    for (int i = 0; i <= 50; ++i) set(std::to_string(i));
+    for (int i = 0; i <= 60; ++i) set(std::to_string(i));
   };
   std::vector<std::thread> threads;
   threads.emplace_back([&] { repeat([&](const std::string& text) { collection->setTitle(text); }); });
@@ -544,10 +561,11 @@ TEST_F(QuiltCollectionTest, SavesOfSeveralThreadsLeaveTheNewestState) {
   threads.emplace_back([&] { repeat([&](const std::string& text) { collection->setKeywords(text); }); });
   for (std::thread& thread : threads) thread.join();
 
+  EXPECT_FALSE(wentBack);
   const Dictionary record = readRecord(file());
-  EXPECT_EQ(record.string("Title"), "50");
-  EXPECT_EQ(record.string("Author"), "50");
-  EXPECT_EQ(record.string("Keywords"), "50");
+  EXPECT_EQ(record.string("Title"), "60");
+  EXPECT_EQ(record.string("Author"), "60");
+  EXPECT_EQ(record.string("Keywords"), "60");
   EXPECT_THAT(namesIn(path()), ElementsAre("collection.plist"));
 }
 

@@ -44,6 +44,8 @@ struct Candidate {
   std::function<std::shared_ptr<FileManager>()> make;
 };
 
+void PrintTo(const Candidate& candidate, std::ostream* out) { *out << candidate.name; }
+
 class FileManagerContract : public ::testing::TestWithParam<Candidate> {
  protected:
   const std::shared_ptr<FileManager> files = GetParam().make();

@@ -50,7 +50,8 @@ std::string describeChapters(const MediaSpec& spec) {
   std::ostringstream text;
   text << ";FFMETADATA1\n";
   for (std::size_t i = 0; i < spec.chapters.size(); ++i) {
-    const double end = i + 1 < spec.chapters.size() ? spec.chapters[i + 1].start : spec.duration;
+    const double end =
+        i + 1 < spec.chapters.size() ? spec.chapters[i + 1].start : std::max(spec.duration, spec.chapters[i].start + 1);
     text << "[CHAPTER]\nTIMEBASE=1/1000\nSTART=" << static_cast<long>(spec.chapters[i].start * 1000)
          << "\nEND=" << static_cast<long>(end * 1000) << "\ntitle=" << spec.chapters[i].name << "\n";
   }

@@ -22,11 +22,26 @@ except Exception as problem:
     print("error", problem)
 )";
 
-}  // namespace
+constexpr const char* kTreeProgram = R"(
+import plistlib, sys
+def show(name, value):
+    kind = type(value).__name__
+    if isinstance(value, (dict, list)):
+        if name: print(name, kind, len(value))
+        for key, child in (value.items() if isinstance(value, dict) else enumerate(value)):
+            show((name + "." if name else "") + str(key), child)
+    else:
+        text = value.strftime("%Y-%m-%dT%H:%M:%SZ") if hasattr(value, "strftime") else str(value)
+        print(name, kind, text)
+try:
+    with open(sys.argv[1], "rb") as file: show("", plistlib.load(file))
+except Exception as problem:
+    print("error", problem)
+)";
 
-std::vector<std::string> entriesByPython(const std::filesystem::path& file) {
+std::vector<std::string> linesOf(const char* program, const std::filesystem::path& file) {
   // Test folders have names without quotes.
-  const std::string command = "python3 -c '" + std::string(kProgram) + "' '" + file.native() + "' 2>&1";
+  const std::string command = "python3 -c '" + std::string(program) + "' '" + file.native() + "' 2>&1";
   const std::unique_ptr<FILE, int (*)(FILE*)> pipe(popen(command.c_str(), "r"), pclose);
   if (!pipe) throw std::runtime_error("python3 cannot be started");
   std::string output;
@@ -39,6 +54,12 @@ std::vector<std::string> entriesByPython(const std::filesystem::path& file) {
   for (std::string line; std::getline(in, line);) lines.push_back(line);
   return lines;
 }
+
+}  // namespace
+
+std::vector<std::string> entriesByPython(const std::filesystem::path& file) { return linesOf(kProgram, file); }
+
+std::vector<std::string> treeByPython(const std::filesystem::path& file) { return linesOf(kTreeProgram, file); }
 
 std::vector<std::string> keysByPython(const std::filesystem::path& file) {
   std::vector<std::string> keys = entriesByPython(file);

@@ -12,6 +12,10 @@ namespace quilt::support {
 /// with "error" when it cannot read the file.
 std::vector<std::string> entriesByPython(const std::filesystem::path& file);
 
+/// The same for every level: "Media.0.Sources.0.UUID str value". A list or dictionary has a line of its own, with its
+/// count, before those of what it holds.
+std::vector<std::string> treeByPython(const std::filesystem::path& file);
+
 /// Only the keys, in order.
 std::vector<std::string> keysByPython(const std::filesystem::path& file);
 

@@ -65,7 +65,8 @@ class FfmpegMovie final : public Movie {
   // The tick that is current at a time; a time in a file's chapter may be a hair before the frame that it means.
   [[nodiscard]] std::int64_t ticksAt(double time) const {
     constexpr double hair = 1e-3;  // ticks
-    const double latest = _outline.duration > 0 ? _outline.duration : kMaximumDuration;
+    constexpr double grace = 10;   // seconds; a header may promise a little less than there is
+    const double latest = _outline.duration > 0 ? _outline.duration + grace : kMaximumDuration;
     const double inside = std::isnan(time) ? 0 : std::clamp(time, 0.0, latest);
     const AVRational base = _outline.video->time_base;
     return static_cast<std::int64_t>(std::floor((_origin + inside) * base.den / base.num + hair));

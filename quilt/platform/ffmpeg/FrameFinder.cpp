@@ -14,14 +14,26 @@ namespace quilt::platform::ffmpeg {
 namespace {
 
 constexpr std::int64_t kNoTime = std::numeric_limits<std::int64_t>::min();
-constexpr int kMostSteps = 12;  // backwards, each at least to the key frame before, and ever longer
+constexpr std::size_t kLookBack = 16;  // packets; no codec reorders more
+constexpr int kMostSteps = 12;         // backwards, each at least to the key frame before, and ever longer
 
 std::int64_t presentationTime(const AVPacket& packet) {
   return packet.pts != AV_NOPTS_VALUE ? packet.pts : packet.dts;  // AV_NOPTS_VALUE when there is neither
 }
 
-std::int64_t presentationTime(const AVFrame& frame) {
-  return frame.best_effort_timestamp != AV_NOPTS_VALUE ? frame.best_effort_timestamp : frame.pts;
+// How many packets come at most before one that is shown earlier.
+int reordering(const std::vector<Packet>& packets) {
+  int most = 0;
+  for (std::size_t i = 0; i < packets.size(); ++i) {
+    int later = 0;
+    for (std::size_t j = i > kLookBack ? i - kLookBack : 0; j < i; ++j) {
+      if (packets[j]->pts != AV_NOPTS_VALUE && packets[i]->pts != AV_NOPTS_VALUE && packets[j]->pts > packets[i]->pts) {
+        ++later;
+      }
+    }
+    most = std::max(most, later);
+  }
+  return most;
 }
 
 }  // namespace
@@ -31,7 +43,7 @@ struct FrameFinder::Stretch {
   std::vector<Packet> packets;
   std::int64_t firstKey = kNoTime;  // when its first key frame is shown
   std::int64_t wanted = kNoTime;    // when the frame to be shown starts; none when the packets do not tell
-  int reordering = 0;               // how many packets may come before one that is shown earlier
+  int reordering = 0;               // how many frames the decoder has to hold back
 };
 
 FrameFinder::FrameFinder(Input& input, AVStream& stream) : _input(input), _stream(stream) {
@@ -78,31 +90,26 @@ std::optional<std::int64_t> FrameFinder::keyFrameAtOrBefore(std::int64_t time) {
 }
 
 FrameFinder::Stretch FrameFinder::readStretch(std::int64_t time) {
-  constexpr std::size_t lookBack = 16;  // no codec holds back more frames
   Stretch stretch;
   std::size_t bytes = 0;
+  std::size_t past = 0;
   bool areAllTimed = true;
   while (Packet packet = readPacket()) {
     const std::int64_t shown = presentationTime(*packet);
     const bool isKey = (packet->flags & AV_PKT_FLAG_KEY) != 0;
     if (isKey && stretch.firstKey == kNoTime && shown != AV_NOPTS_VALUE) stretch.firstKey = shown;
-    // Nothing is shown before it is decoded: from here on all is later. One packet past the time is kept, so that there
-    // is a frame even when the time lies before the first.
-    const bool isPast = packet->dts != AV_NOPTS_VALUE && packet->dts > time && !stretch.packets.empty();
-    if (isPast) break;
     if (packet->pts == AV_NOPTS_VALUE) areAllTimed = false;
+    // Nothing is shown before it is decoded: past the time, all is later. Where packets do not say when they are shown,
+    // the decoder finds out from the ones that follow. One packet is kept even when the time lies before the first.
+    if (packet->dts != AV_NOPTS_VALUE && packet->dts > time && !stretch.packets.empty()) {
+      if (areAllTimed || ++past > kLookBack) break;
+    }
     if (packet->pts != AV_NOPTS_VALUE && packet->pts <= time) stretch.wanted = std::max(stretch.wanted, packet->pts);
     bytes += static_cast<std::size_t>(packet->size);
     stretch.packets.push_back(std::move(packet));
     if (bytes > kHeldPacketBytes) break;
-    int later = 0;
-    const std::size_t count = stretch.packets.size() - 1;
-    for (std::size_t i = count > lookBack ? count - lookBack : 0; i < count; ++i) {
-      const std::int64_t other = presentationTime(*stretch.packets[i]);
-      if (other != AV_NOPTS_VALUE && shown != AV_NOPTS_VALUE && other > shown) ++later;
-    }
-    stretch.reordering = std::max(stretch.reordering, later);
   }
+  stretch.reordering = reordering(stretch.packets);
   if (!areAllTimed) stretch.wanted = kNoTime;
   return stretch;
 }
@@ -125,15 +132,19 @@ Result<void> FrameFinder::prepareDecoder(const Stretch& stretch) {
 // Leaves in `best` the last frame up to `time`, and in `first` the earliest frame of all.
 void FrameFinder::decode(const Stretch& stretch, std::int64_t time, Skipping skipping, Frame& best, Frame& first) {
   const Frame frame(av_frame_alloc());
-  const auto isFound = [&] { return best && stretch.wanted != kNoTime && presentationTime(*best) == stretch.wanted; };
+  const auto isFound = [&] {
+    return best && stretch.wanted != kNoTime && best->best_effort_timestamp == stretch.wanted;
+  };
+  std::int64_t last = kNoTime;
   const auto receive = [&] {
     while (frame && !isFound() && avcodec_receive_frame(_decoder.get(), frame.get()) >= 0) {
-      const std::int64_t shown = presentationTime(*frame);
-      const bool isTimed = shown != AV_NOPTS_VALUE;
-      if ((!isTimed || shown <= time) && (!best || !isTimed || shown >= presentationTime(*best))) {
-        best.reset(av_frame_clone(frame.get()));
-      }
-      if (!first || (isTimed && shown < presentationTime(*first))) first.reset(av_frame_clone(frame.get()));
+      std::int64_t& shown = frame->best_effort_timestamp;
+      // Frames come in the order in which they are shown; one without a time comes after the one before.
+      if (shown == AV_NOPTS_VALUE) shown = frame->pts;
+      if (shown == AV_NOPTS_VALUE) shown = last == kNoTime ? time : last + 1;
+      last = shown;
+      if (shown <= time && (!best || shown >= best->best_effort_timestamp)) best.reset(av_frame_clone(frame.get()));
+      if (!first || shown < first->best_effort_timestamp) first.reset(av_frame_clone(frame.get()));
       av_frame_unref(frame.get());
     }
   };
@@ -181,7 +192,7 @@ Result<Frame> FrameFinder::lastFrame(const Stretch& stretch, std::int64_t time, 
   Frame best;
   const bool isTold = stretch.wanted != kNoTime;
   decode(stretch, time, isTold ? Skipping::FramesNobodyNeeds : Skipping::Nothing, best, earliest);
-  if (isTold && (!best || presentationTime(*best) != stretch.wanted)) {
+  if (isTold && (!best || best->best_effort_timestamp != stretch.wanted)) {
     // The wanted frame does not decode: the one before it may be among those that were skipped.
     avcodec_flush_buffers(_decoder.get());
     decode(stretch, time, Skipping::Nothing, best, earliest);

@@ -31,7 +31,8 @@ bool isCompleteInHeader(AVStream& stream) {
   AVCodecParameters& parameters = *stream.codecpar;
   if (parameters.codec_type != AVMEDIA_TYPE_VIDEO && parameters.codec_type != AVMEDIA_TYPE_AUDIO) return true;
   if (isAttachedPicture(stream) || !isDescribed(stream)) return true;
-  if (avformat_index_get_entries_count(&stream) == 0) return false;  // fragments, or nothing at all
+  // Packets of fragments are not counted in the header.
+  if (stream.nb_frames == 0 || avformat_index_get_entries_count(&stream) == 0) return false;
   if (parameters.codec_type == AVMEDIA_TYPE_AUDIO) {
     return (parameters.codec_id == AV_CODEC_ID_AAC || parameters.codec_id == AV_CODEC_ID_ALAC) &&
            parameters.sample_rate > 0 && parameters.ch_layout.nb_channels > 0;

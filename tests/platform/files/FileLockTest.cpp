@@ -1,4 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
+#include <fcntl.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sys/wait.h>
@@ -101,6 +102,27 @@ TEST_F(FileLockTest, FollowsNoLink) {
   ASSERT_FALSE(lock);
   EXPECT_EQ(ErrorKind::Unsafe, lock.error().kind);
   EXPECT_EQ("kept", readPlainly(scratch / "precious"));
+}
+
+// The last holder gives up, and deletes its file, between our opening it and our locking it.
+class DeletedMeanwhile final : public SystemCalls {
+ public:
+  int openAt(int folder, const char* name, int flags, mode_t mode) override {
+    const int file = SystemCalls::openAt(folder, name, flags, mode);
+    if (!_done && (flags & O_CREAT) != 0) unlinkAt(folder, name, 0);
+    _done = true;
+    return file;
+  }
+
+ private:
+  bool _done = false;
+};
+
+TEST_F(FileLockTest, IsNeverTakenOnAFileThatIsGone) {
+  const auto lock = PosixFileManager(std::make_shared<DeletedMeanwhile>()).lockFile(path, "me");
+  ASSERT_TRUE(lock);
+  EXPECT_EQ("me", readPlainly(path));
+  EXPECT_FALSE(files.lockFile(path, "you"));
 }
 
 TEST(FileLockThreadTest, OneHolderAtATime) {

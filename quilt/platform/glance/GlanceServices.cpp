@@ -1,0 +1,79 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "quilt/platform/glance/GlanceServices.h"
+
+#include <algorithm>
+#include <string>
+
+#include "quilt/platform/interfaces/Services.h"
+
+namespace quilt::platform {
+
+namespace {
+
+constexpr double kPosterTime = 10;  // seconds; where an intro is usually over
+
+std::shared_ptr<ImageWrapper> drawing(std::string_view name, std::string_view type) {
+  const Result<std::shared_ptr<ImageWrapper>> image =
+      services().images->imageWithData(services().resources->artwork(name, type));
+  return image ? *image : nullptr;
+}
+
+// The author's choice, else 10 seconds or the middle of a short movie; at a key frame, which needs no other to show.
+double standingTime(Movie& movie) {
+  double time = movie.posterTime().value_or(0);
+  if (time == 0) time = std::min(kPosterTime, movie.duration().value_or(0) / 2);
+  const double keyFrame = movie.keyFrameTimeAtOrBefore(time).value_or(0);
+  return keyFrame != 0 ? keyFrame : time;
+}
+
+std::shared_ptr<ImageWrapper> artworkOf(const std::filesystem::path& path) {
+  const Result<std::unique_ptr<Movie>> movie = services().movies->openMovie(path);
+  return movie ? (*movie)->albumArtworkMovie() : nullptr;
+}
+
+std::shared_ptr<ImageWrapper> pictureOfMovie(const std::filesystem::path& path) {
+  const Result<std::unique_ptr<Movie>> movie = services().movies->openMovie(path);
+  if (!movie) return nullptr;
+  if (std::shared_ptr<ImageWrapper> artwork = (*movie)->albumArtworkMovie()) return artwork;
+  const Result<std::shared_ptr<ImageWrapper>> frame = (*movie)->frameAtTime(standingTime(**movie));
+  if (frame) return *frame;
+  // A movie file may hold sound alone.
+  const std::shared_ptr<const FDYMedia> media = FDYMedia::initWithPath(path);
+  return media && media->hasAudio() && !media->hasVideo() ? drawing("AudioPreview", "png") : nullptr;
+}
+
+std::shared_ptr<ImageWrapper> pictureOfSound(const std::filesystem::path& path) {
+  const std::shared_ptr<ImageWrapper> artwork = artworkOf(path);
+  return artwork ? artwork : drawing("AudioPreview", "png");
+}
+
+std::shared_ptr<ImageWrapper> pictureOf(const Url& url) {
+  if (!url.isFileUrl()) {
+    const std::string& text = url.absoluteString();
+    const bool isWeb = text.starts_with("http:") || text.starts_with("https:");
+    return isWeb ? drawing("WebPreview", "icns") : nullptr;
+  }
+  const std::filesystem::path path = url.relativePath();
+  const std::optional<std::string> type = FDYTypePreferredIdentifier(path);
+  if (!type) return nullptr;
+  const auto isOf = [&](const char* family) { return services().types->conformsTo(*type, family); };
+  if (isOf(types::kImage)) return ImageWrapper::imageWithPath(path);
+  if (isOf(types::kMovie)) return pictureOfMovie(path);
+  if (isOf(types::kAudio)) return pictureOfSound(path);
+  return nullptr;
+}
+
+}  // namespace
+
+std::shared_ptr<ImageWrapper> GlanceServices::thumbnailImageForURL(const Url& url) const {
+  const std::shared_ptr<ImageWrapper> picture = pictureOf(url);
+  return picture ? picture->convertToSD() : nullptr;
+}
+
+std::size_t GlanceServices::documentPagesCount(const std::filesystem::path&) const { return 0; }
+
+std::optional<DocumentPage> GlanceServices::documentPageAtIndex(const std::filesystem::path&, std::size_t) const {
+  return std::nullopt;
+}
+
+}  // namespace quilt::platform
