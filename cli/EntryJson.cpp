@@ -1,0 +1,24 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "cli/EntryJson.h"
+
+namespace quilt::cli {
+
+Json toJson(const DocumentEntry& document) {
+  Json json{
+      {"uuid", document.uuid}, {"title", document.title}, {"type", document.type}, {"path", document.path.native()}};
+  if (document.damage) json["damage"] = document.damage->text;
+  return json;
+}
+
+Json toJson(const CollectionEntry& collection) {
+  Json json{{"uuid", collection.uuid},
+            {"title", collection.title},
+            {"type", "Collection"},
+            {"path", collection.path.native()}};
+  if (collection.damage) json["damage"] = collection.damage->text;
+  json["documents"] = Json::array();
+  for (const DocumentEntry& document : collection.documents) json["documents"].push_back(toJson(document));
+  return json;
+}
+
+}  // namespace quilt::cli

@@ -1,0 +1,71 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "cli/LogCollector.h"
+
+#include <algorithm>
+
+#include "cli/Text.h"
+
+namespace quilt::cli {
+
+namespace {
+
+// An operation over very many objects must not fill the memory with its log.
+constexpr std::size_t kKept = 1000;
+
+const char* nameOf(platform::LogLevel level) {
+  switch (level) {
+    case platform::LogLevel::Critical:
+      return "critical";
+    case platform::LogLevel::Warning:
+      return "warning";
+    case platform::LogLevel::Debug:
+      return "debug";
+  }
+  return "";
+}
+
+bool isFailure(const std::string& message) { return message.starts_with("Failed "); }
+
+}  // namespace
+
+void LogCollector::write(platform::LogLevel level, const std::string& message) {
+  {
+    const std::lock_guard guard(_mutex);
+    if (_lines.size() >= kKept) _lines.erase(_lines.begin(), _lines.begin() + kKept / 2);
+    _lines.push_back({level, message});
+  }
+  if (_printsAll) _messages.line(std::string(nameOf(level)) + ": " + escaped(message));
+}
+
+void LogCollector::beginOperation() {
+  const std::lock_guard guard(_mutex);
+  _lines.clear();
+}
+
+std::string LogCollector::cause() const {
+  const std::lock_guard guard(_mutex);
+  auto first = _lines.rbegin();
+  while (first != _lines.rend() && isFailure(first->message)) ++first;
+  return first.base() == _lines.end() ? std::string() : first.base()->message;
+}
+
+std::string LogCollector::warning(std::string_view beginning) const {
+  const std::lock_guard guard(_mutex);
+  const auto found = std::find_if(_lines.begin(), _lines.end(), [&](const Line& line) {
+    return line.level == platform::LogLevel::Warning && line.message.starts_with(beginning);
+  });
+  return found == _lines.end() ? std::string() : found->message;
+}
+
+void LogCollector::showWarnings() {
+  if (_printsAll) return;
+  std::vector<Line> lines;
+  {
+    const std::lock_guard guard(_mutex);
+    lines.swap(_lines);
+  }
+  for (const Line& line : lines)
+    if (line.level == platform::LogLevel::Warning) _messages.warning(escaped(line.message));
+}
+
+}  // namespace quilt::cli

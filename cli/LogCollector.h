@@ -1,0 +1,43 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <memory>
+#include <mutex>
+#include <string>
+#include <vector>
+
+#include "cli/Messages.h"
+#include "quilt/platform/base/FDYLogger.h"
+
+namespace quilt::cli {
+
+/// Listens to the library's log: prints the lines when asked, and keeps them, so that a failed operation can be
+/// explained and the warnings of one that succeeded can be shown. Any thread.
+class LogCollector : public platform::LogSink {
+ public:
+  LogCollector(Messages& messages, bool printsAll) : _messages(messages), _printsAll(printsAll) {}
+
+  void write(platform::LogLevel level, const std::string& message) override;
+
+  /// Forgets what came before.
+  void beginOperation();
+  /// The first of the lines with which the operation failed; it is the closest to the cause. Empty when there is none.
+  [[nodiscard]] std::string cause() const;
+  /// The first warning that begins so; empty when none has come.
+  [[nodiscard]] std::string warning(std::string_view beginning) const;
+  /// Prints the warnings that have come, unless all lines were printed as they came.
+  void showWarnings();
+
+ private:
+  struct Line {
+    platform::LogLevel level;
+    std::string message;
+  };
+
+  Messages& _messages;
+  const bool _printsAll;
+  mutable std::mutex _mutex;
+  std::vector<Line> _lines;
+};
+
+}  // namespace quilt::cli

@@ -1,0 +1,110 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <optional>
+#include <string>
+#include <utility>
+#include <variant>
+#include <vector>
+
+namespace quilt::cli {
+
+/// What the user asked for, before anything was looked at: the parser makes it, a Delegate carries it out. Objects and
+/// files are as they were typed.
+
+struct ImportRequest {
+  std::vector<std::string> files;
+  bool filesFromInput = false;  ///< more files are listed on the standard input …
+  bool nulSeparated = false;    ///< … ended by NUL bytes, else by line ends
+  std::optional<std::string> collection;
+  bool operator==(const ImportRequest&) const = default;
+};
+
+struct ListRequest {
+  std::optional<std::string> collection;
+  bool operator==(const ListRequest&) const = default;
+};
+
+struct ShowRequest {
+  std::string object;
+  bool operator==(const ShowRequest&) const = default;
+};
+
+struct InfoRequest {
+  std::vector<std::string> files;
+  bool operator==(const InfoRequest&) const = default;
+};
+
+struct NewCollectionRequest {
+  std::string title;
+  bool operator==(const NewCollectionRequest&) const = default;
+};
+
+struct NewDocumentRequest {
+  std::string title;
+  std::optional<std::string> collection;
+  std::string type;
+  bool operator==(const NewDocumentRequest&) const = default;
+};
+
+struct SetRequest {
+  std::string object;
+  std::vector<std::pair<std::string, std::string>> values;  ///< key and value; an empty value clears
+  bool operator==(const SetRequest&) const = default;
+};
+
+struct RemoveRequest {
+  std::vector<std::string> objects;
+  std::optional<std::string>
+      from;  ///< the document that holds the items; none: `objects` is one document or collection
+  bool force = false;
+  bool operator==(const RemoveRequest&) const = default;
+};
+
+struct ExportRequest {
+  std::string document;
+  std::string folder;
+  bool zip = false;
+  std::vector<std::string> formats;  ///< never empty
+  std::optional<std::string> theme;
+  bool operator==(const ExportRequest&) const = default;
+};
+
+struct DoctorRequest {
+  bool operator==(const DoctorRequest&) const = default;
+};
+
+struct HelpRequest {
+  std::optional<std::string> command;
+  bool operator==(const HelpRequest&) const = default;
+};
+
+struct VersionRequest {
+  bool operator==(const VersionRequest&) const = default;
+};
+
+using Command =
+    std::variant<ImportRequest, ListRequest, ShowRequest, InfoRequest, NewCollectionRequest, NewDocumentRequest,
+                 SetRequest, RemoveRequest, ExportRequest, DoctorRequest, HelpRequest, VersionRequest>;
+
+enum class ProgressStyle { Automatic, Json, None };
+
+/// What holds for every command.
+struct Settings {
+  std::optional<std::string> library;  ///< as typed; none: the environment says
+  bool json = false;
+  bool quiet = false;
+  bool verbose = false;
+  bool noColor = false;
+  bool dryRun = false;
+  ProgressStyle progress = ProgressStyle::Automatic;
+  bool operator==(const Settings&) const = default;
+};
+
+struct Request {
+  Settings settings;
+  Command command;
+  bool operator==(const Request&) const = default;
+};
+
+}  // namespace quilt::cli

@@ -1,0 +1,10 @@
+// SPDX-License-Identifier: Apache-2.0
+#include <vector>
+
+#include "cli/Program.h"
+#include "quilt/platform/install.h"
+
+int main(int argc, char** argv) {
+  quilt::platform::install();
+  return quilt::cli::run(std::vector<std::string>(argv + 1, argv + argc));
+}
