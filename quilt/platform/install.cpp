@@ -39,7 +39,7 @@ namespace quilt::platform {
 
 namespace {
 
-Capability leftOut(const char* name, const char* option) {
+[[maybe_unused]] Capability leftOut(const char* name, const char* option) {
   return {name, false, "", std::string("Configure the build with ") + option + "=ON."};
 }
 

@@ -36,6 +36,10 @@ std::string sixDecimals(double value) {
 
 }  // namespace
 
+LogArgument::LogArgument(const char* text) {
+  if (text) _value = std::string(text);
+}
+
 LogArgument::LogArgument(const std::optional<std::string>& text) {
   if (text) _value = *text;
 }

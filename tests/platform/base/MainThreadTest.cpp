@@ -1,6 +1,4 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "quilt/platform/base/MainThread.h"
-
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -10,6 +8,7 @@
 #include <thread>
 #include <vector>
 
+#include "quilt/platform/base/MainThread.h"
 #include "quilt/platform/base/RecursiveMonitor.h"
 #include "quilt/platform/base/Worker.h"
 

@@ -1,12 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "quilt/platform/runloop/BuiltInRunLoop.h"
-
 #include <gtest/gtest.h>
 
 #include <atomic>
 #include <thread>
 
 #include "quilt/platform/base/MainThread.h"
+#include "quilt/platform/runloop/BuiltInRunLoop.h"
 
 namespace quilt::platform {
 namespace {
