@@ -1,8 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "quilt/documents/QuiltDocument.h"
-
 #include <gmock/gmock.h>
 
+#include "quilt/documents/QuiltDocument.h"
 #include "tests/support/DocumentFixture.h"
 #include "tests/support/FaultyServices.h"
 #include "tests/support/PlistByPython.h"
@@ -165,7 +164,8 @@ TEST_F(QuiltDocumentTest, ADocumentWithoutTypeIsOfNoKind) {
 
 TEST_F(QuiltDocumentTest, NoDocumentSaysThatItIsInteractive) {
   const auto document = QuiltDocument::init();
-  for (const char* type : {kQuiltDocumentTypeInteractive, kQuiltDocumentTypeClassicMovie, kQuiltDocumentTypeStaticFile}) {
+  for (const char* type :
+       {kQuiltDocumentTypeInteractive, kQuiltDocumentTypeClassicMovie, kQuiltDocumentTypeStaticFile}) {
     document->setType(type);
     EXPECT_FALSE(document->isInteractive()) << type;
   }
@@ -186,10 +186,18 @@ TEST_F(QuiltDocumentTest, TheTypesAndNamesAreThoseOfTheFiles) {
 
 TEST_F(QuiltDocumentTest, TheClassicTypesComeBeforeTheStaticOnes) {
   namespace types = platform::types;
-  const std::vector<std::string> classic = {
-      "public.aiff-audio",       "public.aifc-audio", types::kM4A,  types::kMP3,                 types::kMPEG4Audio,
-      types::kProtectedMPEG4Audio, types::kMovieContainer, types::kMPEG4, types::kMPEG, types::kProtectedMPEG4Video,
-      types::kM4V,               "public.3gpp"};
+  const std::vector<std::string> classic = {"public.aiff-audio",
+                                            "public.aifc-audio",
+                                            types::kM4A,
+                                            types::kMP3,
+                                            types::kMPEG4Audio,
+                                            types::kProtectedMPEG4Audio,
+                                            types::kMovieContainer,
+                                            types::kMPEG4,
+                                            types::kMPEG,
+                                            types::kProtectedMPEG4Video,
+                                            types::kM4V,
+                                            "public.3gpp"};
   const std::vector<std::string> documents = {types::kPDF, types::kEPUB, "org.idpf.epub-container"};
   EXPECT_EQ(QuiltDocument::allSupportedClassicImportUTIs(), classic);
   EXPECT_EQ(QuiltDocument::allSupportedStaticDocumentImportUTIs(), documents);
@@ -213,11 +221,11 @@ TEST_F(QuiltDocumentTest, EveryKeyIsReadBack) {
   const auto document = opened(fullRecord());
   ASSERT_NE(document, nullptr);
   EXPECT_EQ(document->uuid(), "11111111-2222-4333-8444-555555555555");
-  EXPECT_THAT(fieldsOf(*document),
-              ElementsAre("Title=Tales", "Description=Old & new", "Author=Ann", "Keywords=one, two", "Category=Fiction",
-                          "AdvisoryLabel=Clean", "jukeboxOrder=7", "CreationDate=2020-01-02T03:04:05Z",
-                          "ModifiedDate=2021-01-02T03:04:05Z", "Type=Movie",
-                          "LastPublishURL=https://example.org/tales"));
+  EXPECT_THAT(
+      fieldsOf(*document),
+      ElementsAre("Title=Tales", "Description=Old & new", "Author=Ann", "Keywords=one, two", "Category=Fiction",
+                  "AdvisoryLabel=Clean", "jukeboxOrder=7", "CreationDate=2020-01-02T03:04:05Z",
+                  "ModifiedDate=2021-01-02T03:04:05Z", "Type=Movie", "LastPublishURL=https://example.org/tales"));
   EXPECT_EQ(document->uti(), "qpk");
   EXPECT_FALSE(document->isProcessing());
   EXPECT_EQ(takeLines(), Lines{debug("Loaded document at \"" + package().native() + "\"")});
@@ -273,9 +281,8 @@ TEST_F(QuiltDocumentTest, AFileWithOnlyAVersionLoads) {
 }
 
 TEST_F(QuiltDocumentTest, AnotherVersionIsRefusedWithoutALine) {
-  for (const PropertyList& version :
-       {PropertyList("1.1"), PropertyList("2.0"), PropertyList(""), PropertyList("1"), PropertyList(1.0),
-        PropertyList(Array{"1.0"})}) {
+  for (const PropertyList& version : {PropertyList("1.1"), PropertyList("2.0"), PropertyList(""), PropertyList("1"),
+                                      PropertyList(1.0), PropertyList(Array{"1.0"})}) {
     EXPECT_EQ(opened({{"Version", version}, {"Title", "T"}}), nullptr);
     EXPECT_THAT(takeLines(), IsEmpty());
   }
@@ -304,7 +311,8 @@ TEST_F(QuiltDocumentTest, AFileInThePackagesPlaceIsNoDocument) {
 }
 
 TEST_F(QuiltDocumentTest, APropertiesFileThatCannotBeReadIsReported) {
-  for (const char* content : {"", "no property list", "<?xml version=\"1.0\"?><plist version=\"1.0\"><array/></plist>"}) {
+  for (const char* content :
+       {"", "no property list", "<?xml version=\"1.0\"?><plist version=\"1.0\"><array/></plist>"}) {
     writeFile(package() / "properties.plist", content);
     EXPECT_EQ(QuiltDocument::initWithPath(package()), nullptr);
     EXPECT_EQ(takeLines(), Lines{warning("Failed to open document at path \"" + package().native() +
@@ -357,7 +365,8 @@ TEST_F(QuiltDocumentTest, ARefusedMediaRecordIsDroppedWithoutALine) {
 TEST_F(QuiltDocumentTest, LoadingSavesNothing) {
   const auto document = opened({{"Media", Array{Dictionary{{"UUID", "A"}}}}, {"Title", "T"}});
   ASSERT_NE(document, nullptr);
-  EXPECT_EQ(saved(*document), (Dictionary{{"Media", Array{Dictionary{{"UUID", "A"}}}}, {"Title", "T"}, {"Version", "1.0"}}));
+  EXPECT_EQ(saved(*document),
+            (Dictionary{{"Media", Array{Dictionary{{"UUID", "A"}}}}, {"Title", "T"}, {"Version", "1.0"}}));
 }
 
 TEST_F(QuiltDocumentTest, LoadedItemsKnowTheirDocument) {
@@ -567,17 +576,19 @@ TEST_F(QuiltDocumentTest, WhatANewerVersionWroteIsKeptAtEveryLevelAfterOurs) {
     record.append("News", Dictionary{{"b", Array{1, "two", true}}, {"a", 2.5}});
     return record;
   };
-  const Dictionary derivative = withNews(
-      {{"UUID", "D"}, {"URL", "https://example.org/"}, {"ContentType", "public.url"},
-       {"CompatibilityTags", Array{"Desktop"}}, {"IsFlattened", true}});
+  const Dictionary derivative = withNews({{"UUID", "D"},
+                                          {"URL", "https://example.org/"},
+                                          {"ContentType", "public.url"},
+                                          {"CompatibilityTags", Array{"Desktop"}},
+                                          {"IsFlattened", true}});
   const Dictionary preview = withNews({{"UUID", "P"}, {"Index", 0}});
   const Dictionary samples = withNews({{"UUID", "D"}, {"IsFlattened", true}});
-  const Dictionary source = withNews({{"UUID", "S"}, {"Derivatives", Array{derivative}}, {"Previews", Array{preview}},
-                                      {"AudioSamples", samples}});
+  const Dictionary source = withNews(
+      {{"UUID", "S"}, {"Derivatives", Array{derivative}}, {"Previews", Array{preview}}, {"AudioSamples", samples}});
   const Dictionary extra = withNews({{"UUID", "E"}});
   const Dictionary commentary = withNews({{"UUID", "C"}});
-  const Dictionary item = withNews({{"UUID", "I"}, {"Sources", Array{source}}, {"Extras", Array{extra}},
-                                    {"AudioCommentarySource", commentary}});
+  const Dictionary item = withNews(
+      {{"UUID", "I"}, {"Sources", Array{source}}, {"Extras", Array{extra}}, {"AudioCommentarySource", commentary}});
   const auto document = opened(withNews({{"UUID", "X"}, {"Media", Array{item}}}));
   ASSERT_NE(document, nullptr);
   document->setTitle("Edited");

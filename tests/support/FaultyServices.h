@@ -185,8 +185,7 @@ class [[nodiscard]] Installed {
  public:
   template <class Role>
   explicit Installed(std::shared_ptr<Role> platform::Services::*member)
-      : _double(std::make_shared<Double>()),
-        _scope(std::make_shared<platform::ScopedService<Role>>(member, _double)) {}
+      : _double(std::make_shared<Double>()), _scope(std::make_shared<platform::ScopedService<Role>>(member, _double)) {}
 
   Double* operator->() const { return _double.get(); }
 

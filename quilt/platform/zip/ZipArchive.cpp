@@ -16,6 +16,7 @@
 #include <string_view>
 #include <vector>
 
+#include "quilt/platform/base/Paths.h"
 #include "quilt/platform/interfaces/Services.h"
 #include "quilt/platform/zip/FolderListing.h"
 
@@ -250,6 +251,9 @@ Result<void> syncAndRename(const std::filesystem::path& temporary, const std::fi
 Result<void> ZipArchive::archiveFile(const std::filesystem::path& file, std::string_view underName,
                                      const std::filesystem::path& toZipFile,
                                      const ProgressionBlock& withProgressionBlock) {
+  if (!isPlainComponent(underName)) {
+    return Error{ErrorKind::Unsafe, "The folder cannot have this name in an archive.", file};
+  }
   Result<std::vector<Entry>> entries = zip::listFolder(file, underName);
   if (!entries) return entries.error();
   std::filesystem::path temporary = toZipFile;

@@ -39,7 +39,9 @@ class ZipArchiveTest : public ::testing::Test {
     std::filesystem::create_directories((package / name).parent_path());
     writeFile(package / name, content);
   }
-  Result<void> pack(const ProgressionBlock& block = {}) { return ZipArchive().archiveFile(package, package.filename().native(), zipFile, block); }
+  Result<void> pack(const ProgressionBlock& block = {}) {
+    return ZipArchive().archiveFile(package, package.filename().native(), zipFile, block);
+  }
 
   std::vector<std::string> namesIn(const std::filesystem::path& folder) {
     std::vector<std::string> names;
@@ -113,6 +115,17 @@ TEST_F(ZipArchiveTest, AFileIsPackedAlone) {
   put("a.txt", "one");
   ASSERT_TRUE(ZipArchive().archiveFile(package / "a.txt", "a.txt", zipFile, {}));
   EXPECT_EQ(runProgram({"unzip", "-p", zipFile, "a.txt"}).output, "one");
+}
+
+TEST_F(ZipArchiveTest, TheFolderHasTheGivenNameInside) {
+  put("a.txt", "one");
+  ASSERT_TRUE(ZipArchive().archiveFile(package, "Other.qpk", zipFile, {}));
+  EXPECT_EQ(runProgram({"unzip", "-p", zipFile, "Other.qpk/a.txt"}).output, "one");
+  for (const char* name : {"", ".", "..", "a/b", "../x"}) {
+    const Result<void> packed = ZipArchive().archiveFile(package, name, zipFile, {});
+    ASSERT_FALSE(packed) << name;
+    EXPECT_EQ(packed.error().kind, ErrorKind::Unsafe);
+  }
 }
 
 TEST_F(ZipArchiveTest, ProgressGrowsByBytesFromZeroToAHundred) {
