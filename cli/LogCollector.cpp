@@ -26,6 +26,14 @@ const char* nameOf(platform::LogLevel level) {
 
 bool isFailure(const std::string& message) { return message.starts_with("Failed "); }
 
+// The library ends a line with the error's own sentence in quotes: ... at path "/x": "The disk is full".
+std::string sentenceOf(const std::string& message) {
+  const std::size_t begin = message.rfind(": \"");
+  const std::size_t end = message.rfind('"');
+  if (begin == std::string::npos || end < begin + 4) return message;
+  return message.substr(begin + 3, end - begin - 3);
+}
+
 }  // namespace
 
 void LogCollector::write(platform::LogLevel level, const std::string& message) {
@@ -46,7 +54,7 @@ std::string LogCollector::cause() const {
   const std::lock_guard guard(_mutex);
   auto first = _lines.rbegin();
   while (first != _lines.rend() && isFailure(first->message)) ++first;
-  return first.base() == _lines.end() ? std::string() : first.base()->message;
+  return first.base() == _lines.end() ? std::string() : sentenceOf(first.base()->message);
 }
 
 std::string LogCollector::warning(std::string_view beginning) const {

@@ -21,7 +21,8 @@ class LogCollector : public platform::LogSink {
 
   /// Forgets what came before.
   void beginOperation();
-  /// The first of the lines with which the operation failed; it is the closest to the cause. Empty when there is none.
+  /// What the first of the lines with which the operation failed says, which is the closest to the cause: the error's
+  /// own sentence when the line holds one. Empty when there is no such line.
   [[nodiscard]] std::string cause() const;
   /// The first warning that begins so; empty when none has come.
   [[nodiscard]] std::string warning(std::string_view beginning) const;

@@ -13,15 +13,15 @@ namespace quilt::cli {
 /// files are as they were typed.
 
 struct ImportRequest {
-  std::vector<std::string> files;
+  std::vector<std::string> files{};
   bool filesFromInput = false;  ///< more files are listed on the standard input …
   bool nulSeparated = false;    ///< … ended by NUL bytes, else by line ends
-  std::optional<std::string> collection;
+  std::optional<std::string> collection{};
   bool operator==(const ImportRequest&) const = default;
 };
 
 struct ListRequest {
-  std::optional<std::string> collection;
+  std::optional<std::string> collection{};
   bool operator==(const ListRequest&) const = default;
 };
 
@@ -31,7 +31,7 @@ struct ShowRequest {
 };
 
 struct InfoRequest {
-  std::vector<std::string> files;
+  std::vector<std::string> files{};
   bool operator==(const InfoRequest&) const = default;
 };
 
@@ -42,19 +42,19 @@ struct NewCollectionRequest {
 
 struct NewDocumentRequest {
   std::string title;
-  std::optional<std::string> collection;
+  std::optional<std::string> collection{};
   std::string type;
   bool operator==(const NewDocumentRequest&) const = default;
 };
 
 struct SetRequest {
   std::string object;
-  std::vector<std::pair<std::string, std::string>> values;  ///< key and value; an empty value clears
+  std::vector<std::pair<std::string, std::string>> values{};  ///< key and value; an empty value clears
   bool operator==(const SetRequest&) const = default;
 };
 
 struct RemoveRequest {
-  std::vector<std::string> objects;
+  std::vector<std::string> objects{};
   std::optional<std::string>
       from;  ///< the document that holds the items; none: `objects` is one document or collection
   bool force = false;
@@ -65,8 +65,8 @@ struct ExportRequest {
   std::string document;
   std::string folder;
   bool zip = false;
-  std::vector<std::string> formats;  ///< never empty
-  std::optional<std::string> theme;
+  std::vector<std::string> formats{};  ///< never empty
+  std::optional<std::string> theme{};
   bool operator==(const ExportRequest&) const = default;
 };
 
@@ -75,7 +75,7 @@ struct DoctorRequest {
 };
 
 struct HelpRequest {
-  std::optional<std::string> command;
+  std::optional<std::string> command{};
   bool operator==(const HelpRequest&) const = default;
 };
 
@@ -91,7 +91,7 @@ enum class ProgressStyle { Automatic, Json, None };
 
 /// What holds for every command.
 struct Settings {
-  std::optional<std::string> library;  ///< as typed; none: the environment says
+  std::optional<std::string> library{};  ///< as typed; none: the environment says
   bool json = false;
   bool quiet = false;
   bool verbose = false;

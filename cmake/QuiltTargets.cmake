@@ -2,6 +2,9 @@
 # One target for each level or wrapped library; sources are found by pattern, so none can be left out.
 
 set(QUILT_WARNINGS -Wall -Wextra -Wconversion -Werror)
+if(CMAKE_CXX_COMPILER_ID STREQUAL "GNU" AND CMAKE_CXX_COMPILER_VERSION VERSION_LESS 13)
+  list(APPEND QUILT_WARNINGS -Wno-restrict)  # g++ 12 warns of its own std::string operator+ (its bug 105651)
+endif()
 
 function(quilt_configure_target target)
   target_include_directories(${target} PUBLIC ${PROJECT_SOURCE_DIR})

@@ -83,7 +83,10 @@ QuiltDocument::Outcome QuiltDocument::finalizeMedia(const ProgressionBlock& bloc
     }
     const bool done = item->finalizeWithProgressionBlock(
         [&](double percentage) { return report(block, start + percentage / static_cast<double>(total)); });
-    if (done) return true;
+    if (done) {
+      item->flattenPreviews();
+      return true;
+    }
     FDYLogger::logDebug("Failed to finalize media \"%@\" during finalizing document at path \"%@\"", item->uuid(),
                         path());
     outcome = Outcome::Failed;

@@ -104,6 +104,9 @@ class QuiltMedia : public platform::Object {
   bool flattenWithProgressionBlock(const ProgressionBlock& withProgressionBlock);
   /// Makes the poster and every child's previews.
   bool finalizeWithProgressionBlock(const ProgressionBlock& withProgressionBlock);
+  /// Writes the children's previews that were made since the item was flattened into the package, so that what finalize
+  /// promises to readers of the record is on disk.
+  void flattenPreviews();
   /// Has every child make the format; stops at the first that cannot.
   bool convertToFormat(const std::string& format, const ProgressionBlock& withProgressionBlock);
   /// Flattens, converts and finalizes the whole document, then copies this item's sources into a folder.

@@ -154,6 +154,16 @@ bool QuiltMedia::finalizeChildren(const ProgressionBlock& block) {
   return true;
 }
 
+void QuiltMedia::flattenPreviews() {
+  const auto flatten = [](const auto& child) {
+    child->flattenPreviews();
+    return true;
+  };
+  performBlockOnSources(flatten);
+  performBlockOnExtra(flatten);
+  if (const auto commentary = audioCommentarySource()) flatten(commentary);
+}
+
 bool QuiltMedia::convertToFormat(const std::string& format, const ProgressionBlock& withProgressionBlock) {
   const SaveDeferral deferral;
   const auto commentary = audioCommentarySource();

@@ -107,6 +107,12 @@ Path QuiltMediaPreview::path() const {
   return folder / platform::withExtension(position == kNoIndex ? uuid() : std::to_string(position), "jpg");
 }
 
+bool QuiltMediaPreview::hasPicture() const {
+  if (isFlattened() || _image.get()) return true;
+  const Path file = path();
+  return !file.empty() && services().files->fileExistsAtPath(file);
+}
+
 bool QuiltMediaPreview::flatten() {
   if (isFlattened()) return true;
   const Path file = path();

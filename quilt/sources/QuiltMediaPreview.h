@@ -49,6 +49,8 @@ class QuiltMediaPreview : public platform::Object {
 
   /// Where the picture lies in the package: index (or identity) and "jpg"; empty without a place in a document.
   Path path() const;
+  /// Whether there is a picture or ought to be one: in memory, marked as written, or a file at the path.
+  bool hasPicture() const;
   /// Writes the picture into the package. True at once when it is there.
   bool flatten();
   /// 0 unless flattened.

@@ -107,6 +107,8 @@ class QuiltMediaSource : public platform::Object {
   std::shared_ptr<QuiltMediaPreview> previewAtIndex(std::size_t index);
   /// Makes every preview, reporting each. False, after a critical line, when the block answers false.
   bool previewWithProgressionBlock(const ObjectProgressionBlock<QuiltMediaPreview>& withProgressionBlock);
+  /// Writes the previews that were made since the source was flattened into the package.
+  void flattenPreviews();
   /// Whether every preview that the content has was made.
   bool isPreviewed() const;
   void addPreview(const std::shared_ptr<QuiltMediaPreview>& preview);
@@ -163,6 +165,7 @@ class QuiltMediaSource : public platform::Object {
   void updateDocumentUnlessProcessing() const;
   struct PreviewContent;
   std::shared_ptr<QuiltMediaPreview> existingPreview(std::size_t index) const;
+  std::shared_ptr<QuiltMediaPreview> usablePreview(std::size_t index);
   std::shared_ptr<QuiltMediaPreview> makePreview(const PreviewContent& content, std::size_t index);
   bool convertImage(const std::string& format);
   bool convertAudio(const std::string& format, const ProgressionBlock& block);

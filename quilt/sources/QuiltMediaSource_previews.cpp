@@ -126,10 +126,25 @@ std::shared_ptr<QuiltMediaPreview> QuiltMediaSource::existingPreview(std::size_t
   return _previews.first([index](const auto& preview) { return preview->index() == index; });
 }
 
+std::shared_ptr<QuiltMediaPreview> QuiltMediaSource::usablePreview(std::size_t index) {
+  auto preview = existingPreview(index);
+  if (!preview || preview->hasPicture()) return preview;
+  // Recorded, but never written: the process ended before it could be. It is made again.
+  removePreview(preview);
+  return nullptr;
+}
+
+void QuiltMediaSource::flattenPreviews() {
+  _previews.walk([](const auto& preview) {
+    preview->flatten();
+    return true;
+  });
+}
+
 std::shared_ptr<QuiltMediaPreview> QuiltMediaSource::previewAtIndex(std::size_t index) {
   const SaveDeferral deferral;
   const auto guard = _previews.lock();
-  if (auto existing = existingPreview(index)) return existing;
+  if (auto existing = usablePreview(index)) return existing;
   return makePreview(PreviewContent(*this), index);
 }
 
@@ -161,7 +176,7 @@ bool QuiltMediaSource::previewWithProgressionBlock(
     {
       const SaveDeferral deferral;
       const auto guard = _previews.lock();
-      preview = existingPreview(i);
+      preview = usablePreview(i);
       if (!preview) preview = makePreview(content, i);
     }
     if (platform::report(withProgressionBlock, preview, platform::integerPercentage(i + 1, count))) continue;

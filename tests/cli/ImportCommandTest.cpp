@@ -65,7 +65,7 @@ class ImportCommandTest : public QuiltProgramTest {
 };
 
 TEST_F(ImportCommandTest, MakesADocumentInImportsAndPrintsIt) {
-  const Run run = quilt({"import", movie()});
+  const Ended run = quilt({"import", movie()});
   EXPECT_EQ(0, run.exit) << run.err;
   const json collections = listed();
   ASSERT_THAT(collections, SizeIs(1));
@@ -118,7 +118,7 @@ TEST_F(ImportCommandTest, UsesTheCollectionNamedAndTheDefaultOneAgain) {
 }
 
 TEST_F(ImportCommandTest, AnUnknownCollectionIsNotFoundAndNothingIsMade) {
-  const Run run = quilt({"import", movie(), "--collection", "Nowhere"});
+  const Ended run = quilt({"import", movie(), "--collection", "Nowhere"});
   EXPECT_EQ(3, run.exit);
   EXPECT_THAT(run.err, HasSubstr("There is no collection \"Nowhere\""));
   EXPECT_FALSE(std::filesystem::exists(library()));
@@ -137,7 +137,7 @@ TEST_F(ImportCommandTest, FilesThatMakeNoDocumentAreInvalid) {
   write(folder() / "in/fake.mp4", "words that are no movie");
   write(folder() / "in/empty.mp4", "");
   for (const char* name : {"notes.txt", "fake.mp4", "empty.mp4", "."}) {
-    const Run run = quilt({"import", folder() / "in" / name});
+    const Ended run = quilt({"import", folder() / "in" / name});
     EXPECT_EQ(4, run.exit) << name << run.err;
     EXPECT_THAT(run.err, HasSubstr("Cannot import ")) << name;
   }
@@ -174,7 +174,7 @@ TEST_F(ImportCommandTest, NamesAreNamesWhateverTheyLookLike) {
   std::filesystem::current_path(folder() / "in");
   std::vector<std::string> arguments{"import", "--"};
   arguments.insert(arguments.end(), names.begin(), names.end());
-  const Run run = quilt(arguments);
+  const Ended run = quilt(arguments);
   std::filesystem::current_path(start);
   EXPECT_EQ(0, run.exit) << run.err;
   EXPECT_THAT(listed()[0]["documents"], SizeIs(names.size()));
@@ -182,14 +182,14 @@ TEST_F(ImportCommandTest, NamesAreNamesWhateverTheyLookLike) {
 }
 
 TEST_F(ImportCommandTest, ControlCharactersOfATitleDoNotReachTheTerminal) {
-  const Run run = quilt({"import", movie("a\x1b[31mb\nc.mp4")});
+  const Ended run = quilt({"import", movie("a\x1b[31mb\nc.mp4")});
   EXPECT_EQ(0, run.exit) << run.err;
   EXPECT_EQ(std::string::npos, run.out.find('\x1b'));
   EXPECT_EQ(1, std::count(run.out.begin(), run.out.end(), '\n'));
 }
 
 TEST_F(ImportCommandTest, ADryRunPrintsThePlanAndMakesNothing) {
-  const Run run = quilt({"import", movie(), "--dry-run"});
+  const Ended run = quilt({"import", movie(), "--dry-run"});
   EXPECT_EQ(0, run.exit) << run.err;
   EXPECT_THAT(run.out, StartsWith("Would import \"" + (folder() / "in/opening.mp4").string()));
   EXPECT_THAT(run.out, HasSubstr("new collection \"Imports\""));
@@ -204,7 +204,7 @@ TEST_F(ImportCommandTest, ADryRunPrintsThePlanAndMakesNothing) {
 }
 
 TEST_F(ImportCommandTest, ProgressEventsClimbToAHundred) {
-  const Run run = quilt({"import", movie("a.mp4"), movie("b.mp4"), "--progress=json"});
+  const Ended run = quilt({"import", movie("a.mp4"), movie("b.mp4"), "--progress=json"});
   ASSERT_EQ(0, run.exit);
   std::istringstream lines(run.err);
   double last = -1;
@@ -217,7 +217,7 @@ TEST_F(ImportCommandTest, ProgressEventsClimbToAHundred) {
 }
 
 TEST_F(ImportCommandTest, ProgressOfAFailureDoesNotReachAHundred) {
-  const Run run = quilt({"import", movie("a.mp4"), "/missing.mp4", "--progress=json"});
+  const Ended run = quilt({"import", movie("a.mp4"), "/missing.mp4", "--progress=json"});
   EXPECT_EQ(5, run.exit);
   EXPECT_THAT(run.err, HasSubstr("\"percent\":"));
   EXPECT_EQ(std::string::npos, run.err.find("\"percent\":100"));
@@ -252,7 +252,7 @@ TEST_F(StoppedImportTest, CtrlCLeavesNothingAndSaysSo) {
   const auto program = startBigImport();
   const auto asked = std::chrono::steady_clock::now();
   program->signal(SIGINT);
-  const Run run = program->wait();
+  const Ended run = program->wait();
   EXPECT_LT(std::chrono::steady_clock::now() - asked, std::chrono::seconds(10));
   EXPECT_EQ(130, run.exit) << run.err;
   EXPECT_THAT(run.err, HasSubstr("Stopped. 0 of 1 files were imported"));
@@ -282,7 +282,7 @@ TEST_F(StoppedImportTest, ALibraryThatWasThereIsAsItWas) {
 TEST_F(StoppedImportTest, AnotherWriterIsRefusedAndReadersAreNot) {
   const auto program = startBigImport();
   program->signal(SIGSTOP);
-  const Run refused = quilt({"new", "collection", "Talks"});
+  const Ended refused = quilt({"new", "collection", "Talks"});
   EXPECT_EQ(6, refused.exit);
   EXPECT_THAT(refused.err, HasSubstr("is in use by process "));
   EXPECT_EQ("locked", quiltJson({"import", movie()}, 6)["error"]["code"]);

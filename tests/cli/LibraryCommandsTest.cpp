@@ -41,7 +41,7 @@ class LibraryCommandsTest : public QuiltProgramTest {
 using NewCommandTest = LibraryCommandsTest;
 
 TEST_F(NewCommandTest, PrintsTheUuidOfACollection) {
-  const Run run = quilt({"new", "collection", "Talks"});
+  const Ended run = quilt({"new", "collection", "Talks"});
   EXPECT_EQ(0, run.exit) << run.err;
   ASSERT_THAT(run.out, SizeIs(37));
   const json collection = shown(run.out.substr(0, 36));
@@ -81,7 +81,7 @@ TEST_F(NewCommandTest, ADryRunMakesNothing) {
 TEST_F(NewCommandTest, ALibraryThatIsAFileIsRefused) {
   write(library(), "a file");
   EXPECT_EQ(4, quilt({"list"}).exit);
-  const Run run = quilt({"new", "collection", "Talks"});
+  const Ended run = quilt({"new", "collection", "Talks"});
   EXPECT_NE(0, run.exit);
   EXPECT_THAT(run.err, HasSubstr(library().string()));
   EXPECT_EQ("a file", read(library()));
@@ -92,7 +92,7 @@ TEST_F(NewCommandTest, ALibraryThatIsAFileIsRefused) {
 using ListCommandTest = LibraryCommandsTest;
 
 TEST_F(ListCommandTest, ALibraryThatIsNotThereIsEmptyAndIsNotMade) {
-  const Run run = quilt({"list"});
+  const Ended run = quilt({"list"});
   EXPECT_EQ(0, run.exit);
   EXPECT_EQ("", run.out);
   EXPECT_THAT(quiltJson({"list"})["result"], IsEmpty());
@@ -143,7 +143,7 @@ TEST_F(LibraryCommandsTest, ReadingChangesNothing) {
         "<key>Type</key><string>Movie</string><key>Title</key><string>Bare</string></dict></plist>");
   const auto before = snapshot(library());
   const std::vector<std::vector<std::string>> commands{
-      {"list"},   {"list", "Imports"},      {"show", "a"}, {"show", "Imports"}, {"show", "Bare"},
+      {"list"},   {"list", "Imports"},          {"show", "a"}, {"show", "Imports"}, {"show", "Bare"},
       {"doctor"}, {"info", folder() / "a.mp4"}, {"help"},      {"--version"},       {"show", "nothing"}};
   for (const auto& command : commands) {
     quilt(command);
@@ -180,7 +180,7 @@ TEST_F(LookupTest, WhatMayBeSeveralIsAUsageErrorThatNamesThem) {
   const json document = quiltJson({"show", "Twice"}, 2);
   ASSERT_THAT(document["error"]["candidates"], SizeIs(2));
   EXPECT_EQ(one, document["error"]["candidates"][0]["uuid"]);
-  const Run run = quilt({"remove", "Twice", "--force"});
+  const Ended run = quilt({"remove", "Twice", "--force"});
   EXPECT_EQ(2, run.exit);
   EXPECT_THAT(run.err, HasSubstr(two));
   EXPECT_THAT(quiltJson({"list"})["result"][0]["documents"], SizeIs(2));
@@ -208,10 +208,10 @@ TEST_F(ShowCommandTest, CarriesTheWholeRecordOfADocument) {
 TEST_F(ShowCommandTest, SummarisesForPeople) {
   importMovie("opening.mp4");
   quilt({"set", "opening", "author=Ada", "description=Two\nlines"});
-  const Run run = quilt({"show", "opening"});
+  const Ended run = quilt({"show", "opening"});
   EXPECT_EQ(0, run.exit);
   EXPECT_THAT(run.out, HasSubstr("Author      Ada"));
-  EXPECT_THAT(run.out, HasSubstr("Description  ").Or(HasSubstr("Two\\nlines")));
+  EXPECT_THAT(run.out, HasSubstr("Two\\nlines"));
   EXPECT_THAT(run.out, HasSubstr("320 × 240"));
 }
 
@@ -238,8 +238,8 @@ using SetCommandTest = LibraryCommandsTest;
 
 TEST_F(SetCommandTest, ChangesADocumentAndPrintsNothing) {
   newDocument("One");
-  const Run run = quilt({"set", "One", "title=Two", "description=D", "author=A=B", "keywords=k, l", "category=c",
-                         "advisoryLabel=x", "jukeboxOrder=-7"});
+  const Ended run = quilt({"set", "One", "title=Two", "description=D", "author=A=B", "keywords=k, l", "category=c",
+                           "advisoryLabel=x", "jukeboxOrder=-7"});
   EXPECT_EQ(0, run.exit) << run.err;
   EXPECT_EQ("", run.out);
   const json document = shown("Two");
@@ -311,7 +311,7 @@ TEST_F(SetCommandTest, ChangesNothingUnlessEverythingCanBe) {
 TEST_F(SetCommandTest, ADryRunPrintsThePlanAndChangesNothing) {
   newDocument("One");
   const auto before = snapshot(library());
-  const Run run = quilt({"set", "One", "title=Two", "author=", "--dry-run"});
+  const Ended run = quilt({"set", "One", "title=Two", "author=", "--dry-run"});
   EXPECT_EQ(0, run.exit);
   EXPECT_THAT(run.out, HasSubstr("Would set title of the document \"One\" to \"Two\""));
   EXPECT_THAT(run.out, HasSubstr("Would clear author"));
@@ -325,7 +325,7 @@ using RemoveCommandTest = LibraryCommandsTest;
 TEST_F(RemoveCommandTest, NeedsForceWithoutATerminal) {
   newDocument("One");
   const auto before = snapshot(library());
-  const Run run = quilt({"remove", "One"}, "y\n");
+  const Ended run = quilt({"remove", "One"}, "y\n");
   EXPECT_EQ(2, run.exit);
   EXPECT_THAT(run.err, HasSubstr("needs --force"));
   EXPECT_EQ(before, snapshot(library()));

@@ -1,10 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "cli/Output.h"
-
 #include <gmock/gmock.h>
 #include <unistd.h>
 
 #include <cstdlib>
+
+#include "cli/Output.h"
 
 namespace quilt::cli {
 namespace {

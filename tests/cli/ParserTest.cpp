@@ -1,11 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "cli/Parser.h"
-
 #include <gmock/gmock.h>
 
 #include "cli/Delegate.h"
 #include "cli/Failure.h"
 #include "cli/Options.h"
+#include "cli/Parser.h"
 
 namespace quilt::cli {
 namespace {
@@ -97,9 +96,11 @@ TEST(ParserTest, ExportTakesFormatsInAnyCaseOnceEach) {
 }
 
 TEST(ParserTest, CommonOptionsStandAnywhereBeforeTheDashes) {
-  const Settings expected{.library = "/l", .json = true, .quiet = true, .noColor = true, .progress = ProgressStyle::Json};
+  const Settings expected{
+      .library = "/l", .json = true, .quiet = true, .noColor = true, .progress = ProgressStyle::Json};
   EXPECT_EQ(expected, parse({"--library", "/l", "--json", "-q", "list", "--no-color", "--progress=json"}).settings);
-  EXPECT_EQ(expected, parse({"list", "--quiet", "--json", "--library=/l", "--no-color", "--progress", "JSON"}).settings);
+  EXPECT_EQ(expected,
+            parse({"list", "--quiet", "--json", "--library=/l", "--no-color", "--progress", "JSON"}).settings);
 }
 
 TEST(ParserTest, OnlyCommandsThatWriteCanBePreviewed) {

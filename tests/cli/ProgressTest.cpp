@@ -1,12 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "cli/Progress.h"
-
 #include <gmock/gmock.h>
 
 #include <cmath>
 #include <cstdlib>
 #include <nlohmann/json.hpp>
 #include <sstream>
+
+#include "cli/Progress.h"
 
 namespace quilt::cli {
 namespace {

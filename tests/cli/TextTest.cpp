@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "cli/Text.h"
-
 #include <gtest/gtest.h>
+
+#include "cli/Text.h"
 
 namespace quilt::cli {
 namespace {
@@ -19,10 +19,11 @@ TEST(TextTest, EscapesWhatCouldMoveTheCursorOrHideText) {
 TEST(TextTest, KeepsOrdinaryText) { EXPECT_EQ("Grüße, 日本語 🎬", escaped("Grüße, 日本語 🎬")); }
 
 TEST(TextTest, EscapesBytesThatAreNoUtf8) {
-  EXPECT_EQ("a\\xffb", escaped("a\xff" "b"));
-  EXPECT_EQ("\\xc0\\xaf", escaped("\xc0\xaf"));          // an overlong "/"
+  EXPECT_EQ("a\\xffb", escaped("a\xff"
+                               "b"));
+  EXPECT_EQ("\\xc0\\xaf", escaped("\xc0\xaf"));           // an overlong "/"
   EXPECT_EQ("\\xed\\xa0\\x80", escaped("\xed\xa0\x80"));  // half of a surrogate pair
-  EXPECT_EQ("\\xe2\\x82", escaped("\xe2\x82"));          // cut off
+  EXPECT_EQ("\\xe2\\x82", escaped("\xe2\x82"));           // cut off
 }
 
 TEST(TextTest, TellsUtf8FromOtherBytes) {

@@ -41,9 +41,9 @@ class QuiltDocumentHostileTest : public support::DocumentFixture {
     ASSERT_TRUE((isJpeg ? image->saveAsJPGAtPath(file) : image->saveAsPNGAtURL(Url::fileUrl(file))).hasValue());
   }
 
-  /// Every file of the test's folder that does not lie in the package, with its content and its name.
-  std::map<std::string, std::string> world() const {
-    std::map<std::string, std::string> files;
+  /// Every file of the test's folder that does not lie in the package, with a digest of its content.
+  std::map<std::string, std::size_t> world() const {
+    std::map<std::string, std::size_t> files;
     for (auto entry = std::filesystem::recursive_directory_iterator(folder());
          entry != std::filesystem::recursive_directory_iterator(); ++entry) {
       if (entry->path() == package()) {
@@ -51,7 +51,7 @@ class QuiltDocumentHostileTest : public support::DocumentFixture {
         continue;
       }
       const bool isFile = entry->is_regular_file() && !entry->is_symlink();
-      files[entry->path().native()] = isFile ? readFile(entry->path()) : "";
+      files[entry->path().native()] = isFile ? std::hash<std::string>()(readFile(entry->path())) : 0;
     }
     return files;
   }
@@ -274,9 +274,8 @@ TEST_F(QuiltDocumentHostileTest, NewMediaDoNotFollowALinkedMediaFolder) {
   link(package() / "media", outside());
   const auto before = world();
   const auto document = opened({{"UUID", "DOCUMENT"}});
-  const auto files = world();
   addPictureItem(*document, 1600, 1200);
-  std::map<std::string, std::string> expected = before;
+  std::map<std::string, std::size_t> expected = before;
   expected[(folder() / "1600x1200.png").native()] = readFile(folder() / "1600x1200.png");
   EXPECT_FALSE(document->flattenWithProgressionBlock({}));
   EXPECT_FALSE(document->convertToFormat("480p", {}));

@@ -150,6 +150,17 @@ TEST_F(QuiltMediaPreviewTest, AskingTwiceGivesTheSamePreview) {
   EXPECT_THAT(source->previews(), ElementsAre(preview));
 }
 
+TEST_F(QuiltMediaPreviewTest, APreviewThatWasRecordedButNeverWrittenIsMadeAgain) {
+  const auto source = addSource(pictureFile(8, 8));
+  const auto recorded = QuiltMediaPreview::initWithDictionary({{"Index", 0}}, source);
+  source->addPreview(recorded);
+  const auto preview = source->previewAtIndex(0);
+  ASSERT_NE(preview, nullptr);
+  EXPECT_NE(preview, recorded);
+  EXPECT_NE(preview->image(), nullptr);
+  EXPECT_THAT(source->previews(), ElementsAre(preview));
+}
+
 TEST_F(QuiltMediaPreviewTest, SoundImageAndLinkHaveOnePreviewEach) {
   const auto sound = addSource(support::makeMedia(support::m4aSound()));
   const auto image = addSource(pictureFile(2000, 1000));

@@ -382,7 +382,7 @@ TEST_F(QuiltMediaSourceTest, AThumbnailThatCannotBeMadeIsNotCached) {
 
 TEST_F(QuiltMediaSourceTest, APosterWhosePreviewHasNoPictureSaysWhichUrl) {
   const auto source = addSource(pictureFile(8, 8));
-  source->addPreview(QuiltMediaPreview::initWithDictionary({{"Index", 0}}, source));
+  source->addPreview(QuiltMediaPreview::initWithDictionary({{"Index", 0}, {"IsFlattened", true}}, source));
   takeLines();
   EXPECT_EQ(source->posterImage(), nullptr);
   EXPECT_EQ(takeLines(),

@@ -39,15 +39,15 @@ void makeZip(const std::filesystem::path& file, const std::vector<std::pair<std:
 }
 
 void makeEpub(const std::filesystem::path& file, const std::string& metadata, const std::string& version) {
-  makeZip(file, {{"mimetype", "application/epub+zip"},
-                 {"META-INF/container.xml",
-                  "<?xml version='1.0'?><container version='1.0' xmlns='urn:oasis:names:tc:opendocument:xmlns:container'>"
-                  "<rootfiles><rootfile full-path='OEBPS/content.opf' media-type='application/oebps-package+xml'/>"
-                  "</rootfiles></container>"},
-                 {"OEBPS/content.opf",
-                  "<?xml version='1.0'?><package xmlns='http://www.idpf.org/2007/opf' version='" + version +
-                      "'><metadata xmlns:dc='http://purl.org/dc/elements/1.1/'>" + metadata +
-                      "</metadata><manifest/><spine/></package>"}});
+  makeZip(file,
+          {{"mimetype", "application/epub+zip"},
+           {"META-INF/container.xml",
+            "<?xml version='1.0'?><container version='1.0' xmlns='urn:oasis:names:tc:opendocument:xmlns:container'>"
+            "<rootfiles><rootfile full-path='OEBPS/content.opf' media-type='application/oebps-package+xml'/>"
+            "</rootfiles></container>"},
+           {"OEBPS/content.opf", "<?xml version='1.0'?><package xmlns='http://www.idpf.org/2007/opf' version='" +
+                                     version + "'><metadata xmlns:dc='http://purl.org/dc/elements/1.1/'>" + metadata +
+                                     "</metadata><manifest/><spine/></package>"}});
 }
 
 }  // namespace quilt::support

@@ -8,7 +8,8 @@
 
 namespace quilt::support {
 
-/// A PDF of the given objects, numbered from 1; the first is the catalogue. `trailer` is added to the trailer's entries.
+/// A PDF of the given objects, numbered from 1; the first is the catalogue. `trailer` is added to the trailer's
+/// entries.
 std::string makePdf(const std::vector<std::string>& objects, const std::string& trailer = "");
 
 /// Three objects: a catalogue, the page tree, and one page with these entries ("/MediaBox [0 0 100 200]").

@@ -78,8 +78,8 @@ std::string encode(const Bitmap& bitmap, const Encoding& encoding) {
   }
   if (encoding.colour != "srgb") image = inColour(image, encoding.colour);
   if (!encoding.profile.empty()) {
-    image = checked(vips_icc_transform(image.get(), &out, encoding.profile.c_str(), "input_profile", "srgb", nullptr),
-                    out);
+    image =
+        checked(vips_icc_transform(image.get(), &out, encoding.profile.c_str(), "input_profile", "srgb", nullptr), out);
   } else {
     image = checked(vips_copy(image.get(), &out, nullptr), out);
     vips_image_remove(image.get(), VIPS_META_ICC_NAME);

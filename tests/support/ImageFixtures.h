@@ -30,10 +30,10 @@ int distance(const Rgba& a, const Rgba& b);
 
 /// How a fixture is stored.
 struct Encoding {
-  std::string suffix = ".jpg";         ///< with libvips' options: ".png[palette=true]"
-  std::string colour = "srgb";         ///< "srgb", "cmyk", "b-w", "rgb16", "grey16"
-  int orientation = 1;                 ///< EXIF, 1 to 8
-  std::string profile{};               ///< an ICC profile of libvips ("p3"); empty: none
+  std::string suffix = ".jpg";                ///< with libvips' options: ".png[palette=true]"
+  std::string colour = "srgb";                ///< "srgb", "cmyk", "b-w", "rgb16", "grey16"
+  int orientation = 1;                        ///< EXIF, 1 to 8
+  std::string profile{};                      ///< an ICC profile of libvips ("p3"); empty: none
   std::map<std::string, std::string> exif{};  ///< "ImageDescription": "…"
 };
 

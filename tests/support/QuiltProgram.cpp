@@ -33,7 +33,7 @@ std::vector<char*> pointers(std::vector<std::string>& words) {
 
 }  // namespace
 
-nlohmann::json Run::json() const {
+nlohmann::json Ended::json() const {
   nlohmann::json document = nlohmann::json::parse(out, nullptr, false);
   if (document.is_discarded()) {
     ADD_FAILURE() << "stdout is not one JSON document:\n" << out << "\nstderr:\n" << err;
@@ -64,8 +64,8 @@ RunningProgram::RunningProgram(const std::vector<std::string>& arguments,
   words.insert(words.end(), arguments.begin(), arguments.end());
   std::vector<std::string> variables;
   for (const auto& [name, value] : environment) variables.push_back(name + "=" + value);
-  const int error = posix_spawn(&_process, QUILT_PROGRAM, &actions, &attributes, pointers(words).data(),
-                                pointers(variables).data());
+  const int error =
+      posix_spawn(&_process, QUILT_PROGRAM, &actions, &attributes, pointers(words).data(), pointers(variables).data());
   posix_spawn_file_actions_destroy(&actions);
   posix_spawnattr_destroy(&attributes);
   if (error == 0) return;
@@ -88,14 +88,14 @@ bool RunningProgram::hasEnded() {
   return _ended;
 }
 
-Run RunningProgram::wait() {
+Ended RunningProgram::wait() {
   if (!waitUntil([this] { return hasEnded(); }, 60)) {
     ADD_FAILURE() << "The program does not end";
     kill(_process, SIGKILL);
     waitpid(_process, &_status, 0);
     _ended = true;
   }
-  Run run;
+  Ended run;
   run.exit = WIFEXITED(_status) ? WEXITSTATUS(_status) : -WTERMSIG(_status);
   run.out = contentOf(_folder / "out");
   run.err = contentOf(_folder / "err");
@@ -108,14 +108,14 @@ std::unique_ptr<RunningProgram> QuiltProgramTest::start(const Arguments& argumen
   return std::make_unique<RunningProgram>(all, environment, input);
 }
 
-Run QuiltProgramTest::quilt(const Arguments& arguments, const std::string& input) const {
+Ended QuiltProgramTest::quilt(const Arguments& arguments, const std::string& input) const {
   return start(arguments, input)->wait();
 }
 
 nlohmann::json QuiltProgramTest::quiltJson(const Arguments& arguments, int expectedExit) const {
   Arguments all{"--json"};
   all.insert(all.end(), arguments.begin(), arguments.end());
-  const Run run = quilt(all);
+  const Ended run = quilt(all);
   EXPECT_EQ(expectedExit, run.exit) << run.out << run.err;
   nlohmann::json document = run.json();
   EXPECT_EQ(1, document["schema"]);

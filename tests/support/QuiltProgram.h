@@ -17,7 +17,7 @@
 namespace quilt::support {
 
 /// How a run of the program ended.
-struct Run {
+struct Ended {
   int exit = -1;  ///< the exit code; minus the signal when one ended it
   std::string out;
   std::string err;
@@ -38,7 +38,7 @@ class RunningProgram {
 
   void signal(int number) const;
   /// Waits for its end; fails the test and kills it after a minute.
-  Run wait();
+  Ended wait();
   [[nodiscard]] bool hasEnded();
 
  private:
@@ -54,7 +54,7 @@ class QuiltProgramTest : public ::testing::Test {
   using Arguments = std::vector<std::string>;
 
   /// Runs the program on the library. No colours, no user settings.
-  Run quilt(const Arguments& arguments, const std::string& input = "") const;
+  Ended quilt(const Arguments& arguments, const std::string& input = "") const;
   /// The same with --json, which is parsed.
   nlohmann::json quiltJson(const Arguments& arguments, int expectedExit = 0) const;
   std::unique_ptr<RunningProgram> start(const Arguments& arguments, const std::string& input = "") const;

@@ -76,8 +76,7 @@ Result<void> SimpleFiles::writeAtomically(const std::filesystem::path& path, std
   return {};
 }
 
-Result<std::unique_ptr<platform::FileLock>> SimpleFiles::lockFile(const std::filesystem::path& path,
-                                                                  std::string_view) {
+Result<std::unique_ptr<platform::FileLock>> SimpleFiles::lockFile(const std::filesystem::path& path, std::string_view) {
   return refused(path);
 }
 

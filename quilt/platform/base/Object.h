@@ -15,6 +15,7 @@ namespace quilt::platform {
 ///
 /// Properties (see Property) may be read and set on any thread. Observers of a key hear of each change, also when the
 /// new value equals the old.
+/// Whoever calls an operation keeps the object alive until it returns; an observer may drop its own hold meanwhile.
 class Object : public std::enable_shared_from_this<Object> {
  public:
   Object() = default;

@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <limits>
+#include <thread>
 #include <utility>
 
 #include "quilt/platform/ffmpeg/Duration.h"
@@ -15,7 +16,8 @@ namespace {
 
 constexpr std::int64_t kNoTime = std::numeric_limits<std::int64_t>::min();
 constexpr std::size_t kLookBack = 16;  // packets; no codec reorders more
-constexpr int kMostSteps = 12;         // backwards, each at least to the key frame before, and ever longer
+constexpr std::size_t kManyPackets = 24;
+constexpr int kMostSteps = 12;  // backwards, each at least to the key frame before, and ever longer
 
 std::int64_t presentationTime(const AVPacket& packet) {
   return packet.pts != AV_NOPTS_VALUE ? packet.pts : packet.dts;  // AV_NOPTS_VALUE when there is neither
@@ -115,10 +117,13 @@ FrameFinder::Stretch FrameFinder::readStretch(std::int64_t time) {
 }
 
 Result<void> FrameFinder::prepareDecoder(const Stretch& stretch) {
-  if (_decoder) {
+  // Threads take longer to start than a few frames take to decode.
+  const bool isLong = stretch.packets.size() > kManyPackets;
+  const int threads = isLong ? static_cast<int>(std::clamp(std::thread::hardware_concurrency(), 1U, 4U)) : 1;
+  if (_decoder && _decoder->thread_count >= threads) {
     avcodec_flush_buffers(_decoder.get());
   } else {
-    Result<CodecContext> opened = openDecoder(_stream, 1, _input.path());
+    Result<CodecContext> opened = openDecoder(_stream, threads, _input.path());
     if (!opened) return opened.error();
     _decoder = *std::move(opened);
   }

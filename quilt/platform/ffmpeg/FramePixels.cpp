@@ -67,8 +67,11 @@ int matrixOf(const AVFrame& frame) {
 int convert(const AVFrame& frame, PictureSize size, AVPixelFormat format, std::uint8_t* pixels, int stride) {
   bool isFullRange = frame.color_range == AVCOL_RANGE_JPEG;
   const AVPixelFormat stored = plainFormat(frame.format, isFullRange);
-  const Scaler scaler(sws_getContext(frame.width, frame.height, stored, size.width, size.height, format,
-                                     SWS_BICUBIC | SWS_ACCURATE_RND | SWS_FULL_CHR_H_INT, nullptr, nullptr, nullptr));
+  // Without a change of size only the colour planes are enlarged, for which the sharper filter is not worth its time.
+  const bool isResized = size.width != frame.width || size.height != frame.height;
+  const int flags = (isResized ? SWS_BICUBIC : SWS_BILINEAR) | SWS_ACCURATE_RND | SWS_FULL_CHR_H_INT;
+  const Scaler scaler(sws_getContext(frame.width, frame.height, stored, size.width, size.height, format, flags, nullptr,
+                                     nullptr, nullptr));
   if (!scaler) return AVERROR_PATCHWELCOME;
   constexpr int one = 1 << 16;
   // Fails, harmlessly, for formats that are RGB already.

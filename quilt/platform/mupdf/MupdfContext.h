@@ -26,8 +26,8 @@ class MupdfContext {
   MupdfContext& operator=(const MupdfContext&) = delete;
   ~MupdfContext();
 
-  /// Runs `body` and answers what went wrong in it: `sentence`, with MuPDF's own words. `body` may be left in its middle,
-  /// so it owns nothing that needs a destructor.
+  /// Runs `body` and answers what went wrong in it: `sentence`, with MuPDF's own words. `body` may be left in its
+  /// middle, so it owns nothing that needs a destructor.
   Result<void> run(std::string_view sentence, const std::filesystem::path& file,
                    const std::function<void(fz_context*)>& body);
 

@@ -25,9 +25,8 @@ class Book {
 
   bool has(const char* name) {
     bool found = false;
-    const Result<void> asked = _context.run(kDamaged, _path, [&](fz_context* c) {
-      found = fz_has_archive_entry(c, _archive.object, name) != 0;
-    });
+    const Result<void> asked = _context.run(
+        kDamaged, _path, [&](fz_context* c) { found = fz_has_archive_entry(c, _archive.object, name) != 0; });
     return asked && found;
   }
 
@@ -98,7 +97,8 @@ Result<MediaFacts> inspectEPUB(const std::filesystem::path& path) {
     facts.metadataTitle = texts(metadata, "title");
     facts.metadataAuthor = texts(metadata, "creator");
     facts.metadataInformation = texts(metadata, "description");
-    if (std::optional<std::string> language = texts(metadata, "language")) facts.details.emplace_back("Language", *language);
+    if (std::optional<std::string> language = texts(metadata, "language"))
+      facts.details.emplace_back("Language", *language);
   }
   const char* version = fz_xml_att(top, "version");
   facts.details.insert(facts.details.begin(), {"Format", version ? std::string("EPUB ") + version : "EPUB"});

@@ -16,9 +16,8 @@ constexpr const char* kDamaged = "The document is damaged";
 std::optional<std::string> metadata(MupdfContext& context, pdf_document* document, const char* key) {
   std::string text(kMaximumText, '\0');
   int length = 0;
-  const Result<void> read = context.run(kDamaged, {}, [&](fz_context* c) {
-    length = pdf_lookup_metadata(c, document, key, text.data(), kMaximumText);
-  });
+  const Result<void> read = context.run(
+      kDamaged, {}, [&](fz_context* c) { length = pdf_lookup_metadata(c, document, key, text.data(), kMaximumText); });
   if (!read || length <= 1) return std::nullopt;
   text.resize(text.find('\0'));
   return trimmed(text);

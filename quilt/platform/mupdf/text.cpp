@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "quilt/platform/mupdf/documents.h"
-
 #include <algorithm>
+
+#include "quilt/platform/mupdf/documents.h"
 
 namespace quilt::platform::mupdf {
 
@@ -13,8 +13,11 @@ constexpr const char* kWhite = " \t\r\n\f\v";
 bool isText(const std::string& text) {
   for (std::size_t i = 0; i < text.size();) {
     const auto lead = static_cast<unsigned char>(text[i]);
-    const std::size_t length = lead < 0x80 ? 1 : lead >= 0xC2 && lead < 0xE0 ? 2 : lead >= 0xE0 && lead < 0xF0 ? 3
-                               : lead >= 0xF0 && lead < 0xF5 ? 4 : 0;
+    const std::size_t length = lead < 0x80                   ? 1
+                               : lead >= 0xC2 && lead < 0xE0 ? 2
+                               : lead >= 0xE0 && lead < 0xF0 ? 3
+                               : lead >= 0xF0 && lead < 0xF5 ? 4
+                                                             : 0;
     if (length == 0 || text.size() - i < length || lead == 0x7F) return false;
     if (lead < 0x20 && lead != '\t' && lead != '\n' && lead != '\r') return false;
     for (std::size_t k = 1; k < length; ++k) {

@@ -63,11 +63,15 @@ struct Layout {
 
 bool isKnown(std::uint32_t packing, std::uint32_t bits) {
   switch (static_cast<Packing>(packing)) {
-    case Packing::Plain: return bits == 1 || bits == 4 || bits == 8 || bits == 16 || bits == 24 || bits == 32;
-    case Packing::RunLength8: return bits == 8;
-    case Packing::RunLength4: return bits == 4;
+    case Packing::Plain:
+      return bits == 1 || bits == 4 || bits == 8 || bits == 16 || bits == 24 || bits == 32;
+    case Packing::RunLength8:
+      return bits == 8;
+    case Packing::RunLength4:
+      return bits == 4;
     case Packing::BitFields:
-    case Packing::BitFieldsAlpha: return bits == 16 || bits == 32;
+    case Packing::BitFieldsAlpha:
+      return bits == 16 || bits == 32;
   }
   return false;
 }

@@ -14,7 +14,7 @@ namespace quilt::platform::vips {
 
 /// One picture of an icon file.
 struct IconPicture {
-  std::size_t nominalSide = 0;               ///< pixels, by its type; an image file inside may say otherwise
+  std::size_t nominalSide = 0;                ///< pixels, by its type; an image file inside may say otherwise
   std::variant<std::string, Bitmap> content;  ///< the bytes of an image file, or pixels
 };
 

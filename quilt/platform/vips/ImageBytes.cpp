@@ -25,15 +25,24 @@ bool isHEIF(std::string_view bytes) {
 
 const char* nameOf(ImageFormat format) {
   switch (format) {
-    case ImageFormat::JPEG: return "JPEG";
-    case ImageFormat::PNG: return "PNG";
-    case ImageFormat::TIFF: return "TIFF";
-    case ImageFormat::GIF: return "GIF";
-    case ImageFormat::WebP: return "WebP";
-    case ImageFormat::JPEG2000: return "JPEG 2000";
-    case ImageFormat::HEIF: return "HEIF";
-    case ImageFormat::BMP: return "BMP";
-    case ImageFormat::ICNS: return "ICNS";
+    case ImageFormat::JPEG:
+      return "JPEG";
+    case ImageFormat::PNG:
+      return "PNG";
+    case ImageFormat::TIFF:
+      return "TIFF";
+    case ImageFormat::GIF:
+      return "GIF";
+    case ImageFormat::WebP:
+      return "WebP";
+    case ImageFormat::JPEG2000:
+      return "JPEG 2000";
+    case ImageFormat::HEIF:
+      return "HEIF";
+    case ImageFormat::BMP:
+      return "BMP";
+    case ImageFormat::ICNS:
+      return "ICNS";
   }
   return "";
 }

@@ -46,15 +46,19 @@ bool hasForeignProfile(::VipsImage* image) {
 // What the decoder of such a picture keeps in memory at once.
 bool isHeldWhole(::VipsImage* image, ImageFormat format) {
   switch (format) {
-    case ImageFormat::JPEG: return integer(image, "jpeg-multiscan") != 0;
-    case ImageFormat::PNG: return integer(image, "interlaced") != 0;
-    case ImageFormat::TIFF: return false;
+    case ImageFormat::JPEG:
+      return integer(image, "jpeg-multiscan") != 0;
+    case ImageFormat::PNG:
+      return integer(image, "interlaced") != 0;
+    case ImageFormat::TIFF:
+      return false;
     case ImageFormat::GIF:
     case ImageFormat::WebP:
     case ImageFormat::JPEG2000:
     case ImageFormat::HEIF:
     case ImageFormat::BMP:
-    case ImageFormat::ICNS: return true;
+    case ImageFormat::ICNS:
+      return true;
   }
   return true;
 }
@@ -105,12 +109,15 @@ Image openPixels(::VipsSource* source, ImageFormat format, double reduction) {
     case ImageFormat::WebP:
       failed = vips_webpload_source(source, &out, "access", VIPS_ACCESS_SEQUENTIAL, nullptr);
       break;
-    case ImageFormat::JPEG2000: failed = openJPEG2000(source, &out, reduction); break;
+    case ImageFormat::JPEG2000:
+      failed = openJPEG2000(source, &out, reduction);
+      break;
     case ImageFormat::HEIF:
       failed = vips_heifload_source(source, &out, "access", VIPS_ACCESS_SEQUENTIAL, nullptr);
       break;
     case ImageFormat::BMP:
-    case ImageFormat::ICNS: break;
+    case ImageFormat::ICNS:
+      break;
   }
   return Image(failed ? nullptr : out);
 }

@@ -12,9 +12,9 @@
 namespace quilt::platform::vips {
 
 /// Limits. A picture beyond them is refused as Damaged before any of its pixels is decoded.
-inline constexpr double kMaximumSide = 100'000;               ///< pixels
-inline constexpr double kMaximumStreamedPixels = 500e6;       ///< of formats that are decoded row by row
-inline constexpr double kMaximumHeldPixels = 100e6;           ///< of pictures that a decoder must hold whole
+inline constexpr double kMaximumSide = 100'000;                ///< pixels
+inline constexpr double kMaximumStreamedPixels = 500e6;        ///< of formats that are decoded row by row
+inline constexpr double kMaximumHeldPixels = 100e6;            ///< of pictures that a decoder must hold whole
 inline constexpr std::uint64_t kMaximumHeldBytes = 512 << 20;  ///< of files that are read into memory whole
 
 /// What the first part of a file tells about the picture in it.
@@ -32,8 +32,8 @@ struct ImageHeader {
 /// Reads the header with libvips' loader for the format, never decoding; for every format but BMP and ICNS.
 Result<ImageHeader> readHeader(const ImageBytes& bytes, ImageFormat format);
 
-/// Opens the picture for one pass from the top. `reduction`: how many times smaller it may be decoded, at most; JPEG and
-/// JPEG 2000 decode fewer pixels then. `source` is what bytes.open() answered.
+/// Opens the picture for one pass from the top. `reduction`: how many times smaller it may be decoded, at most; JPEG
+/// and JPEG 2000 decode fewer pixels then. `source` is what bytes.open() answered.
 Image openPixels(::VipsSource* source, ImageFormat format, double reduction);
 
 /// Damaged when the size is beyond the limits.

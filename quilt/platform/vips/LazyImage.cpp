@@ -54,8 +54,7 @@ Result<void> LazyImage::saveAsJPGAtPath(const std::filesystem::path& path) const
   if (isTransparent(*image)) image = onWhite(*image);
   void* bytes = nullptr;
   std::size_t length = 0;
-  if (!*image ||
-      vips_jpegsave_buffer(image->get(), &bytes, &length, "Q", kJPEGQuality, "strip", TRUE, nullptr) != 0) {
+  if (!*image || vips_jpegsave_buffer(image->get(), &bytes, &length, "Q", kJPEGQuality, "strip", TRUE, nullptr) != 0) {
     return failure(ErrorKind::Damaged, "The image cannot be decoded and written as JPEG", path);
   }
   return write(path, bytes, length);

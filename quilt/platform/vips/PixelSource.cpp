@@ -48,9 +48,8 @@ Image inSRGB(Image image) {
     image = step(image, [](::VipsImage* in, ::VipsImage** out) { return vips_cast_uchar(in, out, nullptr); });
   }
   if (image && vips_image_get_bands(image.get()) > 4) {
-    image = step(image, [](::VipsImage* in, ::VipsImage** out) {
-      return vips_extract_band(in, out, 0, "n", 4, nullptr);
-    });
+    image =
+        step(image, [](::VipsImage* in, ::VipsImage** out) { return vips_extract_band(in, out, 0, "n", 4, nullptr); });
   }
   return image;
 }

@@ -9,8 +9,8 @@
 namespace quilt::platform {
 
 /// Images through libvips: JPEG, PNG, TIFF, GIF, WebP, JPEG 2000, HEIF, BMP and ICNS, whatever the file is called; of
-/// files with several pictures the first, of icon files the largest. A picture of more than 100,000 pixels a side, or of
-/// more than 500 million in all (100 million in formats that have to be held whole), is refused as Damaged. What is
+/// files with several pictures the first, of icon files the largest. A picture of more than 100,000 pixels a side, or
+/// of more than 500 million in all (100 million in formats that have to be held whole), is refused as Damaged. What is
 /// missing at the end of a cut file is blank. A file must stay in place while an image made from it is used; one that
 /// was replaced by a picture of another size is refused. JPEG is written at quality 85, without the camera's notes.
 /// Any thread.

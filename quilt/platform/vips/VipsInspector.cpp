@@ -11,15 +11,24 @@ namespace {
 // By what the file holds, not by what it is called.
 const char* identifierOf(vips::ImageFormat format) {
   switch (format) {
-    case vips::ImageFormat::JPEG: return types::kJPEG;
-    case vips::ImageFormat::PNG: return types::kPNG;
-    case vips::ImageFormat::TIFF: return types::kTIFF;
-    case vips::ImageFormat::GIF: return types::kGIF;
-    case vips::ImageFormat::WebP: return "org.webmproject.webp";
-    case vips::ImageFormat::JPEG2000: return types::kJPEG2000;
-    case vips::ImageFormat::HEIF: return types::kHEIC;
-    case vips::ImageFormat::BMP: return types::kBMP;
-    case vips::ImageFormat::ICNS: return types::kICNS;
+    case vips::ImageFormat::JPEG:
+      return types::kJPEG;
+    case vips::ImageFormat::PNG:
+      return types::kPNG;
+    case vips::ImageFormat::TIFF:
+      return types::kTIFF;
+    case vips::ImageFormat::GIF:
+      return types::kGIF;
+    case vips::ImageFormat::WebP:
+      return "org.webmproject.webp";
+    case vips::ImageFormat::JPEG2000:
+      return types::kJPEG2000;
+    case vips::ImageFormat::HEIF:
+      return types::kHEIC;
+    case vips::ImageFormat::BMP:
+      return types::kBMP;
+    case vips::ImageFormat::ICNS:
+      return types::kICNS;
   }
   return types::kImage;
 }

@@ -39,9 +39,10 @@ constexpr zip_uint16_t kDate = 1 << 5 | 1;
 // What is compressed already: packing it again costs time and gains nothing.
 bool isCompressed(const std::filesystem::path& file) {
   static constexpr std::array<std::string_view, 40> extensions = {
-      ".3gp",  ".7z",   ".aac", ".avi", ".avif", ".bz2", ".docx", ".epub", ".flac", ".gif", ".gz",   ".heic", ".icns", ".jp2",
-      ".jpeg", ".jpg",  ".jpx", ".m4a", ".m4b",  ".m4p", ".m4v",  ".mkv",  ".mov",  ".mp3", ".mp4",  ".mpeg", ".mpg",  ".odp",
-      ".odt",  ".oga",  ".ogg", ".ogv", ".opus", ".png", ".pptx", ".webm", ".webp", ".woff", ".xz", ".zip"};
+      ".3gp", ".7z",   ".aac",  ".avi", ".avif", ".bz2",  ".docx", ".epub", ".flac", ".gif",
+      ".gz",  ".heic", ".icns", ".jp2", ".jpeg", ".jpg",  ".jpx",  ".m4a",  ".m4b",  ".m4p",
+      ".m4v", ".mkv",  ".mov",  ".mp3", ".mp4",  ".mpeg", ".mpg",  ".odp",  ".odt",  ".oga",
+      ".ogg", ".ogv",  ".opus", ".png", ".pptx", ".webm", ".webp", ".woff", ".xz",   ".zip"};
   static_assert(std::is_sorted(extensions.begin(), extensions.end()));
   std::string extension = file.extension().string();
   for (char& c : extension) {
@@ -126,8 +127,10 @@ class Packing {
   static zip_int64_t source(void* user, void* data, zip_uint64_t length, zip_source_cmd_t command) {
     auto& reader = *static_cast<Reader*>(user);
     switch (command) {
-      case ZIP_SOURCE_OPEN: return reader.packing->open(reader);
-      case ZIP_SOURCE_READ: return reader.packing->read(reader, data, length);
+      case ZIP_SOURCE_OPEN:
+        return reader.packing->open(reader);
+      case ZIP_SOURCE_READ:
+        return reader.packing->read(reader, data, length);
       case ZIP_SOURCE_CLOSE:
         if (reader.descriptor >= 0) close(reader.descriptor);
         reader.descriptor = -1;
@@ -139,7 +142,8 @@ class Packing {
         stat.size = reader.entry->size;
         return sizeof stat;
       }
-      case ZIP_SOURCE_ERROR: return zip_error_to_data(&reader.error, data, length);
+      case ZIP_SOURCE_ERROR:
+        return zip_error_to_data(&reader.error, data, length);
       case ZIP_SOURCE_SUPPORTS:
         return zip_source_make_command_bitmap(ZIP_SOURCE_OPEN, ZIP_SOURCE_READ, ZIP_SOURCE_CLOSE, ZIP_SOURCE_STAT,
                                               ZIP_SOURCE_ERROR, ZIP_SOURCE_FREE, -1);
@@ -156,7 +160,8 @@ class Packing {
       case ZIP_SOURCE_RESERVED_1:
       case ZIP_SOURCE_BEGIN_WRITE_CLONING:
       case ZIP_SOURCE_ACCEPT_EMPTY:
-      case ZIP_SOURCE_GET_FILE_ATTRIBUTES: return 0;
+      case ZIP_SOURCE_GET_FILE_ATTRIBUTES:
+        return 0;
     }
     return 0;
   }

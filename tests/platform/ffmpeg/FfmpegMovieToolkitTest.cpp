@@ -139,6 +139,17 @@ TEST_F(FfmpegMovieToolkitTest, TheFrameShownAtATimeIsFound) {
   }
 }
 
+TEST_F(FfmpegMovieToolkitTest, FramesFarFromTheirKeyFrameAreFound) {
+  for (const char* codec : {"libx264", "mpeg4"}) {
+    MediaSpec spec = countingMovie();
+    spec.keyFrameInterval = 50;
+    spec.videoCodec = codec;
+    if (spec.videoCodec == "mpeg4") spec.options = {"-q:v", "1", "-bf", "2"};
+    const std::unique_ptr<Movie> movie = open(spec);
+    for (const int i : {49, 30, 3, 41, 0, 27}) EXPECT_EQ(number(frame(*movie, i / 25.0 + 0.02)), i) << codec;
+  }
+}
+
 TEST_F(FfmpegMovieToolkitTest, FramesAreFoundInAnyOrder) {
   const std::unique_ptr<Movie> movie = open(countingMovie());
   for (const int i : {49, 0, 26, 25, 24, 1, 48, 3}) EXPECT_EQ(number(frame(*movie, i / 25.0)), i);

@@ -1,8 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "quilt/platform/glance/GlanceServices.h"
-
 #include <gtest/gtest.h>
 
+#include "quilt/platform/glance/GlanceServices.h"
 #include "quilt/platform/interfaces/Services.h"
 
 namespace quilt::platform {
@@ -44,7 +43,8 @@ struct Stage final : Images, MovieToolkit, TypeIdentifiers, Resources, MediaInsp
     [[nodiscard]] std::optional<double> keyFrameTimeAtOrBefore(double) override { return _stage.keyFrame; }
     [[nodiscard]] Result<std::shared_ptr<ImageWrapper>> frameAtTime(double time) override {
       if (!_stage.hasFrames) return kNothing;
-      return std::shared_ptr<ImageWrapper>(std::make_shared<NamedImage>("frame at " + std::to_string(time).substr(0, 4)));
+      return std::shared_ptr<ImageWrapper>(
+          std::make_shared<NamedImage>("frame at " + std::to_string(time).substr(0, 4)));
     }
     [[nodiscard]] std::shared_ptr<ImageWrapper> albumArtworkMovie() override {
       return _stage.hasArtwork ? std::make_shared<NamedImage>("artwork") : nullptr;
@@ -58,7 +58,8 @@ struct Stage final : Images, MovieToolkit, TypeIdentifiers, Resources, MediaInsp
   [[nodiscard]] Result<std::shared_ptr<ImageWrapper>> imageWithPath(const std::filesystem::path& path) const override {
     return std::shared_ptr<ImageWrapper>(std::make_shared<NamedImage>(path.filename()));
   }
-  [[nodiscard]] Result<std::shared_ptr<ImageWrapper>> imageWithData(std::span<const unsigned char> data) const override {
+  [[nodiscard]] Result<std::shared_ptr<ImageWrapper>> imageWithData(
+      std::span<const unsigned char> data) const override {
     return std::shared_ptr<ImageWrapper>(std::make_shared<NamedImage>(std::string(data.begin(), data.end())));
   }
   [[nodiscard]] Result<std::shared_ptr<ImageWrapper>> imageWithBitmap(Bitmap) const override { return kNothing; }

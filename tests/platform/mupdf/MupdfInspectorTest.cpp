@@ -1,12 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "quilt/platform/mupdf/MupdfInspector.h"
-
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <atomic>
 #include <thread>
 
+#include "quilt/platform/mupdf/MupdfInspector.h"
 #include "tests/support/DocumentFixtures.h"
 #include "tests/support/ImageFixtures.h"
 #include "tests/support/ScratchFolder.h"
@@ -115,7 +114,8 @@ TEST_F(MupdfInspectorTest, ABookUnderRightsIsUnsupported) {
 }
 
 TEST_F(MupdfInspectorTest, ABookThatExpandsAThousandfoldIsStopped) {
-  makeZip(folder / "a.epub", {{"META-INF/container.xml", "<container>" + std::string(100 << 20, ' ') + "</container>"}});
+  makeZip(folder / "a.epub",
+          {{"META-INF/container.xml", "<container>" + std::string(100 << 20, ' ') + "</container>"}});
   EXPECT_LT(std::filesystem::file_size(folder / "a.epub"), 1U << 20);
   EXPECT_EQ(error(folder / "a.epub").text, "The book is damaged (a file in it is too large).");
 }
@@ -207,8 +207,8 @@ TEST_F(MupdfInspectorTest, RealDocumentsThatCannotBeShown) {
   const Error locked = error(corpusImage("pdf-encrypted-user-password.pdf"));
   EXPECT_EQ(locked.kind, ErrorKind::Unsupported);
   EXPECT_EQ(locked.text, "The document is protected by a password.");
-  for (const char* name : {"bad-pdf-fuzz.pdf", "bad-pdf-no-catalog.pdf", "bad-pdf-no-signature.pdf",
-                           "bad-pdf-recursive-pages.pdf"}) {
+  for (const char* name :
+       {"bad-pdf-fuzz.pdf", "bad-pdf-no-catalog.pdf", "bad-pdf-no-signature.pdf", "bad-pdf-recursive-pages.pdf"}) {
     SCOPED_TRACE(name);
     const Result<MediaFacts> read = MupdfInspector().inspect(corpusImage(name));
     EXPECT_TRUE(read || read.error().kind == ErrorKind::Damaged);

@@ -11,7 +11,7 @@ namespace {
 
 using namespace quilt::support;
 
-std::string little(std::uint32_t value, std::size_t size) {
+std::string little(std::uint64_t value, std::size_t size) {
   std::string bytes;
   for (std::size_t i = 0; i < size; ++i) bytes += static_cast<char>(value >> (8 * i));
   return bytes;
@@ -67,7 +67,8 @@ TEST(BmpReaderTest, ReadsEveryDepth) {
                            .bytes()));
   const std::string full = kPalette + std::string(1024 - kPalette.size(), '\0');
   expectColors(readBmp(Bmp{.bits = 8, .afterHeader = full, .pixels = "\2\3\0\0"s + "\0\1\0\0"s}.bytes()));
-  expectColors(readBmp(Bmp{.bits = 4, .afterHeader = full.substr(0, 64), .pixels = "\x23\0\0\0"s + "\x01\0\0\0"s}.bytes()));
+  expectColors(
+      readBmp(Bmp{.bits = 4, .afterHeader = full.substr(0, 64), .pixels = "\x23\0\0\0"s + "\x01\0\0\0"s}.bytes()));
 }
 
 TEST(BmpReaderTest, ReadsOneBitAndTheOldHeader) {
@@ -86,16 +87,11 @@ TEST(BmpReaderTest, ReadsOneBitAndTheOldHeader) {
 
 TEST(BmpReaderTest, ReadsRunLengthsAndRowsFromTheTop) {
   const std::string full = kPalette + std::string(1024 - kPalette.size(), '\0');
-  expectColors(readBmp(Bmp{.bits = 8,
-                           .packing = 1,
-                           .afterHeader = full,
-                           .pixels = "\1\2\1\3\0\0"s + "\1\0\1\1\0\1"s}
-                           .bytes()));
-  expectColors(readBmp(Bmp{.bits = 4,
-                           .packing = 2,
-                           .afterHeader = full.substr(0, 64),
-                           .pixels = "\2\x23\0\0"s + "\2\x01\0\1"s}
-                           .bytes()));
+  expectColors(
+      readBmp(Bmp{.bits = 8, .packing = 1, .afterHeader = full, .pixels = "\1\2\1\3\0\0"s + "\1\0\1\1\0\1"s}.bytes()));
+  expectColors(
+      readBmp(Bmp{.bits = 4, .packing = 2, .afterHeader = full.substr(0, 64), .pixels = "\2\x23\0\0"s + "\2\x01\0\1"s}
+                  .bytes()));
   expectColors(readBmp(Bmp{.height = -2, .pixels = kRows24.substr(8) + kRows24.substr(0, 8)}.bytes()));
 }
 
@@ -103,8 +99,8 @@ TEST(BmpReaderTest, KeepsTransparencyOnlyWhereTheHeaderSaysSo) {
   const std::string fields = little(0xFF0000, 4) + little(0xFF00, 4) + little(0xFF, 4) + little(0xFF000000, 4);
   const std::string pixels = "\0\0\xFF\x80"s;
   const auto read = [&](std::uint32_t packing, const std::string& after) {
-    return readBmp(Bmp{.width = 1, .height = 1, .bits = 32, .packing = packing, .afterHeader = after, .pixels = pixels}
-                       .bytes());
+    return readBmp(
+        Bmp{.width = 1, .height = 1, .bits = 32, .packing = packing, .afterHeader = after, .pixels = pixels}.bytes());
   };
   EXPECT_EQ(pixelAt(*read(6, fields), 0, 0), (Rgba{255, 0, 0, 128}));
   EXPECT_EQ(pixelAt(*read(0, ""), 0, 0), kRed);
@@ -114,7 +110,8 @@ TEST(BmpReaderTest, EveryLengthAndEveryFlippedByteIsSurvived) {
   const std::string full = kPalette + std::string(48, '\0');
   for (const std::string& whole :
        {Bmp{.pixels = kRows24}.bytes(),
-        Bmp{.bits = 4, .packing = 2, .afterHeader = full, .pixels = "\2\x23\0\0\0\4\x12\x34\0\2\1\1\2\x01\0\1"s}.bytes()}) {
+        Bmp{.bits = 4, .packing = 2, .afterHeader = full, .pixels = "\2\x23\0\0\0\4\x12\x34\0\2\1\1\2\x01\0\1"s}
+            .bytes()}) {
     for (std::size_t length = 0; length < whole.size(); ++length) (void)readBmp(whole.substr(0, length));
     for (std::size_t i = 0; i < whole.size(); ++i) {
       for (const int flip : {1, 0x80, 0xFF}) {
@@ -163,8 +160,9 @@ TEST(IcnsReaderTest, ReadsRunLengthsWithTransparencyAsAChannel) {
 }
 
 TEST(IcnsReaderTest, EveryLengthAndEveryFlippedByteIsSurvived) {
-  const std::string whole =
-      icon({{"is32", "\xFF\xFF\xFB\xFF\xFF\0\xFB\0\xFF\x10\xFB\x10"s}, {"s8mk", std::string(256, '\x40')}, {"ic04", "ARGB\3"}});
+  const std::string whole = icon({{"is32", "\xFF\xFF\xFB\xFF\xFF\0\xFB\0\xFF\x10\xFB\x10"s},
+                                  {"s8mk", std::string(256, '\x40')},
+                                  {"ic04", "ARGB\3"}});
   for (std::size_t length = 0; length < whole.size(); ++length) (void)readIcns(whole.substr(0, length));
   for (std::size_t i = 0; i < whole.size(); ++i) {
     std::string other = whole;

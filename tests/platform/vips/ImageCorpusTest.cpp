@@ -56,36 +56,25 @@ TEST_P(ImageCorpusTest, IsReadScaledAndWritten) {
 
 INSTANTIATE_TEST_SUITE_P(
     Files, ImageCorpusTest,
-    ::testing::Values(
-        KnownImage{"jpeg-12mp.jpg", {4000, 3000}},
-        KnownImage{"jpeg-12mp-orientation3.jpg", {4000, 3000}},
-        KnownImage{"jpeg-landscape-orientation6.jpg", {1800, 1200}},
-        KnownImage{"jpeg-portrait-orientation5.jpg", {1200, 1800}},
-        KnownImage{"jpeg-cmyk.jpg", {100, 100}},
-        KnownImage{"jpeg-640x480.jpg", {640, 480}},
-        KnownImage{"png-640x480.png", {640, 480}},
-        KnownImage{"png-16bit.png", {290, 442}},
-        KnownImage{"png-alpha.png", {128, 128}},
-        KnownImage{"png-animated.png", {128, 64}},
-        KnownImage{"png-palette.png", {290, 442}},
-        KnownImage{"tiff-cmyk.tiff", {157, 151}},
-        KnownImage{"tiff-multipage.tif", {4670, 6170}},
-        KnownImage{"tiff-rgb-16bit.tif", {290, 442}},
-        KnownImage{"tiff-rgb-16bit-small.tiff", {157, 151}},
-        KnownImage{"gif-128.gif", {128, 128}},
-        KnownImage{"gif-animated.gif", {85, 77}},
-        KnownImage{"gif-animated-245.gif", {245, 245}},
-        KnownImage{"bmp-128.bmp", {128, 128}},
-        KnownImage{"bmp-24bit-v5.bmp", {435, 353}},
-        KnownImage{"icns-basic.icns", {512, 512}},
-        KnownImage{"icns-pillow2.icns", {512, 512}},
-        KnownImage{"jp2-10mp-balloon.jp2", {2717, 3701}},
-        KnownImage{"heic-photo.heic", {4000, 1848}}),
-                         [](const auto& info) {
-                           std::string name = info.param.name;
-                           std::replace_if(name.begin(), name.end(), [](char c) { return !std::isalnum(c); }, '_');
-                           return name;
-                         });
+    ::testing::Values(KnownImage{"jpeg-12mp.jpg", {4000, 3000}}, KnownImage{"jpeg-12mp-orientation3.jpg", {4000, 3000}},
+                      KnownImage{"jpeg-landscape-orientation6.jpg", {1800, 1200}},
+                      KnownImage{"jpeg-portrait-orientation5.jpg", {1200, 1800}},
+                      KnownImage{"jpeg-cmyk.jpg", {100, 100}}, KnownImage{"jpeg-640x480.jpg", {640, 480}},
+                      KnownImage{"png-640x480.png", {640, 480}}, KnownImage{"png-16bit.png", {290, 442}},
+                      KnownImage{"png-alpha.png", {128, 128}}, KnownImage{"png-animated.png", {128, 64}},
+                      KnownImage{"png-palette.png", {290, 442}}, KnownImage{"tiff-cmyk.tiff", {157, 151}},
+                      KnownImage{"tiff-multipage.tif", {4670, 6170}}, KnownImage{"tiff-rgb-16bit.tif", {290, 442}},
+                      KnownImage{"tiff-rgb-16bit-small.tiff", {157, 151}}, KnownImage{"gif-128.gif", {128, 128}},
+                      KnownImage{"gif-animated.gif", {85, 77}}, KnownImage{"gif-animated-245.gif", {245, 245}},
+                      KnownImage{"bmp-128.bmp", {128, 128}}, KnownImage{"bmp-24bit-v5.bmp", {435, 353}},
+                      KnownImage{"icns-basic.icns", {512, 512}}, KnownImage{"icns-pillow2.icns", {512, 512}},
+                      KnownImage{"jp2-10mp-balloon.jp2", {2717, 3701}}, KnownImage{"heic-photo.heic", {4000, 1848}}),
+    [](const auto& info) {
+      std::string name = info.param.name;
+      std::replace_if(
+          name.begin(), name.end(), [](char c) { return !std::isalnum(c); }, '_');
+      return name;
+    });
 
 // Damaged files: an answer in bounded time and memory, and no crash; the sanitizers watch.
 class DamagedImageTest : public ::testing::TestWithParam<const char*> {
@@ -122,7 +111,8 @@ INSTANTIATE_TEST_SUITE_P(Files, DamagedImageTest,
                                            "bad-tiff-overflow.tiff"),
                          [](const auto& info) {
                            std::string name = info.param;
-                           std::replace_if(name.begin(), name.end(), [](char c) { return !std::isalnum(c); }, '_');
+                           std::replace_if(
+                               name.begin(), name.end(), [](char c) { return !std::isalnum(c); }, '_');
                            return name;
                          });
 

@@ -1,10 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "quilt/platform/vips/VipsImages.h"
-
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include "quilt/platform/interfaces/Services.h"
+#include "quilt/platform/vips/VipsImages.h"
 #include "tests/support/ImageFixtures.h"
 #include "tests/support/ScratchFolder.h"
 #include "tests/support/SimpleFiles.h"
@@ -118,14 +117,22 @@ TEST_F(VipsImagesTest, EveryOrientationIsApplied) {
       const std::size_t flippedX = width - 1 - x;
       const std::size_t flippedY = height - 1 - y;
       switch (orientation) {
-        case 1: return pixelAt(shown, x, y);
-        case 2: return pixelAt(shown, flippedX, y);
-        case 3: return pixelAt(shown, flippedX, flippedY);
-        case 4: return pixelAt(shown, x, flippedY);
-        case 5: return pixelAt(shown, y, x);
-        case 6: return pixelAt(shown, flippedY, x);
-        case 7: return pixelAt(shown, flippedY, flippedX);
-        default: return pixelAt(shown, y, flippedX);
+        case 1:
+          return pixelAt(shown, x, y);
+        case 2:
+          return pixelAt(shown, flippedX, y);
+        case 3:
+          return pixelAt(shown, flippedX, flippedY);
+        case 4:
+          return pixelAt(shown, x, flippedY);
+        case 5:
+          return pixelAt(shown, y, x);
+        case 6:
+          return pixelAt(shown, flippedY, x);
+        case 7:
+          return pixelAt(shown, flippedY, flippedX);
+        default:
+          return pixelAt(shown, y, flippedX);
       }
     });
     for (const char* suffix : {".jpg", ".tif"}) {
@@ -186,8 +193,9 @@ TEST_F(VipsImagesTest, GreyStaysGrey) {
     const auto level = static_cast<std::uint8_t>(x);
     return Rgba{level, level, level, 255};
   });
-  for (const Encoding& kind : {Encoding{.suffix = ".png", .colour = "b-w"}, Encoding{.suffix = ".png", .colour = "grey16"},
-                               Encoding{.suffix = ".tif", .colour = "grey16"}}) {
+  for (const Encoding& kind :
+       {Encoding{.suffix = ".png", .colour = "b-w"}, Encoding{.suffix = ".png", .colour = "grey16"},
+        Encoding{.suffix = ".tif", .colour = "grey16"}}) {
     SCOPED_TRACE(kind.suffix + " " + kind.colour);
     const Bitmap read = pixels(*open(encode(ramp, kind)));
     for (std::size_t x = 0; x < 256; ++x) EXPECT_LE(distance(pixelAt(read, x, 5), pixelAt(ramp, x, 5)), 2) << x;
@@ -269,7 +277,8 @@ TEST_F(VipsImagesTest, PNGIsSavedToFilesOnly) {
 }
 
 TEST_F(VipsImagesTest, NamesAreNamesNotOptionsOrAddresses) {
-  for (const char* name : {"photo[1].jpg", "a.jpg[page=3]", "-i", "$(x)", "|x", "concat:a.jpg", "no extension", "a.txt"}) {
+  for (const char* name :
+       {"photo[1].jpg", "a.jpg[page=3]", "-i", "$(x)", "|x", "concat:a.jpg", "no extension", "a.txt"}) {
     const auto image = open(writeFile(folder / name, encode(quadrants(700, 500), {})));
     ASSERT_TRUE(image) << name;
     EXPECT_EQ(image->convertToSD()->size(), (Size{640, 457})) << name;
@@ -299,8 +308,8 @@ TEST_F(VipsImagesTest, WhatIsNoImageIsRefusedWithASentence) {
 TEST_F(VipsImagesTest, AFileReplacedByAnotherPictureIsNoticed) {
   const auto image = open(writeFile(folder / "a.jpg", encode(quadrants(600, 400), {})));
   writeFile(folder / "a.jpg", encode(quadrants(500, 400), {}));
-  for (const Result<void>& saved : {image->saveAsJPGAtPath(folder / "b.jpg"),
-                                    image->saveAsPNGAtURL(Url::fileUrl(folder / "b.png"))}) {
+  for (const Result<void>& saved :
+       {image->saveAsJPGAtPath(folder / "b.jpg"), image->saveAsPNGAtURL(Url::fileUrl(folder / "b.png"))}) {
     ASSERT_FALSE(saved);
     EXPECT_EQ(saved.error().text, "The image was replaced by another after it was opened.");
   }

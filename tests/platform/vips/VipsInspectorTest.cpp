@@ -1,9 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "quilt/platform/vips/VipsInspector.h"
-
 #include <gtest/gtest.h>
 
 #include "quilt/platform/interfaces/Services.h"
+#include "quilt/platform/vips/VipsInspector.h"
 #include "tests/support/ImageFixtures.h"
 #include "tests/support/ScratchFolder.h"
 
@@ -48,8 +47,8 @@ TEST_F(VipsInspectorTest, AnswersTheDisplayedSizeAndTheTypeOfTheContent) {
 }
 
 TEST_F(VipsInspectorTest, AnswersWhatTheCameraNoted) {
-  const MediaFacts facts =
-      inspect(encode(quadrants(300, 200), {.exif = {{"ImageDescription", "A bridge (old), at night"}, {"Artist", "Ann O."}}}));
+  const MediaFacts facts = inspect(
+      encode(quadrants(300, 200), {.exif = {{"ImageDescription", "A bridge (old), at night"}, {"Artist", "Ann O."}}}));
   EXPECT_EQ(facts.metadataInformation, "A bridge (old), at night");
   EXPECT_EQ(facts.metadataAuthor, "Ann O.");
   EXPECT_EQ(facts.metadataTitle, std::nullopt);

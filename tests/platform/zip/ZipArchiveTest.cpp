@@ -1,6 +1,4 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "quilt/platform/zip/ZipArchive.h"
-
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sys/resource.h>
@@ -12,6 +10,7 @@
 #include <cstdlib>
 
 #include "quilt/platform/interfaces/Services.h"
+#include "quilt/platform/zip/ZipArchive.h"
 #include "tests/support/ImageFixtures.h"
 #include "tests/support/Program.h"
 #include "tests/support/ScratchFolder.h"
@@ -70,14 +69,15 @@ TEST_F(ZipArchiveTest, TwoOtherProgramsReadTheSameContent) {
 
   const ProgramResult unzip = runProgram({"unzip", "-t", zipFile});
   EXPECT_EQ(unzip.status, 0) << unzip.output;
-  const ProgramResult python = runProgram({"python3", "-c",
-                                           "import sys, zipfile\n"
-                                           "z = zipfile.ZipFile(sys.argv[1])\n"
-                                           "assert z.testzip() is None\n"
-                                           "for i in z.infolist():\n"
-                                           "  print(i.filename, i.compress_type, i.file_size, oct(i.external_attr >> 16), i.date_time[0])\n"
-                                           "z.extractall(sys.argv[2])",
-                                           zipFile, folder / "extracted"});
+  const ProgramResult python =
+      runProgram({"python3", "-c",
+                  "import sys, zipfile\n"
+                  "z = zipfile.ZipFile(sys.argv[1])\n"
+                  "assert z.testzip() is None\n"
+                  "for i in z.infolist():\n"
+                  "  print(i.filename, i.compress_type, i.file_size, oct(i.external_attr >> 16), i.date_time[0])\n"
+                  "z.extractall(sys.argv[2])",
+                  zipFile, folder / "extracted"});
   EXPECT_EQ(python.status, 0) << python.output;
   EXPECT_EQ(python.output,
             "Épisode 1.qpk/ 0 0 0o40755 1980\n"
@@ -217,7 +217,8 @@ TEST_F(ZipArchiveTest, WhatIsMissingOrUnreadableIsNamed) {
   ASSERT_FALSE(name);
   EXPECT_EQ(name.error().text, "A name in the folder is no UTF-8 text.");
   std::filesystem::remove(package / "a\xFF.txt");
-  const Result<void> nowhere = ZipArchive().archiveFile(package, package.filename().native(), out / "no" / "such.zip", {});
+  const Result<void> nowhere =
+      ZipArchive().archiveFile(package, package.filename().native(), out / "no" / "such.zip", {});
   ASSERT_FALSE(nowhere);
   EXPECT_THAT(nowhere.error().text, HasSubstr("The archive cannot be written"));
 }
@@ -232,8 +233,8 @@ TEST_F(ZipArchiveTest, SixtySixThousandEntriesNeedTheLongFormAndNoDescriptors) {
   }));
   EXPECT_EQ(openDescriptors(), before);
   EXPECT_LE(most, before + 4);
-  const ProgramResult count =
-      runProgram({"python3", "-c", "import sys, zipfile; print(len(zipfile.ZipFile(sys.argv[1]).namelist()))", zipFile});
+  const ProgramResult count = runProgram(
+      {"python3", "-c", "import sys, zipfile; print(len(zipfile.ZipFile(sys.argv[1]).namelist()))", zipFile});
   EXPECT_EQ(count.output, "66001\n");
 }
 
