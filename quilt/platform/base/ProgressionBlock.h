@@ -22,6 +22,9 @@ bool report(const ObjectProgressionBlock<T>& block, const std::shared_ptr<T>& ob
 }
 
 /// (done × 100) / total in unsigned integer arithmetic, the percentage of a walk over `total` steps; total is not 0.
-inline double integerPercentage(std::size_t done, std::size_t total) { return static_cast<double>(done * 100 / total); }
+inline double integerPercentage(std::size_t done, std::size_t total) {
+  const std::size_t percentage = done * 100 / total;
+  return static_cast<double>(percentage);
+}
 
 }  // namespace quilt::platform
