@@ -263,6 +263,28 @@ TEST_F(QuiltCollectionTest, AFileCutAtAnyLengthLoadsOrIsReportedAndStays) {
   }
 }
 
+TEST_F(QuiltCollectionTest, AFileWithAnyByteFlippedLoadsOrIsReportedAndStays) {
+  Dictionary record = fullRecord();
+  record.remove("PreferredThemePath");
+  writeRecord(file(), record);
+  const std::string whole = readFile(file());
+  for (std::size_t at = 0; at < whole.size(); ++at) {
+    std::string damaged = whole;
+    damaged[at] = static_cast<char>(damaged[at] ^ 0x15);
+    writeFile(file(), damaged);
+    const auto collection = QuiltCollection::initWithPath(path());
+    const Lines problems = takeProblems();
+    if (!collection) {
+      ASSERT_EQ(problems, Lines{warning("Failed to load collection at path \"" + path().native() +
+                                        "\": \"Collection dictionary is invalid\"")})
+          << at;
+    } else {
+      ASSERT_THAT(problems, IsEmpty()) << at;
+    }
+    ASSERT_EQ(readFile(file()), damaged) << at;
+  }
+}
+
 TEST_F(QuiltCollectionTest, AFolderThatCannotBeMadeGivesNone) {
   const auto files = failing();
   const ScopedService scoped(&Services::files, files);

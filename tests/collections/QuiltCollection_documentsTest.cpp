@@ -4,6 +4,7 @@
 #include <cstdlib>
 
 #include "quilt/collections/QuiltCollection.h"
+#include "quilt/platform/testing/FailNthFileManager.h"
 #include "quilt/platform/testing/ForwardingFileManager.h"
 #include "tests/support/MediaFixtures.h"
 #include "tests/support/ModelFixture.h"
@@ -700,6 +701,78 @@ TEST_F(QuiltCollectionDocumentsTest, AFailedImportIntoAPackageThatWasThereKeepsI
   EXPECT_FALSE(collection->importDocumentFromPath(pdf(), "paper", [&](double) { return ++calls < 3; }));
   EXPECT_EQ(collection->documentsCount(), 0u);
   EXPECT_TRUE(std::filesystem::exists(packageOf("paper") / "media/kept"));
+}
+
+TEST_F(QuiltCollectionDocumentsTest, AnImportCancelledAtAnyCallLeavesNothing) {
+  const Path file = pdf();
+  const std::string bytes = readFile(file);
+  bool imported = false;
+  int cancelled = 0;
+  for (int answers = 0; !imported && answers < 100; ++answers) {
+    int calls = 0;
+    imported = collection->importDocumentFromPath(file, "paper", [&](double) { return ++calls <= answers; }) != nullptr;
+    if (imported) break;
+    ++cancelled;
+    ASSERT_EQ(collection->documentsCount(), 0u) << answers;
+    ASSERT_THAT(packages(), IsEmpty()) << answers;
+    ASSERT_EQ(readFile(file), bytes) << answers;
+  }
+  EXPECT_TRUE(imported);
+  EXPECT_GT(cancelled, 1);
+  EXPECT_EQ(collection->documentsCount(), 1u);
+}
+
+TEST_F(QuiltCollectionDocumentsTest, AnImportWithAnyOneFileOperationFailingIsWholeOrLeavesNothing) {
+  const Path file = pdf();
+  const std::string bytes = readFile(file);
+  const auto files = std::make_shared<platform::FailNthFileManager>(services().files);
+  const ScopedService scoped(&Services::files, files);
+  int failures = 0;
+  for (std::size_t nth = 1; nth < 200; ++nth) {
+    files->failNth(nth, ErrorKind::NoSpace);
+    const auto document = collection->importDocumentFromPath(file, "paper", nullptr);
+    const bool reachedTheEnd = files->operations() < nth;
+    files->failNth(0, ErrorKind::NoSpace);
+
+    ASSERT_EQ(readFile(file), bytes) << nth;
+    if (!document) {
+      ++failures;
+      ASSERT_EQ(collection->documentsCount(), 0u) << nth;
+      ASSERT_THAT(packages(), IsEmpty()) << nth;
+      continue;
+    }
+    // What failed was not needed for the result: the package opens with its item and the file's content.
+    const auto reopened = QuiltDocument::initWithPath(packageOf("paper"));
+    ASSERT_TRUE(reopened) << nth;
+    ASSERT_EQ(reopened->mediaCount(), 1u) << nth;
+    const auto main = reopened->mediaAtIndex(0)->sourceAtIndex(0)->mainDerivative();
+    ASSERT_TRUE(main && main->url()) << nth;
+    ASSERT_EQ(readFile(main->url()->relativePath()), bytes) << nth;
+    collection->removeDocument(document, true);
+    ASSERT_THAT(packages(), IsEmpty()) << nth;
+    if (reachedTheEnd) {
+      EXPECT_GT(failures, 1);
+      return;
+    }
+  }
+  FAIL() << "the import never came to its end";
+}
+
+TEST_F(QuiltCollectionDocumentsTest, AnImportOnADiskThatFailsForEverReportsItAndKeepsTheFile) {
+  const Path file = pdf();
+  const std::string bytes = readFile(file);
+  const auto files = std::make_shared<platform::FailNthFileManager>(services().files);
+  const ScopedService scoped(&Services::files, files);
+  for (std::size_t nth = 1; nth < 8; ++nth) {
+    std::filesystem::remove_all(packageOf("paper"));
+    files->failNth(nth, ErrorKind::InputOutput, platform::FailNthFileManager::Repeat::ForEver);
+    takeLines();
+    EXPECT_FALSE(collection->importDocumentFromPath(file, "paper", nullptr)) << nth;
+    files->failNth(0, ErrorKind::InputOutput);
+    EXPECT_EQ(takeLines().back(), critical(cannotCreate(file))) << nth;
+    EXPECT_EQ(collection->documentsCount(), 0u) << nth;
+    EXPECT_EQ(readFile(file), bytes) << nth;
+  }
 }
 
 TEST_F(QuiltCollectionDocumentsTest, AnIdentityThatIsNoPlainNameIsRefused) {
