@@ -85,6 +85,7 @@ CollectionEntry collectionEntry(const Path& folder) {
 }  // namespace
 
 Path absolutePath(const std::string& typed) {
+  if (typed.empty()) throw Failure(ExitCode::NotFound, "An empty name stands for no file");
   std::error_code error;
   Path path = std::filesystem::absolute(typed, error);
   if (error) throw Failure(ExitCode::InputOutput, "The working folder cannot be found");

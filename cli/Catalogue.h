@@ -59,7 +59,7 @@ DocumentEntry readDocumentEntry(const Path& package);
 platform::Result<platform::Dictionary> readDocumentRecord(const Path& package);
 platform::Result<platform::Dictionary> readCollectionRecord(const Path& folder);
 
-/// A path as typed, absolute and without "." and "..".
+/// A path as typed, absolute and without "." and "..". Throws a Failure when it is empty.
 Path absolutePath(const std::string& typed);
 
 }  // namespace quilt::cli

@@ -44,8 +44,9 @@ std::string Output::styled(const char* style, const std::string& text) const {
 void Output::print(const std::string& text) {
   if (text.empty()) return;
   _messages.withoutStatus([&] {
-    std::fputs((text + "\n").c_str(), _stream);
-    std::fflush(_stream);
+    errno = 0;
+    const bool written = std::fputs((text + "\n").c_str(), _stream) >= 0 && std::fflush(_stream) == 0;
+    if (!written && _writeError == 0) _writeError = errno != 0 ? errno : EIO;
   });
 }
 
@@ -62,13 +63,11 @@ ExitCode Output::finish(const std::optional<Failure>& failure) {
     for (const Failure& cause : failure->causes) _messages.error(cause.message);
     _messages.error(failure->message);
   }
-  errno = 0;
-  const bool written = std::fflush(_stream) == 0 && std::ferror(_stream) == 0;
   if (failure) return failure->code;
-  if (written) return ExitCode::Done;
+  if (_writeError == 0) return ExitCode::Done;
   // A reader that went away (head, less) is no news to anyone.
-  if (errno != EPIPE)
-    _messages.error(std::string("The results could not be written: ") + std::strerror(errno ? errno : EIO));
+  if (_writeError != EPIPE)
+    _messages.error(std::string("The results could not be written: ") + std::strerror(_writeError));
   return ExitCode::InputOutput;
 }
 

@@ -47,6 +47,7 @@ class Output {
   bool _color;
   Messages& _messages;
   Json _result;
+  int _writeError = 0;  // errno of the first write that failed
 };
 
 }  // namespace quilt::cli

@@ -9,7 +9,6 @@
 #include <new>
 
 #include "cli/ActingDelegate.h"
-#include "cli/Interrupt.h"
 #include "cli/Parser.h"
 #include "cli/Text.h"
 
@@ -66,7 +65,6 @@ void carryOut(const Request& request, Messages& messages, Output& output) {
 int run(const std::vector<std::string>& arguments) {
   // A reader that goes away is told by the failed write, so that nothing is left half done.
   std::signal(SIGPIPE, SIG_IGN);
-  Interrupt::listen();
   std::optional<Request> request;
   std::optional<Failure> failure = failureOf([&] { request = parse(arguments); });
   const bool noColor = request && request->settings.noColor;

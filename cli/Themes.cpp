@@ -19,7 +19,7 @@ std::shared_ptr<QuiltTheme> findTheme(const std::string& name) {
   const Path path = absolutePath(name);
   if (platform::services().files->fileExistsAtPath(path)) {
     if (auto theme = QuiltTheme::initWithPath(path)) return theme;
-    throw Failure(ExitCode::Invalid, inQuotes(name) + " is no theme of a supported version", path);
+    throw Failure(ExitCode::Invalid, inQuotes(name) + " is no theme of a supported version; --verbose tells why", path);
   }
   for (auto& theme : installedThemes())
     if (theme->identifier() == name) return theme;

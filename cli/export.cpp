@@ -32,6 +32,13 @@ bool liesIn(const Path& path, const Path& folder) {
   return !relative.empty() && *relative.begin() != "..";
 }
 
+// The path, or the closest of its parents that is there.
+Path nearestExisting(Path path) {
+  while (!std::filesystem::exists(std::filesystem::symlink_status(path)) && path.has_relative_path())
+    path = path.parent_path();
+  return path;
+}
+
 Plan check(const ExportRequest& request, const Catalogue& catalogue) {
   Plan plan{findDocument(catalogue, request.document), absolutePath(request.folder), nullptr};
   const DocumentEntry& entry = *plan.found.document;
@@ -46,9 +53,9 @@ Plan check(const ExportRequest& request, const Catalogue& catalogue) {
       throw Failure(ExitCode::NotFound,
                     cannot + ": Its theme " + inQuotes(*theme) + " is not there; name one with --theme", *theme);
   }
-  const platform::FileKind kind = services().files->kindOfItemAtPath(plan.folder);
-  if (kind != platform::FileKind::Missing && kind != platform::FileKind::Folder)
-    throw Failure(ExitCode::Invalid, inQuotes(request.folder) + " is a file, not a folder", plan.folder);
+  const Path existing = nearestExisting(plan.folder);
+  if (services().files->kindOfItemAtPath(existing) != platform::FileKind::Folder)
+    throw Failure(ExitCode::Invalid, inQuotes(existing.native()) + " is a file, not a folder", existing);
   // A package there would become part of the library, or of another package.
   if (liesIn(plan.folder, catalogue.library))
     throw Failure(ExitCode::Usage, inQuotes(request.folder) + " lies in the library; export to a folder outside",

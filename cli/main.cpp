@@ -1,10 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <vector>
 
+#include "cli/Interrupt.h"
 #include "cli/Program.h"
 #include "quilt/platform/install.h"
 
 int main(int argc, char** argv) {
+  quilt::cli::Interrupt::listen();
   quilt::platform::install();
   return quilt::cli::run(std::vector<std::string>(argv + 1, argv + argc));
 }

@@ -163,9 +163,8 @@ void ActingDelegate::perform(const ShowRequest& request) {
       showCollection(*std::get<FoundCollection>(found).collection, _context.output);
     }
   } catch (const Failure& failure) {
-    const Path path = absolutePath(request.object);
-    if (failure.code != ExitCode::NotFound || !isPackage(path)) throw;
-    showDocument(readDocumentEntry(path), nullptr, _context.output);
+    if (failure.code != ExitCode::NotFound || !isPackage(absolutePath(request.object))) throw;
+    showDocument(readDocumentEntry(absolutePath(request.object)), nullptr, _context.output);
   }
 }
 

@@ -33,6 +33,14 @@ constexpr std::string_view kSavingKeys[] = {"title",        "description",    "a
                                             "category",     "advisoryLabel",  "jukeboxOrder", "theme",
                                             "creationDate", "lastPublishURL", "isClassic"};
 
+/// Reads a properties file, unless it is a link that leads out of the package.
+platform::Result<Dictionary> readPropertiesOf(const Path& package, const Path& file) {
+  const Path folder = platform::standardizedPath(package);
+  if (file.parent_path() == folder && !services().files->isConfined(file, folder))
+    return platform::Error{platform::ErrorKind::Unsafe, "The file leads out of the document", file};
+  return services().propertyLists->readDictionary(file);
+}
+
 }  // namespace
 
 // ---- Construction
@@ -70,7 +78,7 @@ std::shared_ptr<QuiltDocument> QuiltDocument::initWithPath(const Path& path) {
 }
 
 Text QuiltDocument::uuidForDocumentAtPath(const Path& path) {
-  const auto record = services().propertyLists->readDictionary(path / kQuiltDocumentPropertiesFilename);
+  const auto record = readPropertiesOf(path, platform::standardizedPath(path / kQuiltDocumentPropertiesFilename));
   return record ? record->string("UUID") : std::nullopt;
 }
 
@@ -151,7 +159,7 @@ bool QuiltDocument::readProperties(const Path& file) {
     FDYLogger::logWarning("Failed to open document at path \"%@\": \"Properties file cannot be found\"", path());
     return false;
   }
-  const auto record = services().propertyLists->readDictionary(file);
+  const auto record = readPropertiesOf(path(), file);
   // Media of a wrong kind is damage, not an empty list: opening it as empty would lose the items at the next save.
   const auto isUsable = [](const Dictionary& dictionary) {
     return !dictionary.contains("Media") || dictionary.array("Media") != nullptr;
@@ -188,7 +196,7 @@ void QuiltDocument::apply(const Dictionary& record) {
 }
 
 void QuiltDocument::reload() {
-  const auto record = services().propertyLists->readDictionary(platform::standardizedPath(propertiesPath()));
+  const auto record = readPropertiesOf(path(), platform::standardizedPath(propertiesPath()));
   const auto written = record ? record->date("ModifiedDate") : std::nullopt;
   const auto known = modifiedDate();
   if (!written || (known && *written <= *known)) return;
@@ -236,14 +244,21 @@ Dictionary QuiltDocument::dictionary() {
 }
 
 bool QuiltDocument::writeProperties() {
+  // First, and also without a file to write to: the record gives an untitled document its title.
+  const Dictionary record = dictionary();
   const Path file = propertiesPath();
-  return !file.empty() && services().propertyLists->writeDictionary(dictionary(), file);
+  return !file.empty() && services().propertyLists->writeDictionary(record, file);
 }
 
 bool QuiltDocument::isBusy() const {
-  // A save on another thread is not refused but waited for: refusing would lose the change that asks for this one.
-  const platform::ThreadIdentity saver = _savingThread;
-  return isProcessing() && (saver == nullptr || saver == platform::currentThreadIdentity());
+  // A save on another thread is not refused but waited for: refusing would lose the change that asks for this one. It
+  // may begin or end while this looks, and counts when it is seen before or after.
+  const auto isAnothers = [](platform::ThreadIdentity saver) {
+    return saver != nullptr && saver != platform::currentThreadIdentity();
+  };
+  const bool wasSaving = isAnothers(_savingThread);
+  if (!isProcessing()) return false;
+  return !wasSaving && !isAnothers(_savingThread);
 }
 
 std::optional<platform::MonitorLock> QuiltDocument::beginProcessing() {
@@ -254,21 +269,27 @@ std::optional<platform::MonitorLock> QuiltDocument::beginProcessing() {
 }
 
 bool QuiltDocument::update() {
-  const auto lock = beginProcessing();
-  if (!lock) {
+  const auto refuse = [this] {
     FDYLogger::logCritical("Failed to update document at path \"%@\": \"Document is already being processed\"",
                            propertiesPath());
     return false;
+  };
+  if (isBusy()) return refuse();
+  const auto lock = _media.lock();
+  // Known before the document is processing, so that no thread takes this save for a long operation.
+  const platform::ThreadIdentity before = _savingThread.exchange(platform::currentThreadIdentity());
+  const bool isFree = !_isProcessing.exchange(true);
+  bool written = false;
+  if (isFree) {
+    setModifiedDate(services().clock->now());
+    written = writeProperties();
+    if (!written)
+      FDYLogger::logCritical("Failed to update document at path \"%@\": \"Properties cannot be written\"",
+                             propertiesPath());
+    setIsProcessing(false);
   }
-  _savingThread = platform::currentThreadIdentity();
-  setModifiedDate(services().clock->now());
-  const bool written = writeProperties();
-  if (!written)
-    FDYLogger::logCritical("Failed to update document at path \"%@\": \"Properties cannot be written\"",
-                           propertiesPath());
-  setIsProcessing(false);
-  _savingThread = nullptr;
-  return written;
+  _savingThread = before;
+  return isFree ? written : refuse();
 }
 
 void QuiltDocument::observeValueForKeyPath(std::string_view keyPath, platform::Object& /*ofObject*/,

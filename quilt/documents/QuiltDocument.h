@@ -110,6 +110,9 @@ class QuiltDocument : public platform::Object {
   /// Stamps modifiedDate and saves. False, after a critical line, while processing or when the file cannot be written.
   /// Waits for a save that another thread has begun.
   bool update();
+  /// Whether a change is not to be saved now: a load, a long operation or a save of this thread runs. A save of another
+  /// thread does not count; update() waits for it.
+  bool isBusy() const;
   /// Reads the package again when its file is newer than the document.
   void reload();
   /// Whether modifiedDate and creationDate are a second or more apart.
@@ -191,14 +194,16 @@ class QuiltDocument : public platform::Object {
   bool readProperties(const Path& file);
   void apply(const Dictionary& record);
   bool writeProperties();
-  /// Whether a load, a long operation or a save of this thread runs.
-  bool isBusy() const;
   /// Sets isProcessing and answers the media lock, or none while busy. Waits for another thread's save.
   std::optional<platform::MonitorLock> beginProcessing();
   enum class Outcome { Done, Failed, Cancelled };
   Outcome finalizeMedia(const ProgressionBlock& block);
   bool finalizeInteractive();
   Outcome flattenMedia(const ProgressionBlock& block);
+  Path exportCopy(const Path& path, bool zipped, const std::vector<std::string>& usingFormats,
+                  const ProgressionBlock& block);
+  /// Leaves the document untitled again when saving has given it the fall-back title. Saves nothing.
+  void forgetFallBackTitle();
 
   platform::Property<std::string> _uuid{*this, "uuid"};
   platform::Property<Path> _path{*this, "path"};

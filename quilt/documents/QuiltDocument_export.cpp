@@ -123,7 +123,7 @@ bool QuiltDocument::flattenWithProgressionBlock(const ProgressionBlock& withProg
 
 QuiltDocument::Outcome QuiltDocument::flattenMedia(const ProgressionBlock& block) {
   const Path folder = mediaFolderPath();
-  if (const auto created = createDirectoryIfMissing(folder); !created) {
+  if (const auto created = createDirectoryInPackage(folder, shared(this)); !created) {
     FDYLogger::logDebug("Failed to create intermediate directories for document at path \"%@\": \"%@\"", folder,
                         created.error());
     return Outcome::Failed;
@@ -149,7 +149,21 @@ QuiltDocument::Outcome QuiltDocument::flattenMedia(const ProgressionBlock& block
 
 Path QuiltDocument::exportToPath(const Path& path, bool zipped, const std::vector<std::string>& usingFormats,
                                  const ProgressionBlock& withProgressionBlock) {
-  const ProgressionBlock& block = withProgressionBlock;
+  const bool isUntitled = !title();
+  const Path exported = exportCopy(path, zipped, usingFormats, withProgressionBlock);
+  if (isUntitled) forgetFallBackTitle();
+  return exported;
+}
+
+void QuiltDocument::forgetFallBackTitle() {
+  const auto lock = beginProcessing();  // a save would give the title again
+  if (!lock) return;
+  if (title() == untitledEpisode()) setTitle(std::nullopt);
+  setIsProcessing(false);
+}
+
+Path QuiltDocument::exportCopy(const Path& path, bool zipped, const std::vector<std::string>& usingFormats,
+                               const ProgressionBlock& block) {
   report(block, 0);
   const std::string name = displayTitle();
   const std::string base = fileNameForTitle(name);

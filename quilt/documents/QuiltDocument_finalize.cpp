@@ -4,6 +4,7 @@
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/base/Paths.h"
 #include "quilt/platform/interfaces/Services.h"
+#include "quilt/sources/ModelFiles.h"
 
 namespace quilt {
 
@@ -116,7 +117,7 @@ bool QuiltDocument::finalizeInteractive() {
   data.set("CollectionOwner", ownerRecord(collectionOwner()));
 
   const std::string script = platform::formatMessage("var appData = %@;", {services().json->toJSON(data)});
-  auto written = services().files->createDirectoryAtPath(dataControllerPath().parent_path());
+  auto written = createDirectoryInPackage(dataControllerPath().parent_path(), shared(this));
   if (written) written = services().files->writeAtomically(dataControllerPath(), script);
   if (!written) {
     FDYLogger::logDebug("Failed to finalize document at path \"%@\" with data controller: \"%@\"", path(),

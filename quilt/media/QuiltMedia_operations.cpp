@@ -18,8 +18,8 @@ constexpr const char* kNoMediaFolder = "Failed to create intermediate directorie
 constexpr const char* kNoSourcesFolder = "Failed to create intermediate directories for sources at path \"%@\": \"%@\"";
 constexpr const char* kNoExtrasFolder = "Failed to create intermediate directories for extras at path \"%@\": \"%@\"";
 
-bool makeFolder(const Path& folder, const char* failure) {
-  const auto created = createDirectoryIfMissing(folder);
+bool makeFolder(const Path& folder, const std::shared_ptr<QuiltDocument>& document, const char* failure) {
+  const auto created = createDirectoryInPackage(folder, document);
   if (!created) FDYLogger::logDebug(failure, folder, created.error());
   return created.hasValue();
 }
@@ -70,7 +70,9 @@ bool QuiltMedia::flattenChildren(const ProgressionBlock& block) {
   const std::size_t extras = extraCount();
   const auto commentary = audioCommentarySource();
   report(block, 0);
-  if (!makeFolder(path(), kNoMediaFolder) || !makeFolder(sourcesFolderPath(), kNoMediaFolder)) return false;
+  const auto document = documentOwner();
+  if (!makeFolder(path(), document, kNoMediaFolder) || !makeFolder(sourcesFolderPath(), document, kNoMediaFolder))
+    return false;
 
   const std::size_t total = sources + extras + (commentary ? 1 : 0);
   const auto flatten = [&](QuiltMediaSource& child, std::size_t step, const char* failure) {
@@ -91,7 +93,7 @@ bool QuiltMedia::flattenChildren(const ProgressionBlock& block) {
     if (!commentary->isFlattened() && !flatten(*commentary, step, "Failed to flatten source \"%@\"")) return false;
     ++step;
   }
-  if (!makeFolder(extrasFolderPath(), kNoMediaFolder)) return false;
+  if (!makeFolder(extrasFolderPath(), document, kNoMediaFolder)) return false;
   // Unlike the sources, an extra that is flattened already takes no step.
   const bool extrasDone = _extras.walk([&](const auto& extra) {
     return extra->isFlattened() || flatten(*extra, step++, "Failed to flatten extra \"%@\"");
@@ -123,8 +125,9 @@ bool QuiltMedia::finalizeChildren(const ProgressionBlock& block) {
   const std::size_t extras = extraCount();
   const std::size_t total = sourcesCount() + extras + (commentary ? 1 : 0);
   report(block, 0);
-  if (!makeFolder(path(), kNoMediaFolder) || !makeFolder(sourcesFolderPath(), kNoSourcesFolder) ||
-      !makeFolder(extrasFolderPath(), kNoExtrasFolder))
+  const auto document = documentOwner();
+  if (!makeFolder(path(), document, kNoMediaFolder) || !makeFolder(sourcesFolderPath(), document, kNoSourcesFolder) ||
+      !makeFolder(extrasFolderPath(), document, kNoExtrasFolder))
     return false;
   posterImage();  // writes the poster into the package
 

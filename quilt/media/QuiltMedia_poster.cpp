@@ -53,7 +53,7 @@ std::shared_ptr<ImageWrapper> QuiltMedia::posterImage() {
   const auto created =
       file.empty()
           ? platform::Result<void>(platform::Error{platform::ErrorKind::NotFound, "The item is not in a document", {}})
-          : createDirectoryIfMissing(folder);
+          : createDirectoryInPackage(folder, documentOwner());
   if (!created)
     FDYLogger::logCritical("Failed to create intermediate directories for media at path \"%@\": \"%@\"", folder,
                            created.error());

@@ -21,7 +21,7 @@ thread_local Deferred deferred;
 }  // namespace
 
 void requestSave(const std::shared_ptr<QuiltDocument>& document) {
-  if (!document || document->isProcessing()) return;
+  if (!document || document->isBusy()) return;
   if (deferred.depth == 0) {
     document->update();
   } else if (std::find(deferred.documents.begin(), deferred.documents.end(), document) == deferred.documents.end()) {

@@ -17,6 +17,12 @@ platform::Result<void> createDirectoryIfMissing(const Path& path) {
   return services().files->createDirectoryAtPath(path);
 }
 
+platform::Result<void> createDirectoryInPackage(const Path& path, const std::shared_ptr<QuiltDocument>& document) {
+  if (document && !document->path().empty() && !services().files->isConfined(path, document->path()))
+    return platform::Error{platform::ErrorKind::Unsafe, "The folder leads out of the document", path};
+  return createDirectoryIfMissing(path);
+}
+
 void deleteFromPackage(const Path& path, const std::shared_ptr<QuiltDocument>& document, const char* warning) {
   if (path.empty() || !services().files->fileExistsAtPath(path)) return;
   const auto removed = services().files->removeItem(path, document ? document->path() : Path());

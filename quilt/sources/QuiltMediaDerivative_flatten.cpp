@@ -36,8 +36,8 @@ bool moveInto(const Url& source, const Url& destination) {
 }
 
 bool prepareFolder(const Path& folder, const std::shared_ptr<QuiltDocument>& document) {
-  const auto created = createDirectoryIfMissing(folder);
-  if (created) return isInsidePackage(folder, document, "source derivative");
+  const auto created = createDirectoryInPackage(folder, document);
+  if (created) return true;
   FDYLogger::logDebug("Failed to create intermediate directories for media derivative destination \"%@\": \"%@\"",
                       folder, created.error());
   return false;

@@ -122,7 +122,7 @@ bool QuiltMediaPreview::flatten() {
     FDYLogger::logCritical("Failed to flatten media source preview because image is unavailable");
     return false;
   }
-  if (const auto created = createDirectoryIfMissing(file.parent_path()); !created) {
+  if (const auto created = createDirectoryInPackage(file.parent_path(), documentOf(sourceOwner())); !created) {
     FDYLogger::logCritical("Failed to flatten intermediate directories for media preview at path \"%@\": \"%@\"",
                            file.parent_path(), created.error());
     return false;

@@ -151,7 +151,7 @@ bool QuiltMediaSource::adoptConverted(const Path& file, const std::string& forma
 
 Path QuiltMediaSource::newHiddenFile(const std::string& extension) const {
   const Path folder = derivativesFolderPath();
-  if (folder.empty() || !createDirectoryIfMissing(folder)) return {};
+  if (folder.empty() || !createDirectoryInPackage(folder, document())) return {};
   Path file;
   do {
     file = folder / platform::withExtension("." + platform::generateUUID(), extension);

@@ -17,8 +17,8 @@ constexpr const char* kNoSourceFolder = "Failed to create intermediate directori
 constexpr const char* kNoSamplesFolder =
     "Failed to create intermediate directories for audioSamples at path \"%@\": \"%@\"";
 
-bool makeFolder(const Path& folder, const char* failure) {
-  const auto created = createDirectoryIfMissing(folder);
+bool makeFolder(const Path& folder, const std::shared_ptr<QuiltDocument>& document, const char* failure) {
+  const auto created = createDirectoryInPackage(folder, document);
   if (!created) FDYLogger::logDebug(failure, folder, created.error());
   return created.hasValue();
 }
@@ -53,8 +53,9 @@ bool QuiltMediaSource::flattenCopy(bool copy, const ProgressionBlock& withProgre
       return Outcome::Failed;
     }
     const std::size_t total = derivativeCount() + _previews.count();
-    if (!makeFolder(path(), kNoSourceFolder) || !makeFolder(derivativesFolderPath(), kNoSourceFolder) ||
-        !makeFolder(audioSamplesFolderPath(), kNoSamplesFolder))
+    if (!makeFolder(path(), document(), kNoSourceFolder) ||
+        !makeFolder(derivativesFolderPath(), document(), kNoSourceFolder) ||
+        !makeFolder(audioSamplesFolderPath(), document(), kNoSamplesFolder))
       return Outcome::Failed;
 
     std::size_t step = 0;
@@ -116,7 +117,9 @@ bool QuiltMediaSource::finalizeWithProgressionBlock(const ProgressionBlock& with
       return false;
     }
     report(withProgressionBlock, 0);
-    if (!makeFolder(path(), kNoSourceFolder) || !makeFolder(previewsFolderPath(), kNoSourceFolder)) return false;
+    if (!makeFolder(path(), document(), kNoSourceFolder) ||
+        !makeFolder(previewsFolderPath(), document(), kNoSourceFolder))
+      return false;
     const bool previewed = previewWithProgressionBlock(
         [&](const auto& /*preview*/, double percentage) { return report(withProgressionBlock, percentage); });
     if (!previewed) FDYLogger::logDebug("Failed to generate previews for source during finalizing at \"%@\"", path());

@@ -159,7 +159,7 @@ std::shared_ptr<QuiltMediaPreview> QuiltMediaSource::makePreview(const PreviewCo
 bool QuiltMediaSource::previewWithProgressionBlock(
     const ObjectProgressionBlock<QuiltMediaPreview>& withProgressionBlock) {
   const Path folder = previewsFolderPath();
-  if (const auto created = createDirectoryIfMissing(folder); !created) {
+  if (const auto created = createDirectoryInPackage(folder, document()); !created) {
     FDYLogger::logDebug("Failed to create intermediate directories for source at path \"%@\": \"%@\"", folder,
                         created.error());
     FDYLogger::logCritical("Failed to preview media at URL \"%@\" has been cancelled", previewItemURL());

@@ -158,12 +158,11 @@ using LookupTest = LibraryCommandsTest;
 TEST_F(LookupTest, AnObjectIsNamedByUuidPrefixTitleOrPath) {
   const std::string uuid = newDocument("A talk");
   const std::string path = shown("A talk")["path"];
+  const std::string filename = std::filesystem::path(path).filename();
   std::string lower = uuid;
   for (char& letter : lower) letter = static_cast<char>(std::tolower(static_cast<unsigned char>(letter)));
-  for (const std::string& name : {uuid, lower, uuid.substr(0, 30), path, path + "/", path + "/../" + uuid})
-    if (name != path + "/../" + uuid) {
-      EXPECT_EQ(uuid, shown(name)["uuid"]) << name;
-    }
+  for (const std::string& name : {uuid, lower, uuid.substr(0, 30), path, path + "/", path + "/../" + filename})
+    EXPECT_EQ(uuid, shown(name)["uuid"]) << name;
 }
 
 TEST_F(LookupTest, WhatIsNotThereIsNotFound) {
@@ -179,7 +178,7 @@ TEST_F(LookupTest, WhatMayBeSeveralIsAUsageErrorThatNamesThem) {
   const std::string two = newDocument("Twice");
   const json document = quiltJson({"show", "Twice"}, 2);
   ASSERT_THAT(document["error"]["candidates"], SizeIs(2));
-  EXPECT_EQ(one, document["error"]["candidates"][0]["uuid"]);
+  EXPECT_THAT(document["error"]["candidates"].dump(), ::testing::AllOf(HasSubstr(one), HasSubstr(two)));
   const Ended run = quilt({"remove", "Twice", "--force"});
   EXPECT_EQ(2, run.exit);
   EXPECT_THAT(run.err, HasSubstr(two));
@@ -210,7 +209,7 @@ TEST_F(ShowCommandTest, SummarisesForPeople) {
   quilt({"set", "opening", "author=Ada", "description=Two\nlines"});
   const Ended run = quilt({"show", "opening"});
   EXPECT_EQ(0, run.exit);
-  EXPECT_THAT(run.out, HasSubstr("Author      Ada"));
+  EXPECT_THAT(run.out, HasSubstr("Author       Ada\n"));
   EXPECT_THAT(run.out, HasSubstr("Two\\nlines"));
   EXPECT_THAT(run.out, HasSubstr("320 × 240"));
 }

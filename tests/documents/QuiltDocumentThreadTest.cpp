@@ -65,6 +65,20 @@ TEST_F(QuiltDocumentThreadTest, ItemsAddedByTwoThreadsAreAllSaved) {
   EXPECT_THAT(takeProblems(), IsEmpty());
 }
 
+TEST_F(QuiltDocumentThreadTest, ASourceAddedDuringAnotherThreadsSaveIsSaved) {
+  const auto document = made();
+  const auto item = addItem(*document);
+  addItem(*document);
+  for (std::size_t round = 1; round <= 40; ++round) {
+    run({[&item] { item->addSource(QuiltMediaSource::init()); },
+         [&document] { document->setTitle(std::string("Title")); }},
+        [] {});
+    const Dictionary record = saved(*document);
+    ASSERT_EQ(record.array("Media")->front().as<Dictionary>()->array("Sources")->size(), round);
+  }
+  EXPECT_THAT(takeProblems(), IsEmpty());
+}
+
 TEST_F(QuiltDocumentThreadTest, TheMainThreadReadsAndObservesWhileAWorkerChangesTheListTenThousandTimes) {
   const auto document = made();
   document->setIsProcessing(true);

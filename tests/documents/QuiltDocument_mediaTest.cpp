@@ -336,7 +336,6 @@ TEST_F(QuiltDocumentMediaTest, BrokenExtrasLeaveTheirItemsAndIntactOnesStay) {
   for (const auto& extra : {extraOf(missing()), extraOf(existing()), link, extraOf(missing())}) a->addExtra(extra);
   b->addExtra(extraOf(missing()));
   b->addExtra(QuiltMediaExtra::init());
-  document->setIsProcessing(false);
   takeLines();
   document->removeAllBrokenMediaExtra();
   EXPECT_EQ(a->extraCount(), 2u);

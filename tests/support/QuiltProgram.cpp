@@ -88,6 +88,8 @@ bool RunningProgram::hasEnded() {
   return _ended;
 }
 
+std::string RunningProgram::errorsSoFar() const { return contentOf(_folder / "err"); }
+
 Ended RunningProgram::wait() {
   if (!waitUntil([this] { return hasEnded(); }, 60)) {
     ADD_FAILURE() << "The program does not end";
