@@ -5,6 +5,8 @@
 
 #include <algorithm>
 #include <array>
+#include <cerrno>
+#include <system_error>
 
 #include "cli/Interrupt.h"
 #include "cli/Text.h"
@@ -81,9 +83,12 @@ ExitCode exitCodeForCause(std::string_view cause) {
       "disk is full",        "disk quota is used up",     "larger than the disk allows",
       "read or write error", "Permission was refused",    "refused access",
       "can only be read",    "Reading or writing failed", "could not be read or written"};
-  const bool isDiskTrouble = std::any_of(kDiskTrouble.begin(), kDiskTrouble.end(), [&](std::string_view sentence) {
-    return cause.find(sentence) != std::string_view::npos;
-  });
+  constexpr std::array<int, 7> kDiskErrors{ENOSPC, EDQUOT, EFBIG, EIO, EROFS, EACCES, EPERM};
+  const bool isDiskTrouble =
+      std::any_of(kDiskTrouble.begin(), kDiskTrouble.end(),
+                  [&](std::string_view sentence) { return cause.find(sentence) != std::string_view::npos; }) ||
+      std::any_of(kDiskErrors.begin(), kDiskErrors.end(),
+                  [&](int number) { return cause == std::generic_category().message(number); });
   return isDiskTrouble ? ExitCode::InputOutput : ExitCode::Failed;
 }
 

@@ -2,6 +2,8 @@
 #include "cli/LogCollector.h"
 
 #include <algorithm>
+#include <cstdlib>
+#include <system_error>
 
 #include "cli/Text.h"
 
@@ -24,10 +26,17 @@ const char* nameOf(platform::LogLevel level) {
   return "";
 }
 
-bool isFailure(const std::string& message) { return message.starts_with("Failed "); }
+constexpr std::string_view kCopyFailed = "Copy failed with error code (-";
 
-// The library ends a line with the error's own sentence in quotes: ... at path "/x": "The disk is full".
+bool isFailure(const std::string& message) {
+  return message.starts_with("Failed ") || message.starts_with(kCopyFailed);
+}
+
+// The library ends a line with the error's own sentence in quotes: ... at path "/x": "The disk is full". Of a copy it
+// logs the system's error number.
 std::string sentenceOf(const std::string& message) {
+  if (message.starts_with(kCopyFailed))
+    return std::generic_category().message(std::atoi(message.c_str() + kCopyFailed.size()));
   const std::size_t begin = message.rfind(": \"");
   const std::size_t end = message.rfind('"');
   if (begin == std::string::npos || end < begin + 4) return message;

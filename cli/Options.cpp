@@ -37,7 +37,7 @@ Command infoRequest(const Arguments& arguments) { return InfoRequest{arguments.a
 Command newRequest(const Arguments& arguments) {
   const std::string title = *arguments.first("TITLE");
   if (title.empty()) refuse("TITLE is empty");
-  if (!isUtf8(title)) refuse("TITLE is not UTF-8");
+  if (!isText(title)) refuse("TITLE is not UTF-8, or has control characters");
   if (arguments.first("KIND") == "document")
     return NewDocumentRequest{title, arguments.first("--collection"),
                               arguments.first("--type").value_or("Interactive")};
@@ -56,7 +56,8 @@ Command setRequest(const Arguments& arguments) {
       if (earlier == key) refuse(inQuotes(key) + " is given twice");
     const std::string value = assignment.substr(equals + 1);
     // Any bytes can be a file's name.
-    if (key != "poster" && key != "theme" && !isUtf8(value)) refuse("The value of " + inQuotes(key) + " is not UTF-8");
+    if (key != "poster" && key != "theme" && !isText(value))
+      refuse("The value of " + inQuotes(key) + " is not UTF-8, or has control characters");
     request.values.emplace_back(key, value);
   }
   return request;

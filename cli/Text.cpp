@@ -82,10 +82,11 @@ std::string escaped(std::string_view text) {
 
 std::string inQuotes(std::string_view text) { return '"' + escaped(text) + '"'; }
 
-bool isUtf8(std::string_view bytes) {
+bool isText(std::string_view bytes) {
   for (std::size_t at = 0; at < bytes.size();) {
     const Character character = characterAt(bytes, at);
-    if (!character.valid) return false;
+    const bool breaks = character.code == '\n' || character.code == '\t';
+    if (!character.valid || (isControl(character.code) && !breaks)) return false;
     at += character.length;
   }
   return true;

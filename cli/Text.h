@@ -16,8 +16,8 @@ std::string escaped(std::string_view text);
 /// escaped() in double quotes.
 std::string inQuotes(std::string_view text);
 
-/// Whether the bytes are well-formed UTF-8.
-bool isUtf8(std::string_view bytes);
+/// Whether the bytes can be kept as a text: UTF-8 without control characters but for line ends and tabs.
+bool isText(std::string_view bytes);
 
 /// Any bytes as UTF-8 without control characters, fit for a title: what cannot stay becomes U+FFFD or a space.
 std::string asTitle(std::string_view bytes);

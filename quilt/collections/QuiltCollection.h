@@ -101,8 +101,8 @@ class QuiltCollection : public platform::Object {
   /// At most `count`, newest first.
   std::vector<std::shared_ptr<QuiltDocument>> lastCreatedDocuments(std::size_t count) const;
   void addDocument(const std::shared_ptr<QuiltDocument>& document);
-  /// Takes the document out of the list; with `andDelete` also deletes its package. A package that cannot be deleted, or
-  /// that lies outside the collection's folder, stays, with a warning.
+  /// Takes the document out of the list; with `andDelete` also deletes its package. A package that cannot be deleted,
+  /// or that lies outside the collection's folder, stays, with a warning.
   void removeDocument(const std::shared_ptr<QuiltDocument>& document, bool andDelete);
   void removeAllDocumentsAndDelete(bool andDelete);
   /// Takes out the classic documents that hold no media and deletes their packages. A package whose record names media
@@ -110,10 +110,10 @@ class QuiltCollection : public platform::Object {
   void removeAllBrokenDocuments();
   /// Makes and saves an empty document with the collection's author and theme. Null after a critical line.
   std::shared_ptr<QuiltDocument> newDocumentWithType(const Text& type);
-  /// Makes a document of a file: inspects it, adds it as the one item, and copies it into the package, which is named by
-  /// `withUUID` (a fresh one for none). A file of a type that cannot be imported gives an empty document. Null, after a
-  /// critical line, on failure or when the block answers false; the package is then gone, unless it was there before.
-  /// Reports 10 to 100, on the calling thread.
+  /// Makes a document of a file: inspects it, adds it as the one item, and copies it into the package, which is named
+  /// by `withUUID` (a fresh one for none). A file of a type that cannot be imported gives an empty document. Null,
+  /// after a critical line, on failure or when the block answers false; the package is then gone, unless it was there
+  /// before. Reports 10 to 100, on the calling thread.
   std::shared_ptr<QuiltDocument> importDocumentFromPath(const Path& path, const Text& withUUID,
                                                         const ProgressionBlock& withProgressionBlock);
   std::shared_ptr<QuiltDocument> importDocumentFromPath(const Path& path, const ProgressionBlock& withProgressionBlock);
@@ -144,7 +144,8 @@ class QuiltCollection : public platform::Object {
   platform::Property<Text> _keywords{*this, "keywords"};
   platform::Property<Text> _category{*this, "category"};
   platform::Property<Text> _advisoryLabel{*this, "advisoryLabel"};
-  std::mutex _posterMutex;  // held from the look at the file to the change of the cache; nothing else is locked under it
+  std::mutex
+      _posterMutex;  // held from the look at the file to the change of the cache; nothing else is locked under it
   std::shared_ptr<ImageWrapper> _posterImage;
   platform::Property<std::shared_ptr<QuiltTheme>> _preferredTheme{*this, "preferredTheme"};
   platform::ChildList<QuiltDocument, QuiltCollection> _documents{*this, "documents",
@@ -153,9 +154,9 @@ class QuiltCollection : public platform::Object {
   platform::WeakProperty<QuiltCollectionsController> _collectionControllerOwner{*this, "collectionControllerOwner"};
   platform::Property<bool> _isLoading{*this, "isLoading"};
   platform::Property<Dictionary> _unknownEntries{*this, "unknownEntries"};
-  std::uint64_t _recordsBuilt = 0;  // guarded by the document list's lock
-  std::mutex _saving;               // nothing else is locked under it
-  std::uint64_t _newestSaved = 0;   // the turn of the record on disk; guarded by _saving
+  std::uint64_t _recordsBuilt = 0;                   // guarded by the document list's lock
+  std::mutex _saving;                                // nothing else is locked under it
+  std::uint64_t _newestSaved = 0;                    // the turn of the record on disk; guarded by _saving
   std::vector<platform::Observation> _observations;  // last: ends before the properties do
 };
 

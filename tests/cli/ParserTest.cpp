@@ -124,6 +124,7 @@ TEST(ParserTest, MistakesAreNamed) {
   EXPECT_THAT(complaint({"new", "thing", "T"}), HasSubstr("KIND is collection or document, not \"thing\""));
   EXPECT_THAT(complaint({"new", "collection", "T", "--type", "PDF"}), HasSubstr("goes with \"new document\" only"));
   EXPECT_THAT(complaint({"new", "document", ""}), HasSubstr("TITLE is empty"));
+  EXPECT_THAT(complaint({"new", "document", "a\x01"}), HasSubstr("has control characters"));
   EXPECT_THAT(complaint({"remove", "a", "b"}), HasSubstr("one document or collection at a time"));
 }
 

@@ -26,10 +26,12 @@ TEST(TextTest, EscapesBytesThatAreNoUtf8) {
   EXPECT_EQ("\\xe2\\x82", escaped("\xe2\x82"));           // cut off
 }
 
-TEST(TextTest, TellsUtf8FromOtherBytes) {
-  EXPECT_TRUE(isUtf8("Grüße 🎬"));
-  EXPECT_FALSE(isUtf8("Gr\xfc\xdf"));
-  EXPECT_FALSE(isUtf8("\xf4\x90\x80\x80"));
+TEST(TextTest, TellsWhatCanBeKeptAsAText) {
+  EXPECT_TRUE(isText("Grüße 🎬"));
+  EXPECT_TRUE(isText("two\nlines\tand a tab"));
+  EXPECT_FALSE(isText("Gr\xfc\xdf"));
+  EXPECT_FALSE(isText("\xf4\x90\x80\x80"));
+  EXPECT_FALSE(isText("\x1b[31m"));
 }
 
 TEST(TextTest, MakesATitleOfAnyFileName) {

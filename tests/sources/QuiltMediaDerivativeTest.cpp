@@ -269,9 +269,9 @@ TEST_F(QuiltMediaDerivativeTest, ALinkOutOfThePackageIsRefused) {
   std::filesystem::create_symlink(outside, source->derivativesFolderPath() / "f.mp4");
   takeLines();
   EXPECT_EQ(read({{"Filename", "f.mp4"}, {"IsFlattened", true}}), nullptr);
-  EXPECT_EQ(takeLines(), Lines{warning("Refused the file of a source derivative: \"" +
-                                       (source->derivativesFolderPath() / "f.mp4").native() +
-                                       "\" leads out of the document")});
+  EXPECT_EQ(takeLines(),
+            Lines{warning("Refused the file of a source derivative: \"" +
+                          (source->derivativesFolderPath() / "f.mp4").native() + "\" leads out of the document")});
 }
 
 // ---- Size

@@ -280,8 +280,9 @@ TEST_F(QuiltMediaPreviewTest, FlattenWithoutAPictureFails) {
   source->addPreview(preview);
   takeLines();
   EXPECT_FALSE(preview->flatten());
-  EXPECT_EQ(takeLines(), (Lines{warning("Media source preview path \"" + preview->path().native() + "\" does not exist"),
-                                critical("Failed to flatten media source preview because image is unavailable")}));
+  EXPECT_EQ(takeLines(),
+            (Lines{warning("Media source preview path \"" + preview->path().native() + "\" does not exist"),
+                   critical("Failed to flatten media source preview because image is unavailable")}));
   EXPECT_FALSE(QuiltMediaPreview::initWithImageWrapper(picture(4, 4))->flatten()) << "it has no place in a document";
 }
 
@@ -298,7 +299,8 @@ TEST_F(QuiltMediaPreviewTest, AFlattenedPreviewComesBackFromItsFile) {
   EXPECT_THAT(keys, ElementsAre("UUID", "Title", "Content", "Index", "Timecode", "Width", "Height", "IsFlattened",
                                 "Filename", "RelativePath"));
   EXPECT_EQ(record.string("Filename"), "0.jpg");
-  EXPECT_EQ(record.string("RelativePath"), "media/" + item()->uuid() + "/sources/" + source->uuid() + "/previews/0.jpg");
+  EXPECT_EQ(record.string("RelativePath"),
+            "media/" + item()->uuid() + "/sources/" + source->uuid() + "/previews/0.jpg");
 
   const auto loaded = QuiltMediaPreview::initWithDictionary(record, source);
   EXPECT_EQ(loaded->uuid(), preview->uuid());
@@ -333,7 +335,8 @@ TEST_F(QuiltMediaPreviewTest, AFileThatIsGoneCannotBeSized) {
   EXPECT_EQ(preview->totalSizeInMegaBytes(), 0);
   const Lines lines = takeLines();
   ASSERT_EQ(lines.size(), 1u);
-  EXPECT_TRUE(lines[0].text.starts_with("Source preview at path \"" + preview->path().native() + "\" cannot be sized: \""));
+  EXPECT_TRUE(
+      lines[0].text.starts_with("Source preview at path \"" + preview->path().native() + "\" cannot be sized: \""));
 }
 
 TEST_F(QuiltMediaPreviewTest, ATimecodeOfNoneIsWrittenAsItStands) {

@@ -76,8 +76,8 @@ TEST_F(QuiltMediaSourceTest, KeysStandInTheWrittenOrder) {
   source->setTimecode(1.5);
   std::vector<std::string> keys;
   for (const auto& [key, value] : source->dictionary()) keys.push_back(key);
-  EXPECT_THAT(keys, ElementsAre("UUID", "ContentCategory", "Derivatives", "Previews", "Title", "Description", "Timecode",
-                                "IsFlattened", "TotalSizeInMegaBytes", "Dirty"));
+  EXPECT_THAT(keys, ElementsAre("UUID", "ContentCategory", "Derivatives", "Previews", "Title", "Description",
+                                "Timecode", "IsFlattened", "TotalSizeInMegaBytes", "Dirty"));
 }
 
 TEST_F(QuiltMediaSourceTest, ATimecodeOfTheLargestSinglePrecisionValueIsNotWritten) {
@@ -89,11 +89,10 @@ TEST_F(QuiltMediaSourceTest, ATimecodeOfTheLargestSinglePrecisionValueIsNotWritt
 }
 
 TEST_F(QuiltMediaSourceTest, ADirtyRecordIsCleanedOnLoad) {
-  const auto source =
-      read({{"Derivatives", Array{derivativeRecord("480p"), derivativeRecord("Desktop")}},
-            {"Previews", Array{Dictionary{{"Index", 0}}}},
-            {"AudioSamples", Dictionary{{"UUID", "S"}, {"IsFlattened", true}}},
-            {"Dirty", true}});
+  const auto source = read({{"Derivatives", Array{derivativeRecord("480p"), derivativeRecord("Desktop")}},
+                            {"Previews", Array{Dictionary{{"Index", 0}}}},
+                            {"AudioSamples", Dictionary{{"UUID", "S"}, {"IsFlattened", true}}},
+                            {"Dirty", true}});
   ASSERT_EQ(source->derivativeCount(), 1u);
   EXPECT_THAT(*source->derivativeAtIndex(0)->compatibilityTags(), ElementsAre("Desktop"));
   EXPECT_EQ(source->derivativeAtIndex(0)->url()->absoluteString(), "https://example.org/Desktop");
@@ -132,7 +131,8 @@ TEST_F(QuiltMediaSourceTest, AnIdentityThatIsNoPlainNameIsRefused) {
   for (const std::string name : {"..", ".", "", "a/b", "/x", "../x"}) {
     takeLines();
     EXPECT_EQ(read({{"UUID", name}}), nullptr) << name;
-    EXPECT_EQ(takeLines(), Lines{warning("Refused the record of a media source: \"" + name + "\" is no plain file name")});
+    EXPECT_EQ(takeLines(),
+              Lines{warning("Refused the record of a media source: \"" + name + "\" is no plain file name")});
   }
   EXPECT_EQ(read({{"UUID", std::string(300, 'x')}}), nullptr);
   EXPECT_EQ(read({{"UUID", std::string("a\0b", 3)}}), nullptr);
@@ -253,7 +253,8 @@ TEST_F(QuiltMediaSourceTest, ARecordCannotHaveAFileOutsideThePackageDeleted) {
   EXPECT_EQ(readFile(outside), "keep me");
   const Lines lines = takeProblems();
   ASSERT_EQ(lines.size(), 1u);
-  EXPECT_TRUE(lines[0].text.starts_with("Failed to delete derivative at path \"" + outside.native() + "\": \"")) << lines[0].text;
+  EXPECT_TRUE(lines[0].text.starts_with("Failed to delete derivative at path \"" + outside.native() + "\": \""))
+      << lines[0].text;
 }
 
 TEST_F(QuiltMediaSourceTest, TheWalkStopsAtTheFirstFalse) {
@@ -338,9 +339,10 @@ TEST_F(QuiltMediaSourceTest, ASoundThatIsDetachedTriesItsSamplesQuietly) {
   ASSERT_NE(source, nullptr);
   EXPECT_EQ(source->audioSamples(), nullptr);
   const std::string url = Url::fileUrl(file).absoluteString();
-  EXPECT_EQ(takeLines(), (Lines{debug("Derivative at URL \"" + url + "\" as \"Audio\" is compatible with \"Desktop,720p,480p\""),
-                                debug("Failed to flatten source audio samples \"" + source->mainDerivative()->uuid() +
-                                      "\" at URL \"" + url + "\"")}));
+  EXPECT_EQ(takeLines(),
+            (Lines{debug("Derivative at URL \"" + url + "\" as \"Audio\" is compatible with \"Desktop,720p,480p\""),
+                   debug("Failed to flatten source audio samples \"" + source->mainDerivative()->uuid() +
+                         "\" at URL \"" + url + "\"")}));
 }
 
 // ---- Images
@@ -349,9 +351,8 @@ TEST_F(QuiltMediaSourceTest, WithoutDerivativesThereIsNoThumbnailAndNoPoster) {
   const auto source = addEmptySource();
   EXPECT_EQ(source->thumbnailImage(), nullptr);
   EXPECT_EQ(source->posterImage(), nullptr);
-  EXPECT_EQ(takeLines(),
-            (Lines{warning("Media thumbnail image cannot be previewed because there is no derivatives"),
-                   warning("Media poster image cannot be previewed because there is no derivatives")}));
+  EXPECT_EQ(takeLines(), (Lines{warning("Media thumbnail image cannot be previewed because there is no derivatives"),
+                                warning("Media poster image cannot be previewed because there is no derivatives")}));
 }
 
 TEST_F(QuiltMediaSourceTest, ThumbnailAndPosterAreCachedUntilInvalidated) {
@@ -385,11 +386,10 @@ TEST_F(QuiltMediaSourceTest, APosterWhosePreviewHasNoPictureSaysWhichUrl) {
   source->addPreview(QuiltMediaPreview::initWithDictionary({{"Index", 0}, {"IsFlattened", true}}, source));
   takeLines();
   EXPECT_EQ(source->posterImage(), nullptr);
-  EXPECT_EQ(takeLines(),
-            (Lines{warning("Media source preview path \"" + (source->previewsFolderPath() / "0.jpg").native() +
-                           "\" does not exist"),
-                   warning("Media poster image cannot be previewed because URL \"" +
-                           source->mainDerivative()->url()->absoluteString() + "\" is invalid")}));
+  EXPECT_EQ(takeLines(), (Lines{warning("Media source preview path \"" +
+                                        (source->previewsFolderPath() / "0.jpg").native() + "\" does not exist"),
+                                warning("Media poster image cannot be previewed because URL \"" +
+                                        source->mainDerivative()->url()->absoluteString() + "\" is invalid")}));
 }
 
 // ---- Dirty, reload

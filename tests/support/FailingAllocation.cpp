@@ -9,18 +9,29 @@ namespace {
 // Allocations until the one that fails; 0: none does.
 thread_local std::size_t countdown = 0;
 
-void* allocate(std::size_t size) {
-  if (countdown > 0 && --countdown == 0) throw std::bad_alloc();
-  if (void* memory = std::malloc(size > 0 ? size : 1)) return memory;
+void* allocate(std::size_t size) noexcept {
+  if (countdown > 0 && --countdown == 0) return nullptr;
+  return std::malloc(size > 0 ? size : 1);
+}
+
+void* allocateOrThrow(std::size_t size) {
+  if (void* memory = allocate(size)) return memory;
   throw std::bad_alloc();
 }
 
 }  // namespace
 
-// The replaced forms that the standard's other forms call.
-void* operator new(std::size_t size) { return allocate(size); }
+// Every form for ordinary alignment: a sanitizer brings forms of its own, which would pair with none of these.
+void* operator new(std::size_t size) { return allocateOrThrow(size); }
+void* operator new[](std::size_t size) { return allocateOrThrow(size); }
+void* operator new(std::size_t size, const std::nothrow_t&) noexcept { return allocate(size); }
+void* operator new[](std::size_t size, const std::nothrow_t&) noexcept { return allocate(size); }
 void operator delete(void* memory) noexcept { std::free(memory); }
+void operator delete[](void* memory) noexcept { std::free(memory); }
 void operator delete(void* memory, std::size_t) noexcept { std::free(memory); }
+void operator delete[](void* memory, std::size_t) noexcept { std::free(memory); }
+void operator delete(void* memory, const std::nothrow_t&) noexcept { std::free(memory); }
+void operator delete[](void* memory, const std::nothrow_t&) noexcept { std::free(memory); }
 
 namespace quilt::support {
 

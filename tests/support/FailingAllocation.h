@@ -5,7 +5,7 @@
 
 namespace quilt::support {
 
-/// While it lives, the `nth` allocation (from 1) with `new` on this thread throws std::bad_alloc; all others succeed.
+/// While it lives, the `nth` allocation (from 1) with `new` on this thread fails; all others succeed.
 class FailingAllocation {
  public:
   explicit FailingAllocation(std::size_t nth);

@@ -32,7 +32,8 @@ std::shared_ptr<QuiltMediaDerivative> PackageFixture::addFlattenedDerivative(Qui
                                                                              std::vector<std::string> tags) {
   auto derivative = derivativeTagged(std::move(tags));
   std::filesystem::create_directories(source.derivativesFolderPath());
-  derivative->setUrl(Url::fileUrl(writeFile(source.derivativesFolderPath() / (derivative->uuid() + ".bin"), "content")));
+  derivative->setUrl(
+      Url::fileUrl(writeFile(source.derivativesFolderPath() / (derivative->uuid() + ".bin"), "content")));
   derivative->setIsFlattened(true);
   source.addDerivative(derivative);
   return derivative;

@@ -22,15 +22,15 @@ enum class LogLevel { Critical, Warning, Debug };
 /// One argument of a message: an object's text (or a missing object), an integer or a real.
 class LogArgument {
  public:
-  LogArgument(std::nullopt_t) {}                                           // NOLINT(google-explicit-constructor)
-  LogArgument(const char* text);                                           // NOLINT(google-explicit-constructor)
-  LogArgument(std::string text) : _value(std::move(text)) {}               // NOLINT(google-explicit-constructor)
-  LogArgument(std::string_view text) : _value(std::string(text)) {}        // NOLINT(google-explicit-constructor)
-  LogArgument(const std::optional<std::string>& text);                     // NOLINT(google-explicit-constructor)
-  LogArgument(const std::filesystem::path& path);                          // NOLINT(google-explicit-constructor)
-  LogArgument(const Url& url) : _value(url.absoluteString()) {}            // NOLINT(google-explicit-constructor)
-  LogArgument(const std::optional<Url>& url);                              // NOLINT(google-explicit-constructor)
-  LogArgument(const Error& error) : _value(error.text) {}                  // NOLINT(google-explicit-constructor)
+  LogArgument(std::nullopt_t) {}                                     // NOLINT(google-explicit-constructor)
+  LogArgument(const char* text);                                     // NOLINT(google-explicit-constructor)
+  LogArgument(std::string text) : _value(std::move(text)) {}         // NOLINT(google-explicit-constructor)
+  LogArgument(std::string_view text) : _value(std::string(text)) {}  // NOLINT(google-explicit-constructor)
+  LogArgument(const std::optional<std::string>& text);               // NOLINT(google-explicit-constructor)
+  LogArgument(const std::filesystem::path& path);                    // NOLINT(google-explicit-constructor)
+  LogArgument(const Url& url) : _value(url.absoluteString()) {}      // NOLINT(google-explicit-constructor)
+  LogArgument(const std::optional<Url>& url);                        // NOLINT(google-explicit-constructor)
+  LogArgument(const Error& error) : _value(error.text) {}            // NOLINT(google-explicit-constructor)
   template <std::integral T>
   LogArgument(T value) : _value(static_cast<std::int64_t>(value)) {}  // NOLINT(google-explicit-constructor)
   template <std::floating_point T>

@@ -9,6 +9,8 @@
 #include <mutex>
 #include <vector>
 
+#include "quilt/platform/base/MonitorWait.h"
+
 namespace quilt::platform {
 
 namespace {
@@ -26,7 +28,8 @@ struct Queue {
   std::condition_variable mainMayRun;
   std::condition_variable blockDone;
   std::deque<QueuedBlock*> blocks;
-  bool signalled = false;
+  bool signalled = false;     // for the loop
+  bool monitorFreed = false;  // for a wait inside RecursiveMonitor, which must not use up the loop's signal
   std::function<void()> wake;
 };
 
@@ -72,6 +75,21 @@ void runBatch(std::unique_lock<std::mutex>& lock) {
   }
 }
 
+void waitAndRun(bool& flag) {
+  std::unique_lock lock(queue().mutex);
+  queue().mainMayRun.wait(lock, [&flag] { return flag || !queue().blocks.empty(); });
+  flag = false;
+  runBatch(lock);
+}
+
+void raise(bool& flag) {
+  {
+    const std::lock_guard guard(queue().mutex);
+    flag = true;
+  }
+  queue().mainMayRun.notify_all();
+}
+
 }  // namespace
 
 ThreadIdentity currentThreadIdentity() {
@@ -114,20 +132,10 @@ void MainThread::runQueuedBlocks() {
   runBatch(lock);
 }
 
-void MainThread::waitAndRunQueuedBlocks() {
-  std::unique_lock lock(queue().mutex);
-  queue().mainMayRun.wait(lock, [] { return queue().signalled || !queue().blocks.empty(); });
-  queue().signalled = false;
-  runBatch(lock);
-}
-
-void MainThread::signal() {
-  {
-    const std::lock_guard guard(queue().mutex);
-    queue().signalled = true;
-  }
-  queue().mainMayRun.notify_all();
-}
+void MainThread::waitAndRunQueuedBlocks() { waitAndRun(queue().signalled); }
+void MainThread::signal() { raise(queue().signalled); }
+void waitForFreedMonitor() { waitAndRun(queue().monitorFreed); }
+void signalFreedMonitor() { raise(queue().monitorFreed); }
 
 bool MainThread::isActingFor(ThreadIdentity thread) {
   return std::find(actingFor().begin(), actingFor().end(), thread) != actingFor().end();

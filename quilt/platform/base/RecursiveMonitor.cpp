@@ -3,6 +3,8 @@
 
 #include <utility>
 
+#include "quilt/platform/base/MonitorWait.h"
+
 namespace quilt::platform {
 
 bool RecursiveMonitor::enterIfPossible() {
@@ -22,7 +24,7 @@ void RecursiveMonitor::lock() {
   while (!enterIfPossible()) {
     _mainThreadWaits = true;
     guard.unlock();
-    MainThread::waitAndRunQueuedBlocks();
+    waitForFreedMonitor();
     guard.lock();
   }
 }
@@ -42,7 +44,7 @@ void RecursiveMonitor::unlock() {
     // Inside the guard: once the owner is cleared and the mutex free, another thread may destroy this monitor.
     _freed.notify_one();
   }
-  if (signalMain) MainThread::signal();
+  if (signalMain) signalFreedMonitor();
 }
 
 }  // namespace quilt::platform

@@ -13,8 +13,8 @@ class JsonWriter {
   virtual ~JsonWriter() = default;
 
   /// One line of UTF-8 that is also safe inside a script element: "<" is never followed by "/" or "!", and the line
-  /// separators of Unicode are escaped. Dates are ISO 8601 in UTC, numbers read back to the same value, data is an array of bytes;
-  /// a number that JSON does not have is null.
+  /// separators of Unicode are escaped. Dates are ISO 8601 in UTC, numbers read back to the same value, data is an
+  /// array of bytes; a number that JSON does not have is null.
   [[nodiscard]] virtual std::string toJSON(const Dictionary& dictionary) const = 0;
 };
 

@@ -126,7 +126,8 @@ class Reader {
   }
 
   Result<PropertyList> real(std::uint64_t at, std::uint64_t size) const {
-    if ((size != 4 && size != 8) || !holds(at + 1, size)) return damaged("A real of the binary property list is cut short");
+    if ((size != 4 && size != 8) || !holds(at + 1, size))
+      return damaged("A real of the binary property list is cut short");
     if (size == 8) return PropertyList(std::bit_cast<double>(number(at + 1, 8)));
     return PropertyList(static_cast<double>(std::bit_cast<float>(static_cast<std::uint32_t>(number(at + 1, 4)))));
   }
@@ -137,7 +138,8 @@ class Reader {
     constexpr double farthest = 8e9;  // about 250 years, what the clock holds
     if (!(std::abs(seconds) < farthest)) return damaged("A date of the binary property list is out of range");
     constexpr std::chrono::sys_days epoch{std::chrono::year{2001} / 1 / 1};
-    return PropertyList(Date{epoch} + std::chrono::duration_cast<Date::duration>(std::chrono::duration<double>(seconds)));
+    return PropertyList(Date{epoch} +
+                        std::chrono::duration_cast<Date::duration>(std::chrono::duration<double>(seconds)));
   }
 
   Result<PropertyList> bytes(unsigned kind, Span span) const {
@@ -151,7 +153,8 @@ class Reader {
     for (std::uint64_t i = 0; i < span.count; ++i) {
       auto unit = static_cast<std::uint32_t>(number(span.start + 2 * i, 2));
       const bool isHigh = unit >= 0xD800 && unit < 0xDC00;
-      const auto next = isHigh && i + 1 < span.count ? static_cast<std::uint32_t>(number(span.start + 2 * i + 2, 2)) : 0;
+      const auto next =
+          isHigh && i + 1 < span.count ? static_cast<std::uint32_t>(number(span.start + 2 * i + 2, 2)) : 0;
       if (next >= 0xDC00 && next < 0xE000) {
         unit = 0x10000 + ((unit - 0xD800) << 10U) + (next - 0xDC00);
         ++i;

@@ -104,7 +104,11 @@ class Writer {
         ++plain;
         continue;
       }
-      const std::string_view entity = c == '&' ? "&amp;" : c == '<' ? "&lt;" : c == '>' ? "&gt;" : c == '\r' ? "&#13;" : "";
+      const std::string_view entity = c == '&'    ? "&amp;"
+                                      : c == '<'  ? "&lt;"
+                                      : c == '>'  ? "&gt;"
+                                      : c == '\r' ? "&#13;"
+                                                  : "";
       const Utf8Character character = firstUtf8Character(text.substr(plain));
       if (entity.empty() && isXmlCharacter(character)) {
         plain += character.length;

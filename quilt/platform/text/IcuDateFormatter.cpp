@@ -10,9 +10,7 @@ namespace quilt::platform {
 
 namespace {
 
-UDate icuDate(Date date) {
-  return std::chrono::duration<double, std::milli>(date.time_since_epoch()).count();
-}
+UDate icuDate(Date date) { return std::chrono::duration<double, std::milli>(date.time_since_epoch()).count(); }
 
 std::string formatted(const icu::DateFormat& format, Date date) {
   icu::UnicodeString text;

@@ -47,9 +47,10 @@ struct Brand {
   const char* identifier;
 };
 
-const Brand kBrands[] = {{"M4A ", kM4A},  {"M4B ", kM4A},  {"M4P ", kProtectedMPEG4Audio}, {"M4V ", kM4V},
-                         {"M4VP", kM4V},  {"qt  ", kMovieContainer}, {"3gp", k3GPP},     {"3g2", k3GPP},
-                         {"heic", kHEIC}, {"heix", kHEIC}, {"mif1", kHEIC},                {"msf1", kHEIC}};
+const Brand kBrands[] = {{"M4A ", kM4A},  {"M4B ", kM4A},  {"M4P ", kProtectedMPEG4Audio},
+                         {"M4V ", kM4V},  {"M4VP", kM4V},  {"qt  ", kMovieContainer},
+                         {"3gp", k3GPP},  {"3g2", k3GPP},  {"heic", kHEIC},
+                         {"heix", kHEIC}, {"mif1", kHEIC}, {"msf1", kHEIC}};
 
 bool holds(std::string_view start, std::size_t offset, std::string_view bytes) {
   return start.size() >= offset + bytes.size() && start.substr(offset, bytes.size()) == bytes;
@@ -105,9 +106,9 @@ const char* typeOfContent(std::string_view start) {
 
 bool isPlainText(std::string_view start) {
   return !start.empty() && typeOfContent(start) == nullptr && std::all_of(start.begin(), start.end(), [](char c) {
-           const auto byte = static_cast<unsigned char>(c);
-           return byte >= 0x20 || c == '\n' || c == '\r' || c == '\t' || c == '\f';
-         });
+    const auto byte = static_cast<unsigned char>(c);
+    return byte >= 0x20 || c == '\n' || c == '\r' || c == '\t' || c == '\f';
+  });
 }
 
 }  // namespace quilt::platform

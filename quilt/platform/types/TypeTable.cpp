@@ -91,8 +91,8 @@ std::optional<std::string> TypeTable::preferredIdentifier(const std::filesystem:
   const TypeRow* shown = rowNamed(content);
   const char* namedFamily = familyOf(named);
   const char* shownFamily = familyOf(shown);
-  const bool isContainerOfDocument = shownFamily == std::string_view("public.archive") &&
-                                     namedFamily == std::string_view("org.quilt.document");
+  const bool isContainerOfDocument =
+      shownFamily == std::string_view("public.archive") && namedFamily == std::string_view("org.quilt.document");
   const bool sameFamily = namedFamily && shownFamily && std::string_view(namedFamily) == shownFamily;
   return sameFamily || isContainerOfDocument ? named->identifier : content;
 }

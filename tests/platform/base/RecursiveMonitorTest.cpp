@@ -20,6 +20,22 @@ TEST(RecursiveMonitorThreadTest, ItsHolderMayEnterAgain) {
   monitor.unlock();
 }
 
+TEST(RecursiveMonitorThreadTest, WaitingForItLosesNoSignalToTheLoop) {
+  RecursiveMonitor monitor;
+  std::atomic<bool> locked = false;
+  std::thread worker([&] {
+    const MonitorLock lock(monitor);
+    locked = true;
+    std::this_thread::sleep_for(std::chrono::milliseconds(20));
+  });
+  while (!locked) std::this_thread::yield();
+  MainThread::signal();
+  monitor.lock();
+  monitor.unlock();
+  MainThread::waitAndRunQueuedBlocks();  // would wait for ever if the lock had used the signal up
+  worker.join();
+}
+
 TEST(RecursiveMonitorThreadTest, ShutsOtherThreadsOutUntilTheLastExit) {
   RecursiveMonitor monitor;
   monitor.lock();
