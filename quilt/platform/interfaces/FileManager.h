@@ -89,7 +89,7 @@ class FileManager {
 
   /// Copies one file, or a folder with its content, keeping permissions, times and extended attributes: shares the
   /// blocks where the file system can, else copies inside the kernel, else through a large buffer. Replaces a file at
-  /// `destination`. Answers 0, or a negative number when it failed or the callback answered Quit; what it wrote is then
+  /// `destination`. Answers 0, or the negative errno when it failed (ECANCELED after Quit); what it wrote is then
   /// removed.
   virtual int copyfile(const std::filesystem::path& source, const std::filesystem::path& destination,
                        CopyCallback callback, void* context) = 0;
