@@ -7,7 +7,7 @@ function(quilt_embed_resources target folder)
        ${PROJECT_SOURCE_DIR}/${folder}/artwork/*.png ${PROJECT_SOURCE_DIR}/${folder}/artwork/*.icns
        ${PROJECT_SOURCE_DIR}/${folder}/artwork/*.tif ${PROJECT_SOURCE_DIR}/${folder}/strings/*.strings)
   list(SORT files)
-  set(output ${PROJECT_BINARY_DIR}/generated/${target}.s)
+  set(output ${PROJECT_BINARY_DIR}/generated/${target}.S)
   set(content "  .section .rodata\n")
   set(table "#include <array>\n\n#include \"${folder}/EmbeddedFiles.h\"\n\nextern \"C\" {\n")
   set(entries "")

@@ -145,6 +145,8 @@ class QuiltCollectionTest : public support::ModelFixture {
             {"LastPublishURL", "https://example.org/tales"}};
   }
 };
+/// What starts threads; run with the thread sanitizer too.
+using QuiltCollectionThreadTest = QuiltCollectionTest;
 
 using Setter = void (*)(QuiltCollection&);
 /// The properties that a change of saves, with a change.
@@ -561,7 +563,7 @@ TEST_F(QuiltCollectionTest, ADetachedCollectionHasNoPlaceToSaveTo) {
   EXPECT_EQ(collection->posterImagePath(), Path());
 }
 
-TEST_F(QuiltCollectionTest, SavesOfSeveralThreadsNeverPutAnOlderStateOverANewerOne) {
+TEST_F(QuiltCollectionThreadTest, SavesOfSeveralThreadsNeverPutAnOlderStateOverANewerOne) {
   const auto lists = watched();
   const ScopedService scoped(&Services::propertyLists, lists);
   const auto collection = made();
@@ -683,7 +685,7 @@ TEST_F(QuiltCollectionTest, TheModificationDateDependsOnTheDocuments) {
   EXPECT_THAT(seen, ElementsAre("will documents 1", "will modifiedDate 1", "did documents 0", "did modifiedDate 0"));
 }
 
-TEST_F(QuiltCollectionTest, AListChangeOnAWorkerIsSeenOnTheMainThread) {
+TEST_F(QuiltCollectionThreadTest, AListChangeOnAWorkerIsSeenOnTheMainThread) {
   const auto collection = made();
   std::vector<bool> onMain;
   const auto observation = collection->observe(

@@ -87,6 +87,8 @@ class QuiltCollectionsControllerTest : public support::ModelFixture {
  private:
   ScopedService<platform::FileManager> _scoped;
 };
+/// What starts threads; run with the thread sanitizer too.
+using QuiltCollectionsControllerThreadTest = QuiltCollectionsControllerTest;
 
 using Call = std::pair<std::string, double>;
 
@@ -98,7 +100,7 @@ TEST_F(QuiltCollectionsControllerTest, ANewControllerIsEmptyAndIdle) {
   EXPECT_EQ(controller->collectionsCount(), 0u);
 }
 
-TEST_F(QuiltCollectionsControllerTest, TheDefaultControllerIsTheSameOnEveryThread) {
+TEST_F(QuiltCollectionsControllerThreadTest, TheDefaultControllerIsTheSameOnEveryThread) {
   std::shared_ptr<QuiltCollectionsController> other;
   std::thread([&] { other = QuiltCollectionsController::defaultController(); }).join();
   EXPECT_TRUE(other);
@@ -215,7 +217,7 @@ TEST_F(QuiltCollectionsControllerTest, LoadingAgainReplacesTheList) {
   EXPECT_EQ(before->collectionControllerOwner(), controller);  // dropped, not removed
 }
 
-TEST_F(QuiltCollectionsControllerTest, TheBlockIsCalledOnTheLoadingThreadAndListChangesOnTheMainOne) {
+TEST_F(QuiltCollectionsControllerThreadTest, TheBlockIsCalledOnTheLoadingThreadAndListChangesOnTheMainOne) {
   makeCollection("a");
   std::vector<bool> changedOnMain;
   const auto observation = controller->observe("collections", [&](const platform::ChangeNotice&) {

@@ -117,7 +117,7 @@ TEST_F(QuiltMediaPreviewTest, TheAuthorsPosterTimeComesFirstUnlessItIsZero) {
 }
 
 TEST_F(QuiltMediaPreviewTest, AlbumArtworkStandsForTheMovie) {
-  EXPECT_EQ(posterTimeOf([this](ToldMovie& movie) { movie.theArtwork = picture(8, 8); }), -1) << "no frame was taken";
+  EXPECT_EQ(posterTimeOf([](ToldMovie& movie) { movie.theArtwork = picture(8, 8); }), -1) << "no frame was taken";
 }
 
 TEST_F(QuiltMediaPreviewTest, AMovieWithoutChaptersHasOnePreview) {

@@ -56,6 +56,8 @@ class CachedInspectionTest : public ::testing::Test {
  private:
   ScopedService<FileManager> _service{&Services::files, _files};
 };
+/// What starts threads; run with the thread sanitizer too.
+using CachedInspectionThreadTest = CachedInspectionTest;
 
 TEST_F(CachedInspectionTest, AFileIsLookedIntoOnce) {
   _files->identities["/a.mp4"] = {1, 10, 100, 1000};
@@ -135,7 +137,7 @@ TEST_F(CachedInspectionTest, AMissingFileIsLeftToTheInspector) {
   EXPECT_EQ(_inspector->looks, 1);
 }
 
-TEST_F(CachedInspectionTest, ThreadsMayAskAtOnce) {
+TEST_F(CachedInspectionThreadTest, ThreadsMayAskAtOnce) {
   for (std::uint64_t i = 0; i < 8; ++i) _files->identities["/" + std::to_string(i)] = {1, i, 100, 1000};
   std::vector<std::thread> threads;
   for (int thread = 0; thread < 4; ++thread) {

@@ -34,6 +34,8 @@ class MupdfInspectorTest : public ::testing::Test {
 
   ScratchFolder folder;
 };
+/// What starts threads; run with the thread sanitizer too.
+using MupdfInspectorThreadTest = MupdfInspectorTest;
 
 TEST_F(MupdfInspectorTest, APDFTellsItsKindItsFirstPageAndItsPages) {
   const MediaFacts read = factsOf(makePdf(onePage("/MediaBox [10 20 622 416]")));
@@ -147,7 +149,7 @@ TEST_F(MupdfInspectorTest, EveryLengthAndEveryChangedByteOfASmallPDFIsSurvived) 
   EXPECT_GT(good, 0) << "slight damage is repaired";
 }
 
-TEST_F(MupdfInspectorTest, ManyThreadsLookAtOnce) {
+TEST_F(MupdfInspectorThreadTest, ManyThreadsLookAtOnce) {
   writeFile(folder / "a.pdf", makePdf(onePage("/MediaBox [0 0 100 200]")));
   makeEpub(folder / "a.epub", "<dc:title>T</dc:title>");
   const std::size_t before = openDescriptors();
