@@ -34,6 +34,8 @@ std::unique_ptr<platform::FileLock> lock(const Path& library) {
   const Path file = library / kLockFilename;
   Result<std::unique_ptr<platform::FileLock>> held = services().files->lockFile(file, thisProcess());
   if (!held) throw Failure("Cannot write to the library " + inQuotes(library.native()), held.error());
+  // A killed writer's half-made items; what cannot be deleted now can be next time.
+  if ((*held)->wasAbandoned()) (void)services().files->removeTemporariesIn(library);
   return *std::move(held);
 }
 

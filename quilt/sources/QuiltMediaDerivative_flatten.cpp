@@ -21,8 +21,13 @@ constexpr const char* kCopyFailed = "Copy failed with error code (%d)";
 bool copyInto(const Path& source, const Path& destination, const ProgressionBlock& block) {
   const auto attributes = services().files->attributesOfItemAtPath(source);
   if (!attributes) FDYLogger::logWarning(kCannotBeSized, source, attributes.error());
-  const int result = copyReportingPercentage(source, destination, attributes ? attributes->size : 0, block);
-  if (result >= 0) return true;
+  int result = copyReportingPercentage(source, destination, attributes ? attributes->size : 0, block);
+  if (result >= 0) {
+    // The next save of the document names the copy; from then on the original may go.
+    result = services().files->syncItem(destination);
+    if (result >= 0) return true;
+    (void)services().files->removeItem(destination, destination.parent_path());
+  }
   FDYLogger::logDebug(kCopyFailed, result);
   return false;
 }

@@ -5,6 +5,7 @@
 #include <fstream>
 #include <set>
 
+#include "quilt/platform/base/TemporaryNames.h"
 #include "tests/support/MediaFixtures.h"
 #include "tests/support/QuiltProgram.h"
 
@@ -296,11 +297,13 @@ TEST_F(StoppedImportTest, AnotherWriterIsRefusedAndReadersAreNot) {
   EXPECT_EQ(0, quilt({"new", "collection", "Talks"}).exit);
 }
 
-TEST_F(StoppedImportTest, TheLockOfAKilledWriterIsTakenOver) {
+TEST_F(StoppedImportTest, TheLockOfAKilledWriterIsTakenOverAndItsTemporariesGo) {
   const auto program = startBigImport();
   program->signal(SIGKILL);
   EXPECT_EQ(-SIGKILL, program->wait().exit);
   EXPECT_EQ(0, quilt({"new", "collection", "Talks"}).exit);
+  for (const auto& item : std::filesystem::recursive_directory_iterator(library()))
+    EXPECT_FALSE(platform::isHiddenTemporaryName(item.path().filename().native())) << item.path();
 }
 
 }  // namespace

@@ -53,6 +53,10 @@ int SimpleFiles::copyfile(const std::filesystem::path&, const std::filesystem::p
   return -1;
 }
 
+int SimpleFiles::syncItem(const std::filesystem::path&) { return 0; }
+
+Result<std::size_t> SimpleFiles::removeTemporariesIn(const std::filesystem::path& folder) { return refused(folder); }
+
 Result<std::string> SimpleFiles::readFile(const std::filesystem::path& path, std::uint64_t maximum) const {
   std::ifstream stream(path, std::ios::binary);
   if (!stream) return Error{ErrorKind::NotFound, "There is no such file.", path};

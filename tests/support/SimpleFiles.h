@@ -28,6 +28,8 @@ class SimpleFiles final : public platform::FileManager {
   platform::Result<void> removeItem(const std::filesystem::path& path, const std::filesystem::path& within) override;
   int copyfile(const std::filesystem::path& source, const std::filesystem::path& destination,
                platform::CopyCallback callback, void* context) override;
+  int syncItem(const std::filesystem::path& path) override;
+  platform::Result<std::size_t> removeTemporariesIn(const std::filesystem::path& folder) override;
   [[nodiscard]] platform::Result<std::string> readFile(const std::filesystem::path& path,
                                                        std::uint64_t maximum) const override;
   [[nodiscard]] platform::Result<std::string> readStart(const std::filesystem::path& path,

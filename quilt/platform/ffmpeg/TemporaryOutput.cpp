@@ -6,10 +6,10 @@
 
 #include <cerrno>
 #include <cstdio>
-#include <random>
 #include <string>
 #include <utility>
 
+#include "quilt/platform/base/TemporaryNames.h"
 #include "quilt/platform/ffmpeg/Failure.h"
 #include "quilt/platform/ffmpeg/Handles.h"
 
@@ -18,11 +18,9 @@ namespace quilt::platform::ffmpeg {
 namespace fs = std::filesystem;
 
 Result<TemporaryOutput> TemporaryOutput::create(const fs::path& destination) {
-  std::random_device random;
   constexpr int attempts = 100;
   for (int i = 0; i < attempts; ++i) {
-    const std::string name = "." + std::to_string(random()) + std::to_string(random()) + ".tmp";
-    fs::path path = destination.parent_path() / name;
+    fs::path path = destination.parent_path() / hiddenNameBeside(destination.filename().native());
     const int descriptor = open(path.c_str(), O_RDWR | O_CREAT | O_EXCL | O_CLOEXEC | O_NOFOLLOW, 0666);
     if (descriptor >= 0) return TemporaryOutput(std::move(path), destination, descriptor);
     if (errno != EEXIST) return failure(AVERROR(errno), destination);

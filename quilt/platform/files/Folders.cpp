@@ -11,7 +11,7 @@
 #include <memory>
 #include <string_view>
 
-#include "quilt/platform/files/TemporaryItem.h"
+#include "quilt/platform/base/TemporaryNames.h"
 
 namespace quilt::platform {
 

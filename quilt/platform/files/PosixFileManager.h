@@ -13,7 +13,7 @@ namespace quilt::platform {
 ///   Start and one Finish; nothing may be at the destination. After Error it stops whatever the callback answers. The
 ///   negative number is that of the operating system's error; Quit gives -ECANCELED.
 /// - Synced before they return: writeAtomically, createDirectoryAtPath and moveItem; a move across file systems syncs
-///   the copy before it deletes. Copies are not: their source is still there.
+///   the copy before it deletes. Copies are not: their source is still there, and syncItem is at hand.
 /// - A lock file is deleted when its lock is given up.
 class PosixFileManager final : public FileManager {
  public:
@@ -30,6 +30,8 @@ class PosixFileManager final : public FileManager {
   Result<void> removeItem(const std::filesystem::path& path, const std::filesystem::path& within) override;
   int copyfile(const std::filesystem::path& source, const std::filesystem::path& destination, CopyCallback callback,
                void* context) override;
+  int syncItem(const std::filesystem::path& path) override;
+  Result<std::size_t> removeTemporariesIn(const std::filesystem::path& folder) override;
   [[nodiscard]] Result<std::string> readFile(const std::filesystem::path& path, std::uint64_t maximum) const override;
   [[nodiscard]] Result<std::string> readStart(const std::filesystem::path& path, std::size_t length) const override;
   Result<void> writeAtomically(const std::filesystem::path& path, std::string_view bytes) override;

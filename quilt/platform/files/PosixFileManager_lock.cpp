@@ -25,16 +25,18 @@ bool isStillThere(int file, const std::filesystem::path& path) {
 // The kernel gives the lock up with the descriptor, so also when the process dies.
 class PosixFileLock final : public FileLock {
  public:
-  PosixFileLock(std::shared_ptr<SystemCalls> system, Descriptor file, std::filesystem::path path)
-      : _system(std::move(system)), _file(std::move(file)), _path(std::move(path)) {}
+  PosixFileLock(std::shared_ptr<SystemCalls> system, Descriptor file, std::filesystem::path path, bool wasAbandoned)
+      : _system(std::move(system)), _file(std::move(file)), _path(std::move(path)), _wasAbandoned(wasAbandoned) {}
   ~PosixFileLock() override {
     if (isStillThere(_file.number(), _path)) _system->unlinkAt(AT_FDCWD, _path.c_str(), 0);
   }
+  [[nodiscard]] bool wasAbandoned() const override { return _wasAbandoned; }
 
  private:
   const std::shared_ptr<SystemCalls> _system;
   const Descriptor _file;
   const std::filesystem::path _path;
+  const bool _wasAbandoned;
 };
 
 Error lockedBy(SystemCalls& system, int file, const std::filesystem::path& path) {
@@ -59,10 +61,13 @@ Result<std::unique_ptr<FileLock>> PosixFileManager::lockFile(const std::filesyst
     }
     // Its last holder may have deleted it between the two calls; then another process can make and lock a new one.
     if (!isStillThere(file.number(), path)) continue;
+    // Who gives the lock up deletes the file, so text in it was left by a holder that did not come to that.
+    struct stat left {};
+    const bool wasAbandoned = ::fstat(file.number(), &left) == 0 && left.st_size > 0;
     if (_system->truncate(file.number(), 0) != 0) return posixError(errno, path);
     // The text is for people: the lock holds also when the disk is too full for it.
     [[maybe_unused]] const ssize_t written = _system->write(file.number(), owner.data(), owner.size());
-    return std::unique_ptr<FileLock>(std::make_unique<PosixFileLock>(_system, std::move(file), path));
+    return std::unique_ptr<FileLock>(std::make_unique<PosixFileLock>(_system, std::move(file), path, wasAbandoned));
   }
 }
 

@@ -3,14 +3,10 @@
 
 #include <functional>
 #include <string>
-#include <string_view>
 
 #include "quilt/platform/files/SystemCalls.h"
 
 namespace quilt::platform {
-
-/// A hidden name beside `name`, at most 255 bytes long, that ends differently at each call.
-std::string hiddenNameBeside(std::string_view name);
 
 /// An item in the making, under a hidden name beside the final one. Removed by the destructor unless it was put in
 /// place. The folder stays open while this lives. Operations answer 0 or an error number.

@@ -49,6 +49,9 @@ using CopyCallback = CopyAnswer (*)(int what, CopyStage stage, const CopyState& 
 class FileLock {
  public:
   virtual ~FileLock() = default;
+
+  /// Whether its last holder ended without giving it up, so that half-made items may lie about.
+  [[nodiscard]] virtual bool wasAbandoned() const = 0;
 };
 
 /// The file system. Paths are absolute. Every operation may be called on any thread; none leaves a partial result
@@ -93,6 +96,14 @@ class FileManager {
   /// removed.
   virtual int copyfile(const std::filesystem::path& source, const std::filesystem::path& destination,
                        CopyCallback callback, void* context) = 0;
+
+  /// Waits until a file, or a folder with its content, and its name are on the disk: a copy that a record is about to
+  /// name must outlive a power cut. Answers 0 or the negative errno, as copyfile does.
+  virtual int syncItem(const std::filesystem::path& path) = 0;
+
+  /// Deletes what killed processes left half made anywhere below a folder: items with hidden temporary names
+  /// (base/TemporaryNames.h), links not followed. The caller keeps other writers away. Answers how many it deleted.
+  virtual Result<std::size_t> removeTemporariesIn(const std::filesystem::path& folder) = 0;
 
   /// The whole file. Fails as Damaged when it is longer than `maximum` bytes.
   [[nodiscard]] virtual Result<std::string> readFile(const std::filesystem::path& path,

@@ -63,6 +63,15 @@ int FailNthFileManager::copyfile(const fs::path& source, const fs::path& destina
   return -1;
 }
 
+int FailNthFileManager::syncItem(const fs::path& path) {
+  return admit(Which::Changes) ? ForwardingFileManager::syncItem(path) : -1;
+}
+
+Result<std::size_t> FailNthFileManager::removeTemporariesIn(const fs::path& folder) {
+  if (!admit(Which::Changes)) return error(folder);
+  return ForwardingFileManager::removeTemporariesIn(folder);
+}
+
 Result<std::string> FailNthFileManager::readFile(const fs::path& path, std::uint64_t maximum) const {
   if (!admit(Which::All)) return error(path);
   return ForwardingFileManager::readFile(path, maximum);

@@ -41,6 +41,9 @@ class FailNthFileManager final : public ForwardingFileManager {
   /// Fails with -1, after the stages Start and Error.
   int copyfile(const std::filesystem::path& source, const std::filesystem::path& destination, CopyCallback callback,
                void* context) override;
+  /// Fails with -1.
+  int syncItem(const std::filesystem::path& path) override;
+  Result<std::size_t> removeTemporariesIn(const std::filesystem::path& folder) override;
   [[nodiscard]] Result<std::string> readFile(const std::filesystem::path& path, std::uint64_t maximum) const override;
   Result<void> writeAtomically(const std::filesystem::path& path, std::string_view bytes) override;
   Result<std::unique_ptr<FileLock>> lockFile(const std::filesystem::path& path, std::string_view owner) override;

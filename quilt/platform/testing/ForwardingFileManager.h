@@ -42,6 +42,10 @@ class ForwardingFileManager : public FileManager {
                void* context) override {
     return _target->copyfile(source, destination, callback, context);
   }
+  int syncItem(const std::filesystem::path& path) override { return _target->syncItem(path); }
+  Result<std::size_t> removeTemporariesIn(const std::filesystem::path& folder) override {
+    return _target->removeTemporariesIn(folder);
+  }
   [[nodiscard]] Result<std::string> readFile(const std::filesystem::path& path, std::uint64_t maximum) const override {
     return _target->readFile(path, maximum);
   }

@@ -95,6 +95,13 @@ TEST_F(FileLockTest, HoldsThoughTheDiskIsTooFullForTheText) {
   EXPECT_FALSE(files.lockFile(path, "you"));
 }
 
+TEST_F(FileLockTest, TellsWhetherItsLastHolderGaveItUp) {
+  EXPECT_FALSE((*files.lockFile(path, "me"))->wasAbandoned());
+  EXPECT_FALSE((*files.lockFile(path, "me"))->wasAbandoned());
+  support::writePlainly(path, "process 1 on a machine that lost power");
+  EXPECT_TRUE((*files.lockFile(path, "me"))->wasAbandoned());
+}
+
 TEST_F(FileLockTest, FollowsNoLink) {
   support::writePlainly(scratch / "precious", "kept");
   std::filesystem::create_symlink("precious", path);
