@@ -269,12 +269,17 @@ std::optional<platform::MonitorLock> QuiltDocument::beginProcessing() {
 }
 
 bool QuiltDocument::update() {
-  const auto refuse = [this] {
+  const std::optional<bool> saved = saveUnlessBusy();
+  if (!saved)
     FDYLogger::logCritical("Failed to update document at path \"%@\": \"Document is already being processed\"",
                            propertiesPath());
-    return false;
-  };
-  if (isBusy()) return refuse();
+  return saved.value_or(false);
+}
+
+void QuiltDocument::saveChange() { saveUnlessBusy(); }
+
+std::optional<bool> QuiltDocument::saveUnlessBusy() {
+  if (isBusy()) return std::nullopt;
   const auto lock = _media.lock();
   // Known before the document is processing, so that no thread takes this save for a long operation.
   const platform::ThreadIdentity before = _savingThread.exchange(platform::currentThreadIdentity());
@@ -289,7 +294,8 @@ bool QuiltDocument::update() {
     setIsProcessing(false);
   }
   _savingThread = before;
-  return isFree ? written : refuse();
+  if (!isFree) return std::nullopt;
+  return written;
 }
 
 void QuiltDocument::observeValueForKeyPath(std::string_view keyPath, platform::Object& /*ofObject*/,
@@ -297,7 +303,7 @@ void QuiltDocument::observeValueForKeyPath(std::string_view keyPath, platform::O
   if (std::find(std::begin(kSavingKeys), std::end(kSavingKeys), keyPath) == std::end(kSavingKeys)) return;
   if (isBusy()) return;
   FDYLogger::logDebug("Updating document because KVO deteched a change for the %@", keyPath);
-  update();
+  saveChange();
 }
 
 // ---- Dates and caches

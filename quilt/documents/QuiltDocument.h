@@ -110,6 +110,9 @@ class QuiltDocument : public platform::Object {
   /// Stamps modifiedDate and saves. False, after a critical line, while processing or when the file cannot be written.
   /// Waits for a save that another thread has begun.
   bool update();
+  /// The automatic save after a change: update() without its refusal, because a long operation may begin at any moment
+  /// between the change and its save.
+  void saveChange();
   /// Whether a change is not to be saved now: a load, a long operation or a save of this thread runs. A save of another
   /// thread does not count; update() waits for it.
   bool isBusy() const;
@@ -194,6 +197,8 @@ class QuiltDocument : public platform::Object {
   bool readProperties(const Path& file);
   void apply(const Dictionary& record);
   bool writeProperties();
+  /// What update() does; none, and nothing logged, while busy.
+  std::optional<bool> saveUnlessBusy();
   /// Sets isProcessing and answers the media lock, or none while busy. Waits for another thread's save.
   std::optional<platform::MonitorLock> beginProcessing();
   enum class Outcome { Done, Failed, Cancelled };

@@ -23,7 +23,7 @@ thread_local Deferred deferred;
 void requestSave(const std::shared_ptr<QuiltDocument>& document) {
   if (!document || document->isBusy()) return;
   if (deferred.depth == 0) {
-    document->update();
+    document->saveChange();
   } else if (std::find(deferred.documents.begin(), deferred.documents.end(), document) == deferred.documents.end()) {
     deferred.documents.push_back(document);
   }
