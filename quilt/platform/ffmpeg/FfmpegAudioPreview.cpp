@@ -21,7 +21,7 @@ using namespace ffmpeg;
 
 namespace {
 
-constexpr std::size_t kFlushedBytes = 64 * 1024;
+constexpr std::size_t kFlushedBytes = std::size_t{64} << 10;
 constexpr double kStalledSeconds = 30;  // for one packet
 
 std::string littleEndian(std::uint64_t value) {
