@@ -82,7 +82,12 @@ Command exportRequest(const Arguments& arguments) {
 
 Command doctorRequest(const Arguments&) { return DoctorRequest{}; }
 
-Command helpRequest(const Arguments& arguments) { return HelpRequest{arguments.first("COMMAND")}; }
+Command helpRequest(const Arguments& arguments) {
+  HelpRequest request{arguments.first("COMMAND"), arguments.first("--as").value_or("text")};
+  if (request.command && request.as != "text" && request.as != "man")
+    refuse("Completions are for all commands together; leave COMMAND out");
+  return request;
+}
 
 constexpr std::string_view kObject =
     "A DOCUMENT or COLLECTION is named by its UUID, by the beginning of it, by its title or by its path;\n"
@@ -194,7 +199,18 @@ const std::vector<CommandDescription>& commands() {
        true,
        exportRequest},
       {"doctor", "print which decoders, encoders, renderers and themes are there", "", {}, {}, false, doctorRequest},
-      {"help", "explain the program, or a command", "", {{"COMMAND", "the command", false}}, {}, false, helpRequest},
+      {"help",
+       "explain the program, or a command",
+       "",
+       {{"COMMAND", "the command", false}},
+       {{"--as",
+         "",
+         "FORM",
+         "text, man (a manual page), or completions for bash, zsh or fish",
+         false,
+         {"text", "man", "bash", "zsh", "fish"}}},
+       false,
+       helpRequest},
   };
   return table;
 }

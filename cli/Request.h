@@ -76,6 +76,7 @@ struct DoctorRequest {
 
 struct HelpRequest {
   std::optional<std::string> command{};
+  std::string as = "text";  ///< "text", "man" (a manual page), "bash", "zsh" or "fish" (completions)
   bool operator==(const HelpRequest&) const = default;
 };
 
