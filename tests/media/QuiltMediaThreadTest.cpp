@@ -3,6 +3,7 @@
 
 #include <atomic>
 #include <future>
+#include <map>
 #include <thread>
 
 #include "quilt/media/QuiltMedia.h"
@@ -55,7 +56,7 @@ class QuiltMediaThreadTest : public support::PackageFixture {
     return link;
   }
 
- private:
+  /// Whether another thread gets through the job at this moment.
   bool endsSoon(const std::function<void()>& job) {
     auto started = std::make_shared<std::promise<void>>();
     _readers.push_back(std::async(std::launch::async, [job, started] {
@@ -66,6 +67,7 @@ class QuiltMediaThreadTest : public support::PackageFixture {
     return _readers.back().wait_for(std::chrono::milliseconds(100)) == std::future_status::ready;
   }
 
+ private:
   std::vector<std::future<void>> _readers;  // a reader that waits for a list ends after the walk over it
 };
 
@@ -81,6 +83,30 @@ TEST_F(QuiltMediaThreadTest, AWalkHoldsItsListAndLeavesTheOther) {
     EXPECT_EQ(readableElsewhere(), "S");
     return true;
   });
+}
+
+TEST_F(QuiltMediaThreadTest, EveryReadOfAListWaitsForTheWalkOverIt) {
+  item()->addSource(QuiltMediaSource::init());
+  item()->addExtra(QuiltMediaExtra::init());
+  using Reads = std::map<std::string, std::function<void()>>;
+  const Reads ofBoth = {{"dictionary", [this] { item()->dictionary(); }},
+                        {"totalSizeInMegaBytes", [this] { item()->totalSizeInMegaBytes(); }},
+                        {"invalidateCaches", [this] { item()->invalidateCaches(); }},
+                        {"availableFormats", [this] { item()->availableFormats(); }}};
+  const Reads ofSources = {{"sources", [this] { item()->sources(); }},
+                           {"sourceAtIndex", [this] { item()->sourceAtIndex(0); }},
+                           {"sourceWithUUID", [this] { item()->sourceWithUUID("S"); }},
+                           {"duration", [this] { item()->duration(); }},
+                           {"isFlattened", [this] { item()->isFlattened(); }},
+                           {"totalSourcesPreviewsCount", [this] { item()->totalSourcesPreviewsCount(); }}};
+  const Reads ofExtras = {{"extras", [this] { item()->extras(); }},
+                          {"extraAtIndex", [this] { item()->extraAtIndex(0); }}};
+  const auto expectAllWait = [this](const Reads& reads) {
+    for (const auto& [name, read] : reads) EXPECT_FALSE(endsSoon(read)) << name;
+    return true;
+  };
+  item()->performBlockOnSources([&](const auto&) { return expectAllWait(ofBoth) && expectAllWait(ofSources); });
+  item()->performBlockOnExtra([&](const auto&) { return expectAllWait(ofBoth) && expectAllWait(ofExtras); });
 }
 
 TEST_F(QuiltMediaThreadTest, ALongOperationHoldsTheListOfTheChildThatItDrivesAndNeverBoth) {

@@ -27,7 +27,7 @@ struct Sources {
   using Child = QuiltMediaSource;
   static constexpr const char* key = "sources";
   static constexpr const char* recordKey = "Sources";
-  static constexpr const char* singular = "source";
+  static constexpr const char* notDeleted = "Failed to delete source at path \"";
   static std::size_t count(const QuiltMedia& item) { return item.sourcesCount(); }
   static auto at(const QuiltMedia& item, std::size_t index) { return item.sourceAtIndex(index); }
   static auto all(const QuiltMedia& item) { return item.sources(); }
@@ -50,7 +50,7 @@ struct Extras {
   using Child = QuiltMediaExtra;
   static constexpr const char* key = "extras";
   static constexpr const char* recordKey = "Extras";
-  static constexpr const char* singular = "extra";
+  static constexpr const char* notDeleted = "Failed to delete extra at path \"";
   static std::size_t count(const QuiltMedia& item) { return item.extraCount(); }
   static auto at(const QuiltMedia& item, std::size_t index) { return item.extraAtIndex(index); }
   static auto all(const QuiltMedia& item) { return item.extras(); }
@@ -100,8 +100,7 @@ class QuiltMediaListsTest : public support::PackageFixture {
     return held->path();
   }
   static Line notDeleted(const Path& path, const std::string& reason) {
-    return warning("Failed to delete " + std::string(List::singular) + " at path \"" + path.native() + "\": \"" +
-                   reason + "\"");
+    return warning(List::notDeleted + path.native() + "\": \"" + reason + "\"");
   }
   /// Calls back before (true) and after (false) each change of the list.
   platform::Observation observe(const std::function<void(bool before)>& block) {

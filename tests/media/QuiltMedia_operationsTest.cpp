@@ -42,6 +42,11 @@ class HalfwayFiles final : public platform::ForwardingFileManager {
   }
 };
 
+constexpr const char* kNoMediaFolder = "Failed to create intermediate directories for media at path \"";
+constexpr const char* kNoSourcesFolder = "Failed to create intermediate directories for sources at path \"";
+constexpr const char* kNoExtrasFolder = "Failed to create intermediate directories for extras at path \"";
+constexpr const char* kNoSourceFolder = "Failed to create intermediate directories for source at path \"";
+
 FailsAt at(const Path& path) {
   return [path](const Path& changed) { return changed == path; };
 }
@@ -99,16 +104,17 @@ class QuiltMediaOperationsTest : public support::PackageFixture {
     return {debug("Finalizing source at path \"" + child.path().native() + "\"")};
   }
   static Lines notFlattened(const QuiltMediaSource& child) {
-    return {debug("Flattening source at path \"" + child.path().native() + "\""), noFolder("source", child.path()),
+    return {debug("Flattening source at path \"" + child.path().native() + "\""),
+            noFolder(kNoSourceFolder, child.path()),
             critical("Failed to flatten source at path \"" + child.path().native() + "\"")};
   }
   static Lines notFinalized(const QuiltMediaSource& child) {
-    return {debug("Finalizing source at path \"" + child.path().native() + "\""), noFolder("source", child.path()),
+    return {debug("Finalizing source at path \"" + child.path().native() + "\""),
+            noFolder(kNoSourceFolder, child.path()),
             critical("Failed to finalize source at path \"" + child.path().native() + "\"")};
   }
-  static Line noFolder(const std::string& whose, const Path& folder) {
-    return debug("Failed to create intermediate directories for " + whose + " at path \"" + folder.native() +
-                 "\": \"The disk is full.\"");
+  static Line noFolder(const char* failure, const Path& folder) {
+    return debug(failure + folder.native() + "\": \"The disk is full.\"");
   }
 
   // What the item logs
@@ -285,14 +291,14 @@ TEST_F(QuiltMediaOperationsTest, AFlattenWithoutAPathFails) {
 TEST_F(QuiltMediaOperationsTest, AFlattenFailsWithoutTheItemsFolder) {
   addLink();
   EXPECT_FALSE(flattenFailingAt(at(item()->path())));
-  EXPECT_EQ(takeLines(), (Lines{flattening(), noFolder("media", item()->path()), flattenFailed()}));
+  EXPECT_EQ(takeLines(), (Lines{flattening(), noFolder(kNoMediaFolder, item()->path()), flattenFailed()}));
   EXPECT_THAT(progress.values, ElementsAre(0));
 }
 
 TEST_F(QuiltMediaOperationsTest, AFlattenFailsWithoutTheSourcesFolder) {
   addLink();
   EXPECT_FALSE(flattenFailingAt(at(item()->sourcesFolderPath())));
-  EXPECT_EQ(takeLines(), (Lines{flattening(), noFolder("media", item()->sourcesFolderPath()), flattenFailed()}));
+  EXPECT_EQ(takeLines(), (Lines{flattening(), noFolder(kNoMediaFolder, item()->sourcesFolderPath()), flattenFailed()}));
   EXPECT_THAT(progress.values, ElementsAre(0));
 }
 
@@ -304,7 +310,7 @@ TEST_F(QuiltMediaOperationsTest, AFlattenFailsWithoutTheExtrasFolderWhenSourcesA
   EXPECT_EQ(takeLines(), joined({{flattening()},
                                  flattened(*source),
                                  flattened(*commentary),
-                                 {noFolder("media", item()->extrasFolderPath()), flattenFailed()}}));
+                                 {noFolder(kNoMediaFolder, item()->extrasFolderPath()), flattenFailed()}}));
   EXPECT_THAT(progress.values, ElementsAre(0, 100.0 / 3, 33 + 100.0 / 3));
 }
 
@@ -515,20 +521,22 @@ TEST_F(QuiltMediaOperationsTest, AFinalizeWithoutAPathFails) {
 TEST_F(QuiltMediaOperationsTest, AFinalizeFailsWithoutTheItemsFolder) {
   addLink();
   EXPECT_FALSE(finalizeFailingAt(at(item()->path())));
-  EXPECT_EQ(takeLines(), (Lines{finalizing(), noFolder("media", item()->path()), finalizeFailed()}));
+  EXPECT_EQ(takeLines(), (Lines{finalizing(), noFolder(kNoMediaFolder, item()->path()), finalizeFailed()}));
   EXPECT_THAT(progress.values, ElementsAre(0));
   EXPECT_EQ(item()->posterImageVersion(), 1u) << "the poster comes after the folders";
 }
 
 TEST_F(QuiltMediaOperationsTest, AFinalizeFailsWithoutTheSourcesFolder) {
   EXPECT_FALSE(finalizeFailingAt(at(item()->sourcesFolderPath())));
-  EXPECT_EQ(takeLines(), (Lines{finalizing(), noFolder("sources", item()->sourcesFolderPath()), finalizeFailed()}));
+  EXPECT_EQ(takeLines(),
+            (Lines{finalizing(), noFolder(kNoSourcesFolder, item()->sourcesFolderPath()), finalizeFailed()}));
   EXPECT_FALSE(std::filesystem::exists(item()->extrasFolderPath()));
 }
 
 TEST_F(QuiltMediaOperationsTest, AFinalizeFailsWithoutTheExtrasFolder) {
   EXPECT_FALSE(finalizeFailingAt(at(item()->extrasFolderPath())));
-  EXPECT_EQ(takeLines(), (Lines{finalizing(), noFolder("extras", item()->extrasFolderPath()), finalizeFailed()}));
+  EXPECT_EQ(takeLines(),
+            (Lines{finalizing(), noFolder(kNoExtrasFolder, item()->extrasFolderPath()), finalizeFailed()}));
 }
 
 TEST_F(QuiltMediaOperationsTest, AFinalizeFailsWithASource) {
