@@ -168,6 +168,12 @@ TEST_F(QuiltMediaTest, AnIdentityThatIsNoPlainNameIsRefused) {
   }
 }
 
+TEST_F(QuiltMediaTest, AnIdentityThatNoFolderCanHaveIsRefused) {
+  EXPECT_EQ(read({{"UUID", std::string(300, 'x')}}), nullptr);
+  EXPECT_EQ(read({{"UUID", std::string("a\0b", 3)}}), nullptr);
+  EXPECT_EQ(takeProblems().size(), 2u);
+}
+
 TEST_F(QuiltMediaTest, ChildrenFindTheirPlacesWhileTheyLoad) {
   const auto media =
       read({{"UUID", "ITEM"},

@@ -129,6 +129,19 @@ TEST_F(QuiltMediaThreadTest, ALongOperationHoldsTheListOfTheChildThatItDrivesAnd
               ElementsAre("E", "E", "S", "S"));
 }
 
+TEST_F(QuiltMediaThreadTest, AnOperationThatFailsLeavesNoListLocked) {
+  const auto source = addLink();
+  const auto extra = addExtraLink();
+  for (const auto& child : {std::shared_ptr<QuiltMediaSource>(extra), source}) {
+    std::filesystem::remove_all(item()->path());
+    writeFile(child->path(), "a file where the child's folder should be");
+    EXPECT_FALSE(item()->flattenWithProgressionBlock({}));
+    EXPECT_EQ(readableElsewhere(), "SE");
+    EXPECT_FALSE(item()->finalizeWithProgressionBlock({}));
+    EXPECT_EQ(readableElsewhere(), "SE");
+  }
+}
+
 TEST_F(QuiltMediaThreadTest, AChangeMadeByAWorkerIsSeenOnTheMainThreadAndSavedAfterIt) {
   letDocumentSave();
   std::vector<bool> onMainThread;

@@ -206,6 +206,8 @@ TYPED_TEST(QuiltMediaListsTest, AnInsertionBeyondTheEndIsRefused) {
 TYPED_TEST(QuiltMediaListsTest, AGroupMovesToAPositionCountedBeforeTheMove) {
   EXPECT_EQ(this->moved({0, 2}, 4), "BDAC");
   EXPECT_EQ(this->moved({3}, 0), "DABC");
+  EXPECT_EQ(this->moved({0}, 2), "BACD");
+  EXPECT_EQ(this->moved({0, 1, 2, 3}, 4), "ABCD");
   EXPECT_EQ(this->moved({1, 2}, 2), "ABCD") << "the target is lowered once, for the second child";
 }
 

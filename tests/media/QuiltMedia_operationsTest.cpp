@@ -170,11 +170,15 @@ TEST_F(QuiltMediaOperationsTest, EverySourceAndEveryExtraMustBeFlattened) {
 TEST_F(QuiltMediaOperationsTest, FlattenedExtrasAloneAreEnough) {
   item()->addExtra(flattenedLink<QuiltMediaExtra>());
   EXPECT_TRUE(item()->isFlattened());
+  addExtraLink();
+  EXPECT_FALSE(item()->isFlattened());
 }
 
 TEST_F(QuiltMediaOperationsTest, TheCommentaryDecidesOnceTheListsHaveNothingAgainstIt) {
   item()->setAudioCommentarySource(flattenedLink());
   EXPECT_TRUE(item()->isFlattened()) << "alone";
+  setCommentaryLink();
+  EXPECT_FALSE(item()->isFlattened()) << "alone";
   added(flattenedLink());
   setCommentaryLink();
   EXPECT_FALSE(item()->isFlattened());

@@ -167,11 +167,13 @@ TEST_F(QuiltMediaPosterTest, ACompositionThatAnotherRunSavedIsShown) {
 TEST_F(QuiltMediaPosterTest, APosterFileIsReducedAndNeitherSavedAgainNorCounted) {
   addSource(pictureFile(64, 48));
   const std::string before = readFile(writePoster(1280, 960));
+  const Installed<FaultyImages> images(&Services::images);
   const auto poster = item()->posterImage();
   ASSERT_NE(poster, nullptr);
   EXPECT_EQ(poster->size(), (Size{640, 480}));
   EXPECT_EQ(item()->posterImage(), poster);
   EXPECT_EQ(item()->posterImageVersion(), 1u);
+  EXPECT_EQ(images->decodes, 0) << "no pixel was needed";
   EXPECT_EQ(readFile(posterFile()), before);
 }
 
@@ -295,7 +297,9 @@ TEST_F(QuiltMediaPosterTest, AfterThePosterWasInvalidatedItIsDrawnAnewAndTheVers
   writePoster(20, 10);
   ASSERT_EQ(item()->posterImage()->size(), (Size{20, 10}));
   const auto version = item()->posterImageVersion();
+  takeLines();
   item()->invalidatePosterImage();
+  EXPECT_THAT(takeLines(), IsEmpty());
   EXPECT_FALSE(std::filesystem::exists(posterFile()));
   EXPECT_EQ(item()->posterImageVersion(), version + 1);
   EXPECT_EQ(item()->posterImage()->size(), (Size{64, 48}));
