@@ -40,16 +40,6 @@ class QuiltMediaPosterTest : public support::PackageFixture {
   support::Line notValid() const {
     return warning("Media poster image path \"" + posterFile().native() + "\" is not a valid image");
   }
-
-  /// A composition cannot be drawn here: none is answered, once more each time, and nothing is saved.
-  void expectNoComposition() {
-    takeLines();
-    const auto version = item()->posterImageVersion();
-    EXPECT_EQ(item()->posterImage(), nullptr);
-    EXPECT_EQ(takeProblems(), Lines{warning("Media poster image cannot be previewed")});
-    EXPECT_EQ(item()->posterImageVersion(), version + 1);
-    EXPECT_FALSE(std::filesystem::exists(item()->path()));
-  }
 };
 
 // ---- Making it
@@ -134,24 +124,6 @@ TEST_F(QuiltMediaPosterTest, AFirstSourceWithoutAPosterOfItsOwnGivesNone) {
                                 warning("Media poster image cannot be previewed")}));
   EXPECT_EQ(item()->posterImageVersion(), 2u);
   EXPECT_FALSE(std::filesystem::exists(item()->path()));
-}
-
-TEST_F(QuiltMediaPosterTest, AMontageWithoutSourcesHasNoComposition) {
-  item()->setContentCategory(kQuiltMediaContentCategoryMontage);
-  expectNoComposition();
-}
-
-TEST_F(QuiltMediaPosterTest, AMontageOfFiveHasNoComposition) {
-  for (std::size_t i = 1; i <= 5; ++i) addSource(pictureFile(8 * i, 8));
-  item()->setContentCategory(kQuiltMediaContentCategoryMontage);
-  expectNoComposition();
-}
-
-TEST_F(QuiltMediaPosterTest, TwoSourcesTogetherHaveNoComposition) {
-  addSource(pictureFile(640, 480));
-  addSource(pictureFile(1920, 1080));
-  item()->setContentCategory(kQuiltMediaContentCategoryDualSource);
-  expectNoComposition();
 }
 
 TEST_F(QuiltMediaPosterTest, ACompositionThatAnotherRunSavedIsShown) {

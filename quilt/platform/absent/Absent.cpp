@@ -23,6 +23,8 @@ Result<std::shared_ptr<ImageWrapper>> AbsentImages::imageWithBitmap(Bitmap /*bit
   return _absence.error({});
 }
 
+Result<std::unique_ptr<Canvas>> AbsentDrawing::makeCanvas(Size /*size*/) const { return _absence.error({}); }
+
 Result<std::unique_ptr<Movie>> AbsentMovieToolkit::openMovie(const std::filesystem::path& path) const {
   return _absence.error(path);
 }

@@ -4,6 +4,7 @@
 #include <mutex>
 #include <string>
 
+#include "quilt/platform/interfaces/Drawing.h"
 #include "quilt/platform/interfaces/FDYArchive.h"
 #include "quilt/platform/interfaces/FDYAudioPreview.h"
 #include "quilt/platform/interfaces/FDYMedia.h"
@@ -36,6 +37,14 @@ class AbsentImages final : public Images {
 
  private:
   Absence _absence{"Reading and writing of images"};
+};
+
+class AbsentDrawing final : public Drawing {
+ public:
+  Result<std::unique_ptr<Canvas>> makeCanvas(Size size) const override;
+
+ private:
+  Absence _absence{"Drawing of posters"};
 };
 
 class AbsentMovieToolkit final : public MovieToolkit {
