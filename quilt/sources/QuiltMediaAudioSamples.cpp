@@ -94,7 +94,7 @@ Path QuiltMediaAudioSamples::path() const {
   return folder / platform::withExtension(*identity, "asc");
 }
 
-bool QuiltMediaAudioSamples::flatten() {
+bool QuiltMediaAudioSamples::flatten(const ContinueBlock& goesOn) {
   if (isFlattened()) return true;
   const Path file = path();
   if (file.empty()) return false;
@@ -111,7 +111,7 @@ bool QuiltMediaAudioSamples::flatten() {
   }
   const Url destination = Url::fileUrl(file);
   const auto source = sourceURL();
-  if (!source || !services().audioPreview->extractAudioSamplesFromAssetURL(*source, destination)) {
+  if (!source || !services().audioPreview->extractAudioSamplesFromAssetURL(*source, destination, goesOn)) {
     FDYLogger::logCritical("Failed to extract audio samples file at path \"%@\": \"%@\"", file, std::nullopt);
     return false;
   }
