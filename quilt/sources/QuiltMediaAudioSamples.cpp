@@ -44,7 +44,7 @@ std::shared_ptr<QuiltMediaAudioSamples> QuiltMediaAudioSamples::initWithDictiona
   auto samples = init();
   samples->setSourceOwner(andMediaSource);
   if (const Text uuid = dictionary.string("UUID")) {
-    if (!isAcceptedName(*uuid, "audio samples file")) return nullptr;
+    if (!isAcceptedName(*uuid, "samples file")) return nullptr;
     samples->setUuid(uuid);
   }
   // The key only marks that there were samples; where they lie follows from the identity.
@@ -101,7 +101,7 @@ bool QuiltMediaAudioSamples::flatten(const ContinueBlock& goesOn) {
   // The second placeholder has no error to print: nothing failed, the place is not as it should be.
   const Path folder = file.parent_path();
   if (services().files->kindOfItemAtPath(folder) != platform::FileKind::Folder ||
-      !isInsidePackage(folder, documentOf(sourceOwner()), "audio samples file")) {
+      !isInsidePackage(folder, documentOf(sourceOwner()), "samples file")) {
     FDYLogger::logCritical("Expected audio samples folder at path \"%@\": \"%@\"", folder, std::nullopt);
     return false;
   }

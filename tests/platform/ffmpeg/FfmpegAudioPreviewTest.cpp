@@ -10,6 +10,7 @@
 #include "quilt/platform/ffmpeg/FfmpegAudioPreview.h"
 #include "tests/support/MediaFixtures.h"
 #include "tests/support/ScratchFolder.h"
+#include "tests/support/SourceServices.h"
 
 namespace quilt::platform {
 namespace {
@@ -247,22 +248,8 @@ TEST_F(FfmpegAudioPreviewTest, NoTemporaryFileIsLeftWhenItSucceeds) {
 
 // ---- Stopping
 
-// Six hours and a half of silence at 44.1 kHz, of which the disk holds only the header.
-std::filesystem::path longSilence() {
-  constexpr std::uintmax_t bytes = 0x7fff'f000;
-  const std::filesystem::path file = makeWav({}, 1, 44100);
-  std::string header = support::readBytes(file);
-  const auto size = static_cast<std::uint32_t>(bytes);
-  std::memcpy(header.data() + 40, &size, 4);
-  const std::uint32_t riff = size + 36;
-  std::memcpy(header.data() + 4, &riff, 4);
-  support::writeBytes(file, header);
-  std::filesystem::resize_file(file, bytes + 44);
-  return file;
-}
-
 TEST_F(FfmpegAudioPreviewTest, AFalseAnswerStopsALongFileAtOnceAndLeavesNothing) {
-  const std::filesystem::path source = longSilence();
+  const std::filesystem::path source = support::longSilence();
   int asked = 0;
   bool wroteMeanwhile = false;
   auto answered = std::chrono::steady_clock::time_point::max();
@@ -283,7 +270,7 @@ TEST_F(FfmpegAudioPreviewTest, AFalseAnswerStopsALongFileAtOnceAndLeavesNothing)
 }
 
 TEST_F(FfmpegAudioPreviewTest, ItAsksManyTimesASecond) {
-  const std::filesystem::path source = longSilence();
+  const std::filesystem::path source = support::longSilence();
   using Clock = std::chrono::steady_clock;
   const Clock::time_point start = Clock::now();
   Clock::time_point last = start;
