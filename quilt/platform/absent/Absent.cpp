@@ -31,7 +31,8 @@ Result<std::unique_ptr<Movie>> AbsentMovieToolkit::openMovie(const std::filesyst
 
 Result<MediaFacts> AbsentInspector::inspect(const std::filesystem::path& path) const { return _absence.error(path); }
 
-Result<void> AbsentAudioPreview::extractAudioSamplesFromAssetURL(const Url& assetURL, const Url& /*toSampleURL*/) {
+Result<void> AbsentAudioPreview::extractAudioSamplesFromAssetURL(const Url& assetURL, const Url& /*toSampleURL*/,
+                                                                 const ContinueBlock& /*goesOn*/) {
   return _absence.error(assetURL.relativePath());
 }
 

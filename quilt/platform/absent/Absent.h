@@ -67,7 +67,8 @@ class AbsentInspector final : public MediaInspector {
 
 class AbsentAudioPreview final : public FDYAudioPreview {
  public:
-  Result<void> extractAudioSamplesFromAssetURL(const Url& assetURL, const Url& toSampleURL) override;
+  Result<void> extractAudioSamplesFromAssetURL(const Url& assetURL, const Url& toSampleURL,
+                                               const ContinueBlock& goesOn) override;
 
  private:
   Absence _absence{"Extraction of audio samples"};
