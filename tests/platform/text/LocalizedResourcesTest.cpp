@@ -4,15 +4,14 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include <cstdlib>
-#include <optional>
-
 #include "quilt/platform/base/Utf8.h"
 #include "quilt/resources/EmbeddedFiles.h"
+#include "tests/support/Environment.h"
 
 namespace quilt::platform {
 namespace {
 
+using support::Environment;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 using ::testing::Pair;
@@ -20,24 +19,6 @@ using ::testing::Pair;
 std::string titleIn(std::string_view language) {
   return LocalizedResources(language).localizedString("Untitled Episode", "none");
 }
-
-/// Sets an environment variable, or removes it, until the end.
-class Environment {
- public:
-  Environment(const char* name, const char* value) : _name(name) {
-    if (const char* before = std::getenv(name)) _before = before;
-    set(value);
-  }
-  Environment(const Environment&) = delete;
-  Environment& operator=(const Environment&) = delete;
-  ~Environment() { set(_before ? _before->c_str() : nullptr); }
-
- private:
-  void set(const char* value) { value ? setenv(_name, value, 1) : unsetenv(_name); }
-
-  const char* _name;
-  std::optional<std::string> _before;
-};
 
 TEST(LocalizedResourcesTest, ATextComesInTheLanguageAsked) {
   EXPECT_EQ("Untitled Episode", titleIn("en"));
