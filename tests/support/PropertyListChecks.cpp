@@ -3,8 +3,8 @@
 
 #include <set>
 
-#include "quilt/platform/base/Utf8.h"
 #include "quilt/platform/plist/XmlPropertyLists.h"
+#include "quilt/platform/plist/XmlText.h"
 
 namespace quilt::support {
 
@@ -26,7 +26,7 @@ class Judge {
   static std::string judge(const Data& /*data*/, std::size_t /*depth*/) { return {}; }
 
   static std::string judge(const std::string& text, std::size_t /*depth*/) {
-    return isUtf8(text) ? "" : "A text is no UTF-8.";
+    return isXmlText(text) ? "" : "A text cannot be written.";
   }
 
   static std::string judge(Date date, std::size_t /*depth*/) {
@@ -43,7 +43,7 @@ class Judge {
   std::string judge(const Dictionary& dictionary, std::size_t depth) {
     std::set<std::string_view> keys;
     for (const auto& [key, item] : dictionary) {
-      if (!isUtf8(key)) return "A key is no UTF-8.";
+      if (!isXmlText(key)) return "A key cannot be written.";
       if (!keys.insert(key).second) return "The key \"" + key + "\" stands twice.";
       if (std::string problem = judge(item, depth + 1); !problem.empty()) return problem;
     }
@@ -65,7 +65,7 @@ std::string problemWith(const PropertyList& value) {
 std::string problemWhenReading(std::string_view bytes) {
   const auto value = XmlPropertyLists().parse(bytes);
   if (value) return problemWith(*value);
-  if (value.error().text.empty() || !isUtf8(value.error().text)) return "The error says nothing.";
+  if (value.error().text.empty() || !isXmlText(value.error().text)) return "The error says nothing.";
   return value.error().kind == ErrorKind::Damaged ? "" : "The error is of a wrong kind: " + value.error().text;
 }
 

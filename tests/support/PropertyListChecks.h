@@ -10,7 +10,7 @@
 namespace quilt::support {
 
 /// What is wrong with a value that a reader answered, in one sentence; empty when nothing is. Right is: texts and keys
-/// are UTF-8, no key stands twice, dates are in the clock's range, at most 128 levels, and writing, reading and writing
+/// can be written, no key stands twice, dates are in the clock's range, at most 128 levels, and writing, reading and writing
 /// it anew gives the same bytes.
 std::string problemWith(const platform::PropertyList& value);
 

@@ -58,7 +58,8 @@ std::optional<Date> parseIso8601(std::string_view text) {
   const year_month_day calendar{year{*y}, month{static_cast<unsigned>(*mo)}, day{static_cast<unsigned>(*d)}};
   if (!calendar.ok() || *h > 23 || *mi > 59 || *s > 60) return std::nullopt;
   const sys_days day = std::clamp(sys_days{calendar}, kEarliestDay, kLatestDay);
-  return Date{day + hours{*h} + minutes{*mi} + seconds{*s}};
+  const sys_seconds time = day + hours{*h} + minutes{*mi} + seconds{*s};
+  return Date{std::min<sys_seconds>(time, kLatestDay + days{1} - seconds{1})};  // a leap second would lead out
 }
 
 }  // namespace quilt::platform

@@ -1,25 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "quilt/platform/base/Utf8.h"
 
-#include <cstdint>
-#include <cstring>
-
 namespace quilt::platform {
-
-namespace {
-
-/// How many bytes at the front are ASCII; may answer fewer than there are.
-std::size_t asciiPrefix(std::string_view text) {
-  constexpr std::uint64_t highBits = 0x8080808080808080U;
-  std::size_t length = 0;
-  for (std::uint64_t word = 0; length + sizeof word <= text.size(); length += sizeof word) {
-    std::memcpy(&word, text.data() + length, sizeof word);
-    if (word & highBits) break;
-  }
-  return length;
-}
-
-}  // namespace
 
 Utf8Character firstUtf8Character(std::string_view text) {
   constexpr Utf8Character invalid{kReplacementCharacter, 1, false};
@@ -37,27 +19,6 @@ Utf8Character firstUtf8Character(std::string_view text) {
   const bool isSurrogate = code >= 0xD800 && code <= 0xDFFF;
   if (code < smallest || code > 0x10FFFF || isSurrogate) return invalid;
   return {code, length, true};
-}
-
-bool isUtf8(std::string_view text) {
-  for (;;) {
-    text.remove_prefix(asciiPrefix(text));
-    if (text.empty()) return true;
-    const Utf8Character character = firstUtf8Character(text);
-    if (!character.isValid) return false;
-    text.remove_prefix(character.length);
-  }
-}
-
-std::string repairedUtf8(std::string_view text) {
-  std::string repaired;
-  repaired.reserve(text.size());
-  while (!text.empty()) {
-    const Utf8Character character = firstUtf8Character(text);
-    repaired += character.isValid ? text.substr(0, character.length) : kReplacementText;
-    text.remove_prefix(character.length);
-  }
-  return repaired;
 }
 
 }  // namespace quilt::platform

@@ -2,7 +2,6 @@
 #pragma once
 
 #include <cstddef>
-#include <string>
 #include <string_view>
 
 namespace quilt::platform {
@@ -19,11 +18,5 @@ struct Utf8Character {
 
 /// The first character of a text that is not empty: shortest form only, no surrogates, up to U+10FFFF.
 Utf8Character firstUtf8Character(std::string_view text);
-
-/// Whether every character of the text is valid.
-bool isUtf8(std::string_view text);
-
-/// The text with U+FFFD in place of each byte that is no UTF-8.
-std::string repairedUtf8(std::string_view text);
 
 }  // namespace quilt::platform

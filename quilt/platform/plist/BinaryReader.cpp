@@ -5,9 +5,9 @@
 #include <bit>
 #include <cmath>
 
-#include "quilt/platform/base/Utf8.h"
 #include "quilt/platform/plist/Limits.h"
 #include "quilt/platform/plist/XmlReader.h"
+#include "quilt/platform/plist/XmlText.h"
 
 namespace quilt::platform {
 
@@ -155,7 +155,7 @@ class Reader {
     if (_unfolded > kMostUnfolded) return damaged("The binary property list unfolds to too many bytes");
     const std::string_view part = _bytes.substr(span.start, span.count * width);
     if (kind == 0x4) return PropertyList(Data(part.begin(), part.end()));
-    if (kind == 0x5) return PropertyList(isUtf8(part) ? std::string(part) : repairedUtf8(part));
+    if (kind == 0x5) return PropertyList(isXmlText(part) ? std::string(part) : xmlTextFrom(part));
     std::string text;
     for (std::uint64_t i = 0; i < span.count; ++i) {
       auto unit = static_cast<std::uint32_t>(number(span.start + 2 * i, 2));
@@ -170,7 +170,7 @@ class Reader {
       }
       appendUtf8(text, unit);
     }
-    return PropertyList(std::move(text));
+    return PropertyList(isXmlText(text) ? std::move(text) : xmlTextFrom(text));
   }
 
   [[nodiscard]] bool holdsReferences(Span span, std::uint64_t each) const {

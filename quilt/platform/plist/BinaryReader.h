@@ -14,7 +14,7 @@ inline constexpr std::string_view kBinaryMagic = "bplist00";
 /// offset or reference leads nowhere, objects nest deeper than kDeepestNesting (and so when they contain themselves),
 /// or shared objects would unfold to more than kMostObjects values or kMostUnfolded bytes.
 ///
-/// Numbers out of range, repeated keys and texts that are no Unicode are read as in readXml.
+/// Numbers out of range, repeated keys and texts that XML cannot hold are read as in readXml.
 Result<PropertyList> readBinary(std::string_view bytes);
 
 }  // namespace quilt::platform

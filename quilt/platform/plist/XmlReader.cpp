@@ -10,9 +10,9 @@
 #include <unordered_map>
 #include <utility>
 
-#include "quilt/platform/base/Utf8.h"
 #include "quilt/platform/plist/Base64.h"
 #include "quilt/platform/plist/Limits.h"
+#include "quilt/platform/plist/XmlText.h"
 
 namespace quilt::platform {
 
@@ -45,12 +45,13 @@ bool mayHoldSplitTexts(std::string_view buffer) {
   return holds('!', "DOCTYPE") || holds('?', "xml ");
 }
 
-/// Whether the parser may answer texts that are no UTF-8: it takes bytes and numbered characters as they come.
+/// Whether the parser may answer texts that could not be written again: it takes bytes and numbered characters as they
+/// come.
 bool mayHoldForeignBytes(std::string_view buffer) {
   if (!isInBytes(buffer)) return true;
   for (std::size_t at = buffer.find('&'); at != std::string_view::npos; at = buffer.find('&', at + 1))
     if (buffer.substr(at + 1).starts_with('#')) return true;
-  return !isUtf8(buffer);
+  return !isXmlText(buffer);
 }
 
 std::string_view trimmed(std::string_view text) {
@@ -150,7 +151,7 @@ class Builder {
       if (piece.type() == pugi::node_element) return fail(piece, "stands inside a text");
       text += piece.value();
     }
-    if (_repairsTexts && !isUtf8(text)) text = repairedUtf8(text);
+    if (_repairsTexts && !isXmlText(text)) text = xmlTextFrom(text);
     return true;
   }
 
@@ -200,7 +201,7 @@ class Builder {
   bool fail(pugi::xml_node element, std::string_view what) {
     const bool isElement = element.type() == pugi::node_element;
     constexpr std::size_t longest = 32;  // of a name that the file made up
-    const std::string name = repairedUtf8(std::string_view(element.name()).substr(0, longest));
+    const std::string name = xmlTextFrom(std::string_view(element.name()).substr(0, longest));
     _what = isElement ? "<" + name + "> " : "A text ";
     _what += what;
     _place = element.offset_debug();

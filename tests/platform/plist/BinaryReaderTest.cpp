@@ -118,8 +118,9 @@ TEST(BinaryReaderTest, DatesBeyondTheClockAreClampedAndNoTimeIsRefused) {
   EXPECT_EQ(PropertyList("error: A date of the binary property list is no time"), dateAfter2001(NAN));
 }
 
-TEST(BinaryReaderTest, TextsAreMadeUtf8) {
+TEST(BinaryReaderTest, TextsAreMadeSuchThatTheyCanBeWritten) {
   EXPECT_EQ(PropertyList("a\xEF\xBF\xBD"), valueOf("\x52\x61\xFF"));
+  EXPECT_EQ(PropertyList("a\xEF\xBF\xBD"), valueOf("\x52\x61\x01"));
   EXPECT_EQ(PropertyList("\xF0\x9F\x8E\xAC"), valueOf("\x62\xD8\x3C\xDF\xAC"));
   EXPECT_EQ(PropertyList("\xEF\xBF\xBDx"), valueOf("\x62\xD8\x3C\x00x"s));
   EXPECT_EQ(PropertyList("\xEF\xBF\xBD\xEF\xBF\xBD"), valueOf("\x62\xDF\xAC\xD8\x3C"));

@@ -202,6 +202,14 @@ TEST(XmlReaderTest, BytesThatAreNoUtf8AreReplaced) {
             valueOf("<dict><key>\x80</key><integer>1</integer><key>\x81</key><integer>2</integer></dict>"));
 }
 
+TEST(XmlReaderTest, CharactersThatXmlCannotHoldAreReplaced) {
+  const std::string mark = "\xEF\xBF\xBD";
+  EXPECT_EQ(PropertyList("a" + mark + "b"), valueOf("<string>a\x01\x62</string>"));
+  EXPECT_EQ(PropertyList("a" + mark + "b"), valueOf("<string>a&#x1F;b</string>"));
+  EXPECT_EQ(PropertyList(mark), valueOf("<string>\xEF\xBF\xBF</string>"));
+  EXPECT_EQ(PropertyList("\x7F\xC2\x80"), valueOf("<string>\x7F\xC2\x80</string>"));
+}
+
 TEST(XmlReaderTest, HalvesOfWideCharactersAreReplaced) {
   std::string bytes;
   for (const char c : std::string("<plist><string>&#xDC00;</string></plist>")) bytes += {c, '\0'};

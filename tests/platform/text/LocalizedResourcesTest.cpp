@@ -4,7 +4,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "quilt/platform/base/Utf8.h"
+#include "quilt/platform/plist/XmlText.h"
 #include "quilt/resources/EmbeddedFiles.h"
 #include "tests/support/Environment.h"
 
@@ -64,7 +64,7 @@ TEST(LocalizedResourcesTest, EveryTableHasEveryKeyOfTheEnglishOne) {
   for (const auto& file : resources::embeddedFiles()) {
     if (!file.path.starts_with("strings/")) continue;
     ++tables;
-    EXPECT_TRUE(isUtf8(textOf(file))) << file.path;
+    EXPECT_TRUE(isXmlText(textOf(file))) << file.path;
     const auto strings = parseStrings(textOf(file));
     EXPECT_EQ(english.size(), strings.size()) << file.path;
     for (const auto& [key, value] : english) {

@@ -22,6 +22,16 @@ using ::testing::Not;
 std::string json(const Dictionary& dictionary) { return ScriptJsonWriter().toJSON(dictionary); }
 std::string jsonOf(const PropertyList& value) { return json({{"v", value}}); }
 
+std::string withoutForeignBytes(std::string_view text) {
+  std::string out;
+  while (!text.empty()) {
+    const Utf8Character character = firstUtf8Character(text);
+    out += character.isValid ? text.substr(0, character.length) : kReplacementText;
+    text.remove_prefix(character.length);
+  }
+  return out;
+}
+
 /// The value as another reader sees it.
 nlohmann::json readBack(const PropertyList& value) { return nlohmann::json::parse(jsonOf(value)).at("v"); }
 
@@ -60,7 +70,7 @@ TEST(ScriptJsonWriterTest, EveryByteGivesTextThatCanBeRead) {
   for (int round = 0; round < 2000; ++round) {
     std::string bytes(20, '\0');
     for (char& c : bytes) c = static_cast<char>(static_cast<unsigned char>(random() & 0xFFU));
-    EXPECT_EQ(repairedUtf8(bytes), readBack(bytes).get<std::string>());
+    EXPECT_EQ(withoutForeignBytes(bytes), readBack(bytes).get<std::string>());
   }
 }
 
