@@ -2,6 +2,7 @@
 #include "quilt/platform/text/RandomUuidGenerator.h"
 
 #include <sys/random.h>
+#include <unistd.h>
 
 #include <array>
 #include <cstdint>
@@ -17,7 +18,10 @@ using Bytes = std::array<std::uint8_t, 16>;
 class Pool {
  public:
   const Bytes& next() {
-    if (_used == _uuids.size()) refill();
+    // A process made by fork must not go on with its parent's bytes.
+    const pid_t process = ::getpid();
+    if (process != _process || _used == _uuids.size()) refill();
+    _process = process;
     return _uuids[_used++];
   }
 
@@ -30,6 +34,7 @@ class Pool {
 
   std::array<Bytes, 16> _uuids{};
   std::size_t _used = _uuids.size();
+  pid_t _process = 0;
 };
 
 }  // namespace
