@@ -19,7 +19,7 @@ const Preview kAbsent{"Absent", [] { return std::make_shared<AbsentAudioPreview>
 class FDYAudioPreviewFailureContract : public support::ContractTest<FDYAudioPreview> {
  protected:
   Result<void> extract(const Path& from, const Path& to) const {
-    return service->extractAudioSamplesFromAssetURL(Url::fileUrl(from), Url::fileUrl(to));
+    return service->extractAudioSamplesFromAssetURL(Url::fileUrl(from), Url::fileUrl(to), [] { return true; });
   }
 };
 INSTANTIATE_TEST_SUITE_P(Implementations, FDYAudioPreviewFailureContract, ::testing::Values(kFfmpeg, kAbsent),

@@ -60,7 +60,8 @@ TEST(AbsentTest, Inspection) {
 TEST(AbsentTest, AudioSamples) {
   AbsentAudioPreview preview;
   const auto extract = [&] {
-    return errorOf(preview.extractAudioSamplesFromAssetURL(Url::fileUrl("/a.mp3"), Url::fileUrl("/a.asc")));
+    return errorOf(
+        preview.extractAudioSamplesFromAssetURL(Url::fileUrl("/a.mp3"), Url::fileUrl("/a.asc"), [] { return true; }));
   };
   expectHonest("Extraction of audio samples", "/a.mp3", {extract, extract});
 }
