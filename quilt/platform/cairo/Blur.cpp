@@ -31,9 +31,9 @@ std::vector<std::size_t> reachesFor(double deviation) {
   const double ideal = std::sqrt(12 * variance / kPasses + 1);
   const double lower = 2 * std::floor((ideal - 1) / 2) + 1;
   const double narrow = std::round((kPasses * (lower * lower + 4 * lower + 3) - 12 * variance) / (4 * lower + 4));
-  std::vector<std::size_t> reaches;
-  for (int pass = 0; pass < static_cast<int>(kPasses); ++pass)
-    reaches.push_back(static_cast<std::size_t>((lower - 1) / 2) + (pass < narrow ? 0 : 1));
+  std::vector<std::size_t> reaches(static_cast<std::size_t>(kPasses), static_cast<std::size_t>((lower - 1) / 2));
+  for (std::size_t pass = 0; pass < reaches.size(); ++pass)
+    if (static_cast<double>(pass) >= narrow) ++reaches[pass];
   return reaches;
 }
 

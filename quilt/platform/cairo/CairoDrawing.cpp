@@ -165,7 +165,9 @@ class CairoCanvas final : public Canvas {
   /// lies at its edge throws its whole shadow.
   void drawShadow(const Shadow& shadow, const std::function<void(cairo_t*)>& shape) {
     const int margin = static_cast<int>(std::ceil(shadow.blurRadius * 1.5));
-    const Surface mask = makeSurface(CAIRO_FORMAT_A8, _width + 2 * margin, _height + 2 * margin);
+    const int width = _width + 2 * margin;
+    const int height = _height + 2 * margin;
+    const Surface mask = makeSurface(CAIRO_FORMAT_A8, width, height);
     {
       const Context context(cairo_create(mask.get()));
       cairo_translate(context.get(), margin, margin);
@@ -174,7 +176,7 @@ class CairoCanvas final : public Canvas {
     cairo_surface_flush(mask.get());
     unsigned char* plane = cairo_image_surface_get_data(mask.get());
     if (!plane) return;
-    cairo::blur(plane, static_cast<std::size_t>(_width + 2 * margin), static_cast<std::size_t>(_height + 2 * margin),
+    cairo::blur(plane, static_cast<std::size_t>(width), static_cast<std::size_t>(height),
                 static_cast<std::size_t>(cairo_image_surface_get_stride(mask.get())), shadow.blurRadius / 2);
     cairo_surface_mark_dirty(mask.get());
     setColor(_context.get(), shadow.color);

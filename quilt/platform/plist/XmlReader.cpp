@@ -186,7 +186,7 @@ class Builder {
       }
       PropertyList item(false);
       if (!read(child, depth + 1, item)) return false;
-      entries.append(std::move(name), std::move(item));
+      entries.append(std::exchange(name, {}), std::move(item));
       key = {};
     }
     if (key) return fail(key, "has no value");
