@@ -43,7 +43,7 @@ class HostilePropertyListTest : public ::testing::Test {
     return readPlainly(scratch / "binary");
   }
 
-  const XmlPropertyLists lists;
+  const XmlPropertyLists lists{};
   const support::ScratchFolder scratch;
   const ScopedService<FileManager> files{&Services::files, std::make_shared<PosixFileManager>()};
 };

@@ -29,7 +29,7 @@ class TypeTableTest : public ::testing::Test {
     return table.preferredIdentifier(scratch / name).value_or("none");
   }
 
-  const TypeTable table;
+  const TypeTable table{};
   const support::ScratchFolder scratch;
   const ScopedService<FileManager> files{&Services::files, std::make_shared<PosixFileManager>()};
 };
