@@ -52,7 +52,7 @@ class Transcode {
       : _input(std::move(input)), _facts(std::move(facts)), _progress(progress) {}
 
   Result<void> run(OutputKind kind, PictureSize box, const std::filesystem::path& destination) {
-    Result<std::unique_ptr<MovieOutput>> output = MovieOutput::create(destination, kind, _progress);
+    Result<std::unique_ptr<MovieOutput>> output = MovieOutput::create(destination, kind, _facts.duration, _progress);
     if (!output) return output.error();
     if (kind == OutputKind::Movie) {
       if (Result<void> added = addVideo(box, **output); !added) return added;
@@ -60,7 +60,7 @@ class Transcode {
     if (Result<void> added = addAudio(**output); !added) return added;
     if (_chains.empty()) return Error{ErrorKind::Unsupported, "The file holds no sound.", _input.path()};
     describe(**output);
-    if (Result<void> chapters = (*output)->setChapters(_facts.chapters, _facts.duration); !chapters) return chapters;
+    if (Result<void> chapters = (*output)->setChapters(_facts.chapters); !chapters) return chapters;
     if (Result<void> begun = (*output)->begin(); !begun) return begun;
     if (Result<void> carried = carryPackets(); !carried) return carried;
     return (*output)->finish();
@@ -137,9 +137,9 @@ class Transcode {
   }
 
   void reach(double time) {
-    if (_facts.duration > 0) return _progress.reach(time / _facts.duration);
+    if (_facts.duration > 0) return _progress.reachInput(time / _facts.duration);
     const auto size = static_cast<double>(std::max<std::uint64_t>(1, _input.size()));
-    _progress.reach(static_cast<double>(avio_tell(_input.context()->pb)) / size);
+    _progress.reachInput(static_cast<double>(avio_tell(_input.context()->pb)) / size);
   }
 
   Input _input;

@@ -77,16 +77,17 @@ struct Reader {
 }  // namespace
 
 Result<std::unique_ptr<MovieOutput>> MovieOutput::create(const std::filesystem::path& destination, OutputKind kind,
-                                                         TranscodeProgress& progress) {
+                                                         double duration, TranscodeProgress& progress) {
   Result<TemporaryOutput> file = TemporaryOutput::create(destination);
   if (!file) return file.error();
-  std::unique_ptr<MovieOutput> output(new MovieOutput(*std::move(file), destination, progress));
+  std::unique_ptr<MovieOutput> output(new MovieOutput(*std::move(file), destination, duration, progress));
   if (const int code = output->open(kind); code < 0) return failure(code, destination);
   return output;
 }
 
-MovieOutput::MovieOutput(TemporaryOutput file, std::filesystem::path destination, TranscodeProgress& progress)
-    : _file(std::move(file)), _destination(std::move(destination)), _progress(progress) {}
+MovieOutput::MovieOutput(TemporaryOutput file, std::filesystem::path destination, double duration,
+                         TranscodeProgress& progress)
+    : _file(std::move(file)), _destination(std::move(destination)), _duration(duration), _progress(progress) {}
 
 MovieOutput::~MovieOutput() {
   if (_context == nullptr) return;
@@ -181,15 +182,15 @@ void MovieOutput::setTag(const char* name, const std::string& value) {
   av_dict_set(&_context->metadata, name, value.c_str(), 0);
 }
 
-Result<void> MovieOutput::setChapters(const std::vector<Chapter>& chapters, double duration) {
-  if (chapters.empty() || duration <= 0) return {};
+Result<void> MovieOutput::setChapters(const std::vector<Chapter>& chapters) {
+  if (chapters.empty() || _duration <= 0) return {};
   constexpr AVRational thousandths{1, 1000};
   const auto ticks = [](double time) { return std::llround(time * thousandths.den); };
   // Freed with the context.
   _context->chapters = static_cast<AVChapter**>(av_calloc(chapters.size(), sizeof(AVChapter*)));
   if (_context->chapters == nullptr) return failure(AVERROR(ENOMEM), _destination);
   for (std::size_t i = 0; i < chapters.size(); ++i) {
-    const double end = i + 1 < chapters.size() ? chapters[i + 1].start : duration;
+    const double end = i + 1 < chapters.size() ? chapters[i + 1].start : _duration;
     auto* chapter = static_cast<AVChapter*>(av_mallocz(sizeof(AVChapter)));
     if (chapter == nullptr) return failure(AVERROR(ENOMEM), _destination);
     chapter->id = static_cast<std::int64_t>(i);
@@ -211,6 +212,7 @@ Result<void> MovieOutput::write(AVPacket& packet, const AVStream& stream, AVRati
   av_packet_rescale_ts(&packet, timeBase, stream.time_base);
   packet.stream_index = stream.index;
   packet.pos = -1;
+  if (stream.index == 0 && _duration > 0) _progress.reachOutput(seconds(packet.dts, stream.time_base) / _duration);
   const int code = av_interleaved_write_frame(_context, &packet);
   if (code < 0 || _writeError || !_progress.goOn()) return errorOf(code);
   return {};

@@ -21,9 +21,10 @@ enum class OutputKind { Movie, Sound };
 /// it is a hidden file beside it, which goes when this object does.
 class MovieOutput {
  public:
-  /// `progress` must outlive it; once that is stopped every call fails.
+  /// `duration` in seconds, 0 when unknown, is what there will be. `progress` must outlive the object; once that is
+  /// stopped every call fails.
   static Result<std::unique_ptr<MovieOutput>> create(const std::filesystem::path& destination, OutputKind kind,
-                                                     TranscodeProgress& progress);
+                                                     double duration, TranscodeProgress& progress);
   ~MovieOutput();
   MovieOutput(const MovieOutput&) = delete;
   MovieOutput& operator=(const MovieOutput&) = delete;
@@ -33,8 +34,8 @@ class MovieOutput {
   /// The same for what an encoder makes.
   Result<AVStream*> addStream(const AVStream& source, const AVCodecContext& encoder);
   void setTag(const char* name, const std::string& value);
-  /// In order of time, each shorter than the whole of `duration` seconds.
-  Result<void> setChapters(const std::vector<Chapter>& chapters, double duration);
+  /// In order of time, none at or after the end.
+  Result<void> setChapters(const std::vector<Chapter>& chapters);
 
   Result<void> begin();
   /// Takes the packet's content; its times are ticks of `timeBase`. Packets of a stream come in decoding order.
@@ -43,7 +44,8 @@ class MovieOutput {
   Result<void> finish();
 
  private:
-  MovieOutput(TemporaryOutput file, std::filesystem::path destination, TranscodeProgress& progress);
+  MovieOutput(TemporaryOutput file, std::filesystem::path destination, double duration,
+              TranscodeProgress& progress);
   int open(OutputKind kind);
   [[nodiscard]] Error errorOf(int code) const;
 
@@ -54,6 +56,7 @@ class MovieOutput {
 
   TemporaryOutput _file;
   std::filesystem::path _destination;
+  double _duration;
   TranscodeProgress& _progress;
   std::int64_t _position = 0;
   std::int64_t _size = 0;

@@ -45,11 +45,15 @@ bool isCopyable(const VideoTraits& traits, PictureSize box) {
          traits.startsAfter <= kLatestCopiedStart;
 }
 
-// Whether the index says that packets at the start are for decoding only.
+// Whether the index says that packets are for decoding only. A few at the start of sound, for the decoder to settle,
+// are usual and go along.
 bool isCutByEdits(AVStream& stream) {
+  constexpr int usual = 4;
+  const int permitted = stream.codecpar->codec_type == AVMEDIA_TYPE_AUDIO ? usual : 0;
   const int count = avformat_index_get_entries_count(&stream);
   for (int i = 0; i < count; ++i) {
-    if ((avformat_index_get_entry(&stream, i)->flags & AVINDEX_DISCARD_FRAME) != 0) return true;
+    const bool isCut = (avformat_index_get_entry(&stream, i)->flags & AVINDEX_DISCARD_FRAME) != 0;
+    if (isCut && i >= permitted) return true;
   }
   return false;
 }

@@ -5,8 +5,12 @@
 
 namespace quilt::platform::ffmpeg {
 
-void TranscodeProgress::reach(double fraction) {
-  if (fraction > _fraction) _fraction = std::min(fraction, 1.0);
+void TranscodeProgress::reachInput(double fraction) {
+  if (fraction > _read) _read = std::min(fraction, 1.0);
+}
+
+void TranscodeProgress::reachOutput(double fraction) {
+  if (fraction > _written) _written = std::min(fraction, 1.0);
 }
 
 bool TranscodeProgress::goOn() {
@@ -14,7 +18,7 @@ bool TranscodeProgress::goOn() {
   if (_isStopped) return false;
   if (std::chrono::steady_clock::now() - _lastReport < 100ms) return true;
   constexpr double beforeTheEnd = 99.5;  // 100 is said once the file is in its place
-  report(static_cast<float>(_fraction * beforeTheEnd));
+  report(static_cast<float>((_read + _written) / 2 * beforeTheEnd));
   return !_isStopped;
 }
 

@@ -15,8 +15,10 @@ class TranscodeProgress {
   /// The block must outlive it; it may be empty.
   explicit TranscodeProgress(const TranscoderProgressBlock& block) : _block(block) {}
 
-  /// How much is done, 0 to 1. Less than before, and what is not a number, is ignored.
-  void reach(double fraction);
+  /// How much has been read and how much has been written, 0 to 1: encoders hold back a lot. Less than before, and what
+  /// is not a number, is ignored.
+  void reachInput(double fraction);
+  void reachOutput(double fraction);
 
   /// Reports when a report is due; false once the caller has asked to stop. To be called often, on the thread of the
   /// conversion.
@@ -35,7 +37,8 @@ class TranscodeProgress {
 
   const TranscoderProgressBlock& _block;
   std::chrono::steady_clock::time_point _lastReport{};
-  double _fraction = 0;
+  double _read = 0;
+  double _written = 0;
   bool _isStopped = false;
 };
 
