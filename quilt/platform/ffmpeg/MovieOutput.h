@@ -44,8 +44,7 @@ class MovieOutput {
   Result<void> finish();
 
  private:
-  MovieOutput(TemporaryOutput file, std::filesystem::path destination, double duration,
-              TranscodeProgress& progress);
+  MovieOutput(TemporaryOutput file, std::filesystem::path destination, double duration, TranscodeProgress& progress);
   int open(OutputKind kind);
   [[nodiscard]] Error errorOf(int code) const;
 

@@ -12,7 +12,8 @@ namespace quilt::platform::ffmpeg {
 
 namespace {
 
-constexpr double kLeap = 10;  // seconds; less may be a pause, or streams that are stored far apart
+constexpr double kLeap = 10;     // seconds; less may be a pause
+constexpr double kLeapBack = 1;  // seconds; packets of a stream are in order
 
 }  // namespace
 
@@ -20,7 +21,7 @@ SourceTimeline::SourceTimeline(double origin, bool leaps, double end)
     : _shift(-origin), _shiftBefore(-origin), _leaps(leaps), _end(end) {}
 
 bool SourceTimeline::isLeap(double time, double expected) const {
-  if (_leaps) return std::abs(time - expected) > kLeap;
+  if (_leaps) return time > expected + kLeap || time < expected - kLeapBack;
   const double latest = _end > 0 ? _end + kLeap : kMaximumDuration;
   return time > latest || time < expected - latest;
 }
@@ -29,9 +30,10 @@ double SourceTimeline::shiftFor(int stream, double time) {
   const auto found = _streams.find(stream);
   if (found == _streams.end()) return _shift;
   const double expected = found->second;
-  if (!isLeap(time + _shift, expected)) return _shift;
   // Streams do not leap at the same packet: some from before may follow.
-  if (!isLeap(time + _shiftBefore, expected)) return _shiftBefore;
+  const auto distance = [&](double shift) { return std::abs(time + shift - expected); };
+  const double nearer = distance(_shiftBefore) < distance(_shift) ? _shiftBefore : _shift;
+  if (!isLeap(time + nearer, expected)) return nearer;
   // What follows continues where the stream that reaches farthest ended.
   double end = expected;
   for (const auto& [index, other] : _streams) {
@@ -69,16 +71,18 @@ std::int64_t FrameClock::place(std::int64_t time) {
     _last = time == AV_NOPTS_VALUE ? 0 : std::max<std::int64_t>(time, 0);
     return 0;
   }
-  if (time == AV_NOPTS_VALUE || time <= _last) {  // without a time of its own it comes after the one before
-    constexpr std::int64_t mostDrift = 10;        // pictures; more means that there are too many of them
-    const std::int64_t next = _last + _usual;
-    if (time != AV_NOPTS_VALUE && next - time > mostDrift * _usual) return AV_NOPTS_VALUE;
-    time = next;
+  if (time == AV_NOPTS_VALUE) {
+    time = _last + _usual;
+  } else if (time <= _last) {
+    // Soon after the one before, so that those which follow can have their own times again.
+    constexpr std::int64_t mostLate = 10;  // pictures; more means that there are too many of them
+    if (_last - time > mostLate * _usual) return AV_NOPTS_VALUE;
+    time = _last + std::max<std::int64_t>(1, _usual / 2);
   }
   // Times may be rounded to thousandths of a second: a little early is in time, but lets nobody else come earlier.
   const double slack = _shortest / 4;
   if (static_cast<double>(time) + slack < _due) return AV_NOPTS_VALUE;
-  _due = std::max(_due + _shortest, static_cast<double>(time));
+  _due = std::max(_due, static_cast<double>(time)) + _shortest;
   _last = time;
   return time;
 }
