@@ -32,7 +32,7 @@ Result<CodecContext> openEncoder(const AudioPlan& plan, const std::filesystem::p
   encoder->profile = FF_PROFILE_AAC_LOW;
   encoder->flags |= AV_CODEC_FLAG_GLOBAL_HEADER;
   layOut(encoder->ch_layout, plan.channels);
-  if (const int code = avcodec_open2(encoder.get(), codec, nullptr); code < 0) return failure(code, file);
+  if (const int code = avcodec_open2(encoder.get(), codec, nullptr); code < 0) return conversionFailure(code, file);
   return encoder;
 }
 
@@ -91,7 +91,7 @@ class AudioEncodeChain final : public StreamChain {
       if (!made) return made.error();
       _conversion.emplace(*std::move(made));
     }
-    if (const int code = _conversion->push(&sound); code < 0) return failure(code, _file);
+    if (const int code = _conversion->push(&sound); code < 0) return conversionFailure(code, _file);
     return pullConverted();
   }
 
@@ -143,7 +143,7 @@ class AudioEncodeChain final : public StreamChain {
       silence->sample_rate = _plan.sampleRate;
       silence->nb_samples = static_cast<int>(piece);
       layOut(silence->ch_layout, _plan.channels);
-      if (const int code = av_frame_get_buffer(silence.get(), 0); code < 0) return failure(code, _file);
+      if (const int code = av_frame_get_buffer(silence.get(), 0); code < 0) return conversionFailure(code, _file);
       av_samples_set_silence(silence->extended_data, 0, silence->nb_samples, _plan.channels, _encoder->sample_fmt);
       silence->pts = _evenedUntil;
       if (Result<void> evened = even(*silence); !evened) return evened;
@@ -161,7 +161,7 @@ class AudioEncodeChain final : public StreamChain {
       _evening.emplace(*std::move(made));
       _evening->setFrameSize(_encoder->frame_size);
     }
-    if (const int code = _evening->push(&sound); code < 0) return failure(code, _file);
+    if (const int code = _evening->push(&sound); code < 0) return conversionFailure(code, _file);
     return pullEvened();
   }
 
@@ -178,14 +178,14 @@ class AudioEncodeChain final : public StreamChain {
 
   Result<void> encode(const AVFrame* sound) {
     if (const int code = avcodec_send_frame(_encoder.get(), sound); code < 0 && code != AVERROR_EOF) {
-      return failure(code, _file);
+      return conversionFailure(code, _file);
     }
     int code = 0;
     while ((code = avcodec_receive_packet(_encoder.get(), _packet.get())) >= 0) {
       _hasDelivered = true;
       if (Result<void> written = _output.write(*_packet, _stream, _encoder->time_base); !written) return written;
     }
-    return code == AVERROR(EAGAIN) || code == AVERROR_EOF ? Result<void>() : failure(code, _file);
+    return code == AVERROR(EAGAIN) || code == AVERROR_EOF ? Result<void>() : conversionFailure(code, _file);
   }
 
   std::filesystem::path _file;

@@ -75,8 +75,9 @@ class Transcode {
         traits.isInterlaced || _facts.fields == Fields::TopFirst || _facts.fields == Fields::BottomFirst;
     if (traits.stored.width <= 0 || traits.stored.height <= 0) return failure(AVERROR_INVALIDDATA, _input.path());
     const VideoPlan plan = planVideo(traits, box);
+    const Company company = mainAudio(_input) == nullptr ? Company::Alone : Company::WithSound;
     return add(*stream, plan.isCopied ? makeCopyChain(*stream, output)
-                                      : makeVideoEncodeChain(_input, *stream, plan, _facts.fields, output));
+                                      : makeVideoEncodeChain(_input, *stream, plan, _facts.fields, company, output));
   }
 
   Result<void> addAudio(MovieOutput& output) {

@@ -68,7 +68,7 @@ Result<FilterChain> FilterChain::create(const AVFrame& frame, AVRational timeBas
   if (chain._source == nullptr || chain._sink == nullptr) return failure(AVERROR(ENOMEM), file);
   code = setUpSource(*chain._source, frame, timeBase);
   if (code >= 0) code = avfilter_init_str(chain._sink, nullptr);
-  if (code < 0) return failure(code, file);
+  if (code < 0) return conversionFailure(code, file);
 
   End outputs("in", chain._source);
   End inputs("out", chain._sink);
@@ -76,7 +76,7 @@ Result<FilterChain> FilterChain::create(const AVFrame& frame, AVRational timeBas
   const std::string row = filters.empty() ? (sound ? "anull" : "null") : filters;
   code = avfilter_graph_parse_ptr(graph, row.c_str(), &inputs.list, &outputs.list, nullptr);
   if (code >= 0) code = avfilter_graph_config(graph, nullptr);
-  if (code < 0) return failure(code, file);
+  if (code < 0) return conversionFailure(code, file);
   return chain;
 }
 

@@ -122,7 +122,9 @@ class Chain {
   std::ostringstream _text;
 };
 
-void deinterlace(Chain& chain, Fields fields) {
+void deinterlace(Chain& chain, const AVFrame& frame, Fields fields) {
+  constexpr int smallest = 16;  // the filter's limit, for any format
+  if (isRgb(frame) || frame.width < smallest || frame.height < smallest) return;
   switch (fields) {
     case Fields::None:
       break;
@@ -158,7 +160,8 @@ void toneMap(Chain& chain, const AVFrame& frame, const Colours& colours, Picture
             ":t=linear:p=709:m=gbr:r=full:npl=", ToneMap::kReferenceWhite);
   chain.add("format=gbrpf32le");
   chain.add("tonemap=tonemap=mobius:param=0.5:desat=0:peak=", ToneMap::peakOf(frame) / ToneMap::kReferenceWhite);
-  chain.add("zscale=min=gbr:pin=709:tin=linear:rin=full:", kOutputColours);
+  // Screens show BT.709 with about this curve; the one that the standard gives for cameras would be too bright below.
+  chain.add("zscale=min=gbr:pin=709:tin=linear:rin=full:m=709:p=709:t=iec61966-2-1:r=limited:dither=ordered");
 }
 
 // The library's own scaler, for builds without the better one. It knows no primaries.
@@ -184,7 +187,7 @@ void turn(Chain& chain, const Orientation& orientation) {
 
 std::string pictureFilters(const AVFrame& frame, PictureSize size, const Orientation& orientation, Fields fields) {
   Chain chain;
-  deinterlace(chain, fields);
+  deinterlace(chain, frame, fields);
   const PictureSize lying = turned(size, orientation);
   const Colours colours = coloursOf(frame);
   PictureSize stored{frame.width, frame.height};
@@ -197,6 +200,7 @@ std::string pictureFilters(const AVFrame& frame, PictureSize size, const Orienta
   if (stored.width != frame.width || stored.height != frame.height) {
     chain.add("crop=w=", stored.width, ":h=", stored.height, ":x=0:y=0");
   }
+  if (isRgb(frame)) chain.add("format=gbrp|gbrap|gbrp10le|gbrp12le|gbrp14le|gbrp16le|gbrap16le");
   const bool isResized = stored.width != lying.width || stored.height != lying.height;
   if (isHighDynamicRange(colours.transfer)) {
     toneMap(chain, frame, colours, lying);

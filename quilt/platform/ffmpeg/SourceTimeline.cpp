@@ -56,7 +56,7 @@ void SourceTimeline::place(AVPacket& packet, AVRational base) {
   if (packet.dts != AV_NOPTS_VALUE) packet.dts += ticks;
 }
 
-FrameClock::FrameClock(AVRational base, AVRational usualRate) {
+FrameClock::FrameClock(AVRational base, AVRational usualRate, Start start) : _start(start) {
   const double second = static_cast<double>(base.den) / base.num;
   constexpr double usual = 25;  // pictures a second
   const double rate = usualRate.num > 0 && usualRate.den > 0 ? std::clamp(av_q2d(usualRate), 1.0, 60.0) : usual;
@@ -67,10 +67,13 @@ FrameClock::FrameClock(AVRational base, AVRational usualRate) {
 std::int64_t FrameClock::place(std::int64_t time) {
   if (!_hasBegun) {
     _hasBegun = true;
-    _due = static_cast<double>(std::max<std::int64_t>(time, 0)) + _shortest;
-    _last = time == AV_NOPTS_VALUE ? 0 : std::max<std::int64_t>(time, 0);
+    const std::int64_t late = time == AV_NOPTS_VALUE ? 0 : std::max<std::int64_t>(time, 0);
+    if (_start == Start::Moved) _shift = -late;
+    _last = late + _shift;
+    _due = static_cast<double>(_last) + _shortest;
     return 0;
   }
+  if (time != AV_NOPTS_VALUE) time += _shift;
   if (time == AV_NOPTS_VALUE) {
     time = _last + _usual;
   } else if (time <= _last) {

@@ -34,9 +34,14 @@ class SourceTimeline {
 /// second. Times are ticks of `base`.
 class FrameClock {
  public:
-  FrameClock(AVRational base, AVRational usualRate);
+  /// What happens when the first picture comes late.
+  enum class Start {
+    Lengthened,  ///< it is shown from zero on; there is sound beside it
+    Moved,       ///< all come as much earlier
+  };
+  FrameClock(AVRational base, AVRational usualRate, Start start);
 
-  /// The picture's time, or AV_NOPTS_VALUE when it is to be dropped. The first starts at zero, however late it comes.
+  /// The picture's time, or AV_NOPTS_VALUE when it is to be dropped. The first starts at zero.
   std::int64_t place(std::int64_t time);
   /// How long a picture lasts that nothing tells of.
   [[nodiscard]] std::int64_t usualDuration() const { return _usual; }
@@ -45,6 +50,8 @@ class FrameClock {
   std::int64_t _usual;
   double _shortest;  // ticks between two pictures at the highest rate
   double _due = 0;   // when the next picture may come
+  Start _start;
+  std::int64_t _shift = 0;
   bool _hasBegun = false;
   std::int64_t _last = 0;
 };

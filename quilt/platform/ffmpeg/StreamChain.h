@@ -29,8 +29,9 @@ Result<std::unique_ptr<StreamChain>> makeCopyChain(const AVStream& source, Movie
 
 /// H.264 High with the plan's size; `fields` as found out before.
 enum class Fields;
+enum class Company { Alone, WithSound };
 Result<std::unique_ptr<StreamChain>> makeVideoEncodeChain(const Input& input, AVStream& source, const VideoPlan& plan,
-                                                          Fields fields, MovieOutput& output);
+                                                          Fields fields, Company company, MovieOutput& output);
 
 /// AAC-LC, without gaps: sound that starts late or pauses is filled with silence.
 Result<std::unique_ptr<StreamChain>> makeAudioEncodeChain(const Input& input, const AVStream& source,

@@ -48,14 +48,15 @@ Result<CodecContext> openEncoder(const VideoPlan& plan, AVRational rate, const s
   options.set("preset", kPreset);
   options.set("crf", kQuality);
   options.set("profile", "high");
-  if (const int code = avcodec_open2(encoder.get(), codec, options.address()); code < 0) return failure(code, file);
+  if (const int code = avcodec_open2(encoder.get(), codec, options.address()); code < 0)
+    return conversionFailure(code, file);
   return encoder;
 }
 
 class VideoEncodeChain final : public StreamChain {
  public:
-  VideoEncodeChain(const Input& input, AVStream& source, const VideoPlan& plan, Fields fields, CodecContext decoder,
-                   CodecContext encoder, MovieOutput& output, const AVStream& stream)
+  VideoEncodeChain(const Input& input, AVStream& source, const VideoPlan& plan, Fields fields, Company company,
+                   CodecContext decoder, CodecContext encoder, MovieOutput& output, const AVStream& stream)
       : _file(input.path()),
         _source(source),
         _plan(plan),
@@ -63,7 +64,8 @@ class VideoEncodeChain final : public StreamChain {
         _fields(fields),
         _decoder(std::move(decoder)),
         _encoder(std::move(encoder)),
-        _clock(plan.timeBase, _encoder->framerate),
+        _clock(plan.timeBase, _encoder->framerate,
+               company == Company::Alone ? FrameClock::Start::Moved : FrameClock::Start::Lengthened),
         _output(output),
         _stream(stream) {}
 
@@ -110,7 +112,7 @@ class VideoEncodeChain final : public StreamChain {
       if (!made) return made.error();
       _filters.emplace(*std::move(made));
     }
-    if (const int code = _filters->push(&picture); code < 0) return failure(code, _file);
+    if (const int code = _filters->push(&picture); code < 0) return conversionFailure(code, _file);
     return pullPictures();
   }
 
@@ -143,7 +145,7 @@ class VideoEncodeChain final : public StreamChain {
       _lastTime = picture->pts;
     }
     if (const int code = avcodec_send_frame(_encoder.get(), picture); code < 0 && code != AVERROR_EOF) {
-      return failure(code, _file);
+      return conversionFailure(code, _file);
     }
     int code = 0;
     while ((code = avcodec_receive_packet(_encoder.get(), _packet.get())) >= 0) {
@@ -152,7 +154,7 @@ class VideoEncodeChain final : public StreamChain {
       _hasDelivered = true;
       if (Result<void> written = _output.write(*_packet, _stream, _encoder->time_base); !written) return written;
     }
-    return code == AVERROR(EAGAIN) || code == AVERROR_EOF ? Result<void>() : failure(code, _file);
+    return code == AVERROR(EAGAIN) || code == AVERROR_EOF ? Result<void>() : conversionFailure(code, _file);
   }
 
   std::filesystem::path _file;
@@ -177,7 +179,7 @@ class VideoEncodeChain final : public StreamChain {
 }  // namespace
 
 Result<std::unique_ptr<StreamChain>> makeVideoEncodeChain(const Input& input, AVStream& source, const VideoPlan& plan,
-                                                          Fields fields, MovieOutput& output) {
+                                                          Fields fields, Company company, MovieOutput& output) {
   const std::filesystem::path& file = input.path();
   // Better to be told now than at the first picture.
   if (!hasFiltersFor(source.codecpar->color_trc, source.codecpar->color_primaries)) {
@@ -190,7 +192,7 @@ Result<std::unique_ptr<StreamChain>> makeVideoEncodeChain(const Input& input, AV
   Result<AVStream*> stream = output.addStream(source, **encoder);
   if (!stream) return stream.error();
   return std::unique_ptr<StreamChain>(std::make_unique<VideoEncodeChain>(
-      input, source, plan, fields, *std::move(decoder), *std::move(encoder), output, **stream));
+      input, source, plan, fields, company, *std::move(decoder), *std::move(encoder), output, **stream));
 }
 
 }  // namespace quilt::platform::ffmpeg

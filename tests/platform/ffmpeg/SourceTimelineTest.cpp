@@ -91,7 +91,7 @@ class FrameClockTest : public ::testing::Test {
     for (int i = 0; i < count; ++i) times.push_back(static_cast<std::int64_t>(i * step));
     return times;
   }
-  FrameClock _clock{kThousandths, {25, 1}};
+  FrameClock _clock{kThousandths, {25, 1}, FrameClock::Start::Lengthened};
 };
 
 TEST_F(FrameClockTest, TimesThatRiseAreKept) {
@@ -101,6 +101,8 @@ TEST_F(FrameClockTest, TimesThatRiseAreKept) {
 
 TEST_F(FrameClockTest, TheFirstPictureIsShownFromTheStart) {
   EXPECT_THAT(places(_clock, {500, 540, 580}), ElementsAre(0, 540, 580));
+  const FrameClock alone(kThousandths, {25, 1}, FrameClock::Start::Moved);
+  EXPECT_THAT(places(alone, {500, 540, 580}), ElementsAre(0, 40, 80));
 }
 
 TEST_F(FrameClockTest, APictureWithoutATimeFollowsTheOneBefore) {
