@@ -125,15 +125,15 @@ class Transcode {
       if (!_progress.goOn()) return TranscodeProgress::stopped(_input.path());
     }
     if (code == AVERROR_EXIT || code == AVERROR(EIO)) return failure(code, _input.path());
-    bool hasDelivered = false;
     for (auto& [index, chain] : _chains) {  // anything else ends the file where it breaks off
       if (Result<void> finished = chain->finish(); !finished) return finished;
-      hasDelivered = hasDelivered || chain->hasDelivered();
+      if (chain->hasDelivered()) continue;
+      const bool isVideo = _input.context()->streams[index]->codecpar->codec_type == AVMEDIA_TYPE_VIDEO;
+      return Error{ErrorKind::Damaged,
+                   isVideo ? "No picture of the file can be decoded." : "No sound of the file can be decoded.",
+                   _input.path()};
     }
     if (_progress.isStopped()) return TranscodeProgress::stopped(_input.path());
-    if (!hasDelivered) {
-      return Error{ErrorKind::Damaged, "No picture and no sound of the file can be decoded.", _input.path()};
-    }
     return {};
   }
 

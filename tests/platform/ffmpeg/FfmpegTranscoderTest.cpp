@@ -4,11 +4,13 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <sys/resource.h>
+
+#include <algorithm>
 #include <array>
 #include <chrono>
 #include <cmath>
-#include <fstream>
-#include <set>
+#include <csignal>
 
 #include "tests/support/MediaFixtures.h"
 #include "tests/support/MediaJudge.h"
@@ -541,6 +543,411 @@ TEST_F(FfmpegTranscoderTest, RecordingsJoinedAnywhereRunOn) {
   const std::vector<double> times = pictureTimes(made);
   EXPECT_NEAR(static_cast<double>(times.size()), 90, 3);
   for (std::size_t i = 1; i < times.size(); ++i) EXPECT_LT(times[i] - times[i - 1], 0.3) << i;
+}
+
+// Interlaced video
+
+class InterlacedVideo : public FfmpegTranscoderTest {
+ protected:
+  // A white bar that moves fast; `fields` makes fields of its pictures, or does not.
+  static MediaSpec movingBar(const std::string& fields) {
+    MediaSpec spec = clip(0.8);
+    spec.extension = "mkv";
+    spec.videoCodec = "mpeg2video";
+    spec.width = 320;
+    spec.height = 480;
+    spec.frameRate = 50;
+    spec.picture = "color=c=black";
+    spec.pictureFilter = "format=yuv420p,geq=lum='16+219*between(mod(X-6*N,320),0,40)':cb=128:cr=128" + fields;
+    spec.options = {"-q:v", "1"};
+    return spec;
+  }
+  static MediaSpec flagged(MediaSpec spec) {
+    spec.options.insert(spec.options.end(), {"-flags", "+ildct+ilme"});
+    return spec;
+  }
+  static constexpr const char* kTopFirst = ",tinterlace=mode=interleave_top";
+  static constexpr const char* kBottomFirst = ",tinterlace=mode=interleave_bottom";
+
+  // How much neighbouring rows differ though rows two apart do not, on average over a picture: large where two moments
+  // are woven into one.
+  static double combing(const fs::path& file, int index = 8) {
+    const JudgedPicture picture = support::brightnessOf(file, index);
+    double sum = 0;
+    for (int y = 1; y + 1 < picture.height; ++y) {
+      for (int x = 0; x < picture.width; ++x) {
+        const auto value = [&](int row) {
+          return static_cast<int>(
+              picture.values[static_cast<std::size_t>(row) * static_cast<std::size_t>(picture.width) +
+                             static_cast<std::size_t>(x)]);
+        };
+        const int above = value(y) - value(y - 1);
+        const int below = value(y) - value(y + 1);
+        if (above * below > 0) sum += std::min(std::abs(above), std::abs(below));
+      }
+    }
+    return sum / (picture.width * (picture.height - 2));
+  }
+  static constexpr double kNone = 0.7;
+};
+
+TEST_F(InterlacedVideo, IsDeinterlacedInItsOrder) {
+  for (const char* order : {kTopFirst, kBottomFirst}) {
+    const fs::path source = makeMedia(flagged(movingBar(order)));
+    EXPECT_GT(combing(source), 3) << "as stored";
+    const fs::path file = hd(source);
+    EXPECT_LT(combing(file), kNone);
+    EXPECT_EQ(judge(file).video().frames, 20);
+    EXPECT_EQ(judge(file).video().fieldOrder, "progressive");
+  }
+}
+
+TEST_F(InterlacedVideo, IsFoundWhereNoFlagTells) {
+  for (const char* order : {kTopFirst, kBottomFirst}) {
+    MediaSpec spec = movingBar(std::string(order) + ",setfield=prog");
+    spec.videoCodec = "libx264";
+    spec.options = {"-crf", "10"};
+    const fs::path source = makeMedia(spec);
+    EXPECT_GT(combing(source), 3);
+    EXPECT_LT(combing(hd(source)), kNone) << order;
+  }
+}
+
+TEST_F(InterlacedVideo, ProgressiveVideoIsUntouchedEvenWhenFlagged) {
+  // Every second row is grey: deinterlacing would blur what moves before it.
+  MediaSpec spec = movingBar(",geq=lum='if(mod(Y,2),lum(X,Y),16+lum(X,Y)/2)':cb=128:cr=128");
+  const fs::path plain = makeMedia(spec);
+  const fs::path marked = makeMedia(flagged(spec));
+  EXPECT_GT(support::similarity(hd(plain), plain), 0.97);
+  EXPECT_GT(support::similarity(hd(marked), marked), 0.97);
+}
+
+TEST_F(InterlacedVideo, TelecineDoesNotBecomeCombing) {
+  MediaSpec spec = movingBar(",telecine=pattern=23");
+  spec.frameRate = 24;
+  spec.duration = 1;
+  const fs::path source = makeMedia(flagged(spec));
+  const fs::path file = hd(source);
+  double stored = 0;
+  double most = 0;
+  for (int i = 4; i < 14; ++i) {
+    stored = std::max(stored, combing(source, i));
+    most = std::max(most, combing(file, i));
+  }
+  EXPECT_GT(stored, 3);
+  EXPECT_LT(most, kNone);
+}
+
+// Sound
+
+class ConvertedSound : public FfmpegTranscoderTest {
+ protected:
+  // Sound of several channels, each 1 s; channel i is `expressions[i]`.
+  static fs::path channels(const std::vector<std::string>& expressions, const std::string& layout) {
+    std::string all;
+    for (const std::string& expression : expressions) all += (all.empty() ? "" : "|") + expression;
+    return support::runFfmpeg(
+        {"-f", "lavfi", "-i", "aevalsrc=" + all + ":d=1:s=48000" + (layout.empty() ? "" : ":c=" + layout), "-c:a",
+         "pcm_f32le"},
+        "wav");
+  }
+  static constexpr const char* kTone = "0.5*sin(2*PI*440*t)";
+  static constexpr double kToneLoudness = 0.3536;
+
+  // How loud left and right come out.
+  std::array<double, 2> sides(const fs::path& source) {
+    const fs::path file = audio(source);
+    EXPECT_EQ(judge(file).audio().channels, 2);
+    const std::vector<float> sound = support::soundOf(file);
+    return {support::loudness(sound, 2, 0, 48000, 0.2, 0.8), support::loudness(sound, 2, 1, 48000, 0.2, 0.8)};
+  }
+  // Of 5.1 with a tone in one channel.
+  std::array<double, 2> withToneIn(std::size_t channel) {
+    std::vector<std::string> expressions(6, "0");
+    expressions[channel] = kTone;
+    return sides(channels(expressions, "5.1"));
+  }
+  static void expectLoudness(const std::array<double, 2>& actual, double left, double right) {
+    EXPECT_NEAR(actual[0], left * kToneLoudness, 0.01);
+    EXPECT_NEAR(actual[1], right * kToneLoudness, 0.01);
+  }
+};
+
+TEST_F(ConvertedSound, ManyChannelsAreMixedDown) {
+  expectLoudness(withToneIn(0), 1, 0);
+  expectLoudness(withToneIn(1), 0, 1);
+  expectLoudness(withToneIn(2), 0.707, 0.707);
+  expectLoudness(withToneIn(3), 0, 0);
+  expectLoudness(withToneIn(4), 0.707, 0);
+  expectLoudness(withToneIn(5), 0, 0.707);
+}
+
+TEST_F(ConvertedSound, MixingDownDoesNotClip) {
+  const std::string loud = "0.95*sin(2*PI*440*t)";
+  const fs::path file = audio(channels(std::vector<std::string>(6, loud), "5.1"));
+  const std::vector<float> sound = support::soundOf(file);
+  double most = 0;
+  for (std::size_t i = 9600; i < sound.size() - 9600; ++i)
+    most = std::max(most, std::abs(static_cast<double>(sound[i])));
+  EXPECT_LT(most, 1.04);
+  EXPECT_GT(support::loudness(sound, 2, 0, 48000, 0.2, 0.8), 0.6) << "turned down, not cut off";
+}
+
+TEST_F(ConvertedSound, UnknownChannelsCountAsUsual) {
+  const std::vector<std::string> fronts{kTone, "0", "0", "0", "0", "0"};
+  const fs::path unknown = support::runFfmpeg(
+      {"-f", "s16le", "-ar", "48000", "-ac", "6", "-i",
+       support::makeWav(std::vector<std::int16_t>(48000 * 6, 8000), 6).string(), "-c:a", "pcm_s16le"},
+      "caf");
+  EXPECT_EQ(judge(audio(unknown)).audio().channels, 2);
+  std::vector<std::string> nine(9, "0.1*sin(2*PI*440*t)");
+  const fs::path many = support::runFfmpeg(
+      {"-f", "lavfi", "-i", "aevalsrc=" + std::string("0.1|0.1|0.1|0.1|0.1|0.1|0.1|0.1|0.1:d=0.5:s=48000"), "-c:a",
+       "pcm_s16le"},
+      "wav");
+  EXPECT_EQ(judge(audio(many)).audio().channels, 2);
+}
+
+TEST_F(ConvertedSound, RatesOfDiscsAndVideoAreKeptAndOthersAreNot) {
+  for (const auto& [rate, expected] :
+       {std::pair{44100, 44100}, {48000, 48000}, {22050, 44100}, {96000, 48000}, {8000, 48000}}) {
+    MediaSpec spec = support::aiffSound();
+    spec.sampleRate = rate;
+    spec.duration = 1;
+    const fs::path file = audio(spec);
+    EXPECT_EQ(judge(file).audio().sampleRate, expected);
+    EXPECT_EQ(judge(file).audio().channels, 1) << "one channel stays one";
+    const std::vector<float> sound = support::soundOf(file);
+    EXPECT_NEAR(static_cast<double>(sound.size()) / expected, 1, 0.002);
+    EXPECT_NEAR(support::loudness(sound, 1, 0, expected, 0.2, 0.8), 0.0884, 0.01);
+  }
+}
+
+TEST_F(ConvertedSound, EncoderDelayIsNoDelay) {
+  MediaSpec spec = support::mp3Sound();
+  spec.sound = "aevalsrc='0.8*sin(2*PI*1000*t)*gte(t,0.5)'";
+  spec.duration = 1;
+  const std::vector<float> sound = support::soundOf(audio(spec));
+  const auto first = std::ranges::find_if(sound, [](float value) { return std::abs(value) > 0.3F; }) - sound.begin();
+  EXPECT_NEAR(static_cast<double>(first) / 44100, 0.5, 0.005);
+}
+
+TEST_F(ConvertedSound, SoundThatChangesInTheMiddleRunsOn) {
+  MediaSpec spec = support::mp3Sound();
+  spec.duration = 1;
+  spec.options = {"-write_xing", "0", "-id3v2_version", "0"};
+  const std::string mono = support::readBytes(makeMedia(spec));
+  spec.channels = 2;
+  spec.sampleRate = 48000;
+  const std::string stereo = support::readBytes(makeMedia(spec));
+  const fs::path both = support::freshPath("mp3");
+  support::writeBytes(both, mono + stereo);
+  const fs::path file = audio(both);
+  EXPECT_NEAR(judge(file).duration, 2, 0.15);
+}
+
+// What goes along
+
+TEST_F(FfmpegTranscoderTest, CoversStayCoversAndSoundStaysSound) {
+  MediaSpec spec = support::mp3Sound();
+  spec.coverArt = true;
+  EXPECT_EQ(judge(audio(spec)).count("video"), 0);
+  EXPECT_EQ(judge(hd(spec)).count("video"), 0);
+  MediaSpec movie = clip();
+  movie.extension = "mp4";
+  movie.coverArt = true;
+  const fs::path file = hd(movie);
+  EXPECT_EQ(judge(file).count("video"), 1);
+  expectSize(file, 160, 120);
+}
+
+TEST_F(FfmpegTranscoderTest, TheDefaultStreamIsTakenThenTheLargest) {
+  const fs::path small = makeMedia({.duration = 0.2, .width = 64, .height = 48, .sound = ""});
+  const fs::path large = makeMedia({.duration = 0.2, .width = 128, .height = 96, .sound = ""});
+  const auto both = [&](const std::string& chosen) {
+    return support::runFfmpeg({"-i", small.string(), "-i", large.string(), "-map", "0:v", "-map", "1:v", "-c", "copy",
+                               "-disposition:v:0", chosen == "small" ? "default" : "0", "-disposition:v:1", "0"},
+                              "mkv");
+  };
+  expectSize(hd(both("small")), 64, 48);
+  expectSize(hd(both("none")), 128, 96);
+}
+
+TEST_F(FfmpegTranscoderTest, ChaptersGoAlong) {
+  MediaSpec spec = clip(2);
+  spec.chapters = {{"Überfahrt", 0}, {"第二章", 0.5}, {"Beyond the end", 5}};
+  const std::vector<support::JudgedChapter> chapters = judge(hd(spec)).chapters;
+  ASSERT_THAT(chapters, SizeIs(2));
+  EXPECT_EQ(chapters[0].title, "Überfahrt");
+  EXPECT_EQ(chapters[0].start, 0);
+  EXPECT_NEAR(chapters[0].end, 0.5, 0.002);
+  EXPECT_EQ(chapters[1].title, "第二章");
+  EXPECT_NEAR(chapters[1].start, 0.5, 0.002);
+  EXPECT_NEAR(chapters[1].end, 2, 0.01);
+}
+
+TEST_F(FfmpegTranscoderTest, TagsGoAlongButNotThePlaceOfTheRecording) {
+  MediaSpec spec = clip();
+  spec.sound = "sine=frequency=440";
+  spec.audioCodec = "pcm_s16le";
+  spec.tags = {{"title", "Größe"}, {"artist", "Somebody"},
+               {"date", "2021"},   {"location", "+52.5200+013.4050/"},
+               {"make", "Camera"}, {"com.apple.quicktime.location.ISO6709", "+52.5200+013.4050/"}};
+  spec.options.insert(spec.options.end(), {"-metadata:s:a:0", "language=deu", "-movflags", "use_metadata_tags"});
+  const fs::path file = hd(spec);
+  const JudgedFile judged = judge(file);
+  EXPECT_EQ(judged.tags.at("title"), "Größe");
+  EXPECT_EQ(judged.tags.at("artist"), "Somebody");
+  EXPECT_EQ(judged.tags.at("date"), "2021");
+  EXPECT_EQ(judged.audio().language, "deu");
+  EXPECT_TRUE(judged.video().isDefault);
+  EXPECT_EQ(support::readBytes(file).find("+52.52"), std::string::npos);
+  EXPECT_EQ(support::readBytes(file).find("Camera"), std::string::npos);
+}
+
+TEST_F(FfmpegTranscoderTest, SubtitlesAndDataDoNoHarm) {
+  const fs::path text = support::freshPath("srt");
+  support::writeBytes(text, "1\n00:00:00,100 --> 00:00:00,300\nHello\n");
+  const fs::path source = support::runFfmpeg({"-i", makeMedia(clip(1)).string(), "-i", text.string(), "-map", "0",
+                                              "-map", "1", "-c:v", "copy", "-c:s", "mov_text"},
+                                             "mov");
+  EXPECT_EQ(judge(hd(source)).count("video"), 1);
+}
+
+// Faults
+
+TEST_F(FfmpegTranscoderTest, ABrokenOffFileGivesWhatThereIs) {
+  MediaSpec spec = clip(2);
+  spec.extension = "mkv";
+  const fs::path cut = support::copyOf(makeMedia(spec));
+  fs::resize_file(cut, fs::file_size(cut) * 6 / 10);
+  const JudgedFile judged = judge(hd(cut));
+  EXPECT_GT(judged.video().frames, 20);
+  EXPECT_LT(judged.video().frames, 45);
+}
+
+TEST_F(FfmpegTranscoderTest, DamagedPacketsAreLeftOut) {
+  const fs::path damaged = support::copyOf(makeMedia(clip(2)));
+  std::string bytes = support::readBytes(damaged);
+  const std::size_t media = bytes.find("mdat");
+  for (std::size_t i = media + bytes.size() / 4; i < media + bytes.size() / 4 + 3000 && i < bytes.size(); ++i)
+    bytes[i] = '\xaa';
+  support::writeBytes(damaged, bytes);
+  EXPECT_NEAR(judge(hd(damaged)).video().duration, 2, 0.3);
+}
+
+TEST_F(FfmpegTranscoderTest, AFileThatDoesNotDecodeFailsCleanly) {
+  const fs::path missing = _folder / "missing.mov";
+  EXPECT_EQ(failureOf(missing).kind, ErrorKind::NotFound);
+  const fs::path text = support::freshPath("mov");
+  support::writeBytes(text, "This is no movie at all, it is a text of some length that says so.");
+  EXPECT_EQ(failureOf(text).kind, ErrorKind::Damaged);
+  const fs::path hollow = support::copyOf(makeMedia(clip()));
+  std::string bytes = support::readBytes(hollow);
+  const std::size_t media = bytes.find("mdat");
+  const std::size_t index = bytes.find("moov");
+  for (std::size_t i = media + 4; i < (index > media ? index - 4 : bytes.size()); ++i) bytes[i] = 0;
+  support::writeBytes(hollow, bytes);
+  const Error error = failureOf(hollow);
+  EXPECT_EQ(error.kind, ErrorKind::Damaged);
+  EXPECT_EQ(error.text, "No picture of the file can be decoded.");
+  EXPECT_EQ(error.file, hollow);
+}
+
+TEST_F(FfmpegTranscoderTest, SoundIsNotMadeOfASilentMovie) {
+  const Result<void> done =
+      FfmpegTranscoder().transcodeToAudio(Url::fileUrl(makeMedia(clip())), Url::fileUrl(_folder / "no"), kPatience);
+  ASSERT_FALSE(done);
+  EXPECT_EQ(done.error().kind, ErrorKind::Unsupported);
+  EXPECT_EQ(done.error().text, "The file holds no sound.");
+  EXPECT_THAT(leftovers(), IsEmpty());
+}
+
+TEST_F(FfmpegTranscoderTest, OnlyLocalFilesAreConverted) {
+  const std::optional<Url> page = Url::parse("https://example.org/movie.mp4");
+  const Result<void> done = FfmpegTranscoder().transcodeToSD(*page, Url::fileUrl(_folder / "no"), kPatience);
+  ASSERT_FALSE(done);
+  EXPECT_EQ(done.error().text, "Only local files are converted.");
+}
+
+TEST_F(FfmpegTranscoderTest, AFullDiskIsReportedAndNothingIsLeft) {
+  const Result<void> done = FfmpegTranscoder().transcodeToHD(
+      Url::fileUrl(makeMedia(clip())), Url::fileUrl("/proc/self/no-such-place/movie.m4v"), kPatience);
+  ASSERT_FALSE(done);
+  EXPECT_EQ(done.error().kind, ErrorKind::NotFound);
+  struct rlimit before {};
+  ASSERT_EQ(getrlimit(RLIMIT_FSIZE, &before), 0);
+  const auto handler = std::signal(SIGXFSZ, SIG_IGN);
+  const struct rlimit small { .rlim_cur = 2000, .rlim_max = before.rlim_max };
+  MediaSpec spec = clip(1);
+  const fs::path source = makeMedia(spec);
+  ASSERT_EQ(setrlimit(RLIMIT_FSIZE, &small), 0);
+  const Error error = failureOf(source);
+  setrlimit(RLIMIT_FSIZE, &before);
+  std::signal(SIGXFSZ, handler);
+  EXPECT_NE(error.kind, ErrorKind::AlreadyExists);
+  EXPECT_NE(error.kind, ErrorKind::Cancelled);
+}
+
+TEST_F(FfmpegTranscoderTest, TheSourceMayBeReplaced) {
+  const fs::path file = support::copyOf(makeMedia(clip()));
+  ASSERT_TRUE(FfmpegTranscoder().transcodeToHD(Url::fileUrl(file), Url::fileUrl(file), kPatience));
+  EXPECT_EQ(judge(file).video().codec, "h264");
+}
+
+// Progress
+
+class Conversion : public FfmpegTranscoderTest {
+ protected:
+  static fs::path longMovie() {
+    MediaSpec spec = clip(4);
+    spec.width = 1280;
+    spec.height = 720;
+    spec.sound = "sine=frequency=440";
+    spec.audioCodec = "pcm_s16le";
+    return makeMedia(spec);
+  }
+  using Clock = std::chrono::steady_clock;
+  static double since(Clock::time_point start) { return std::chrono::duration<double>(Clock::now() - start).count(); }
+};
+
+TEST_F(Conversion, ReportsFromZeroToAHundredOftenAndNeverBackwards) {
+  std::vector<float> reports;
+  double longest = 0;
+  auto last = Clock::now();
+  const Result<void> done = FfmpegTranscoder().transcodeToSD(
+      Url::fileUrl(longMovie()), Url::fileUrl(_folder / "movie.m4v"), [&](float progress, bool&) {
+        reports.push_back(progress);
+        longest = std::max(longest, since(last));
+        last = Clock::now();
+      });
+  ASSERT_TRUE(done) << done.error().text;
+  EXPECT_EQ(reports.front(), 0);
+  EXPECT_EQ(reports.back(), 100);
+  EXPECT_TRUE(std::ranges::is_sorted(reports));
+  EXPECT_EQ(std::ranges::count(reports, 100.0F), 1);
+  EXPECT_GE(reports.size(), 5U);
+  EXPECT_LT(longest, 1.0);
+}
+
+TEST_F(Conversion, StopsSoonAndLeavesNothing) {
+  const fs::path source = longMovie();
+  for (const float limit : {0.0F, 5.0F, 50.0F, 80.0F}) {
+    auto asked = Clock::now();
+    const Error error = failureOf(source, [&](float progress, bool& stop) {
+      if (progress < limit) return;
+      asked = Clock::now();
+      stop = true;
+    });
+    EXPECT_LT(since(asked), 0.5) << limit;
+    EXPECT_EQ(error.kind, ErrorKind::Cancelled);
+    EXPECT_EQ(error.text, "The conversion was stopped.");
+  }
+}
+
+TEST_F(Conversion, WorksWithoutABlock) {
+  EXPECT_TRUE(
+      FfmpegTranscoder().transcodeToHD(Url::fileUrl(makeMedia(clip())), Url::fileUrl(_folder / "movie.m4v"), {}));
 }
 
 }  // namespace
