@@ -35,13 +35,27 @@ struct Facts {
   Fields fields = Fields::None;
 };
 
+// Tracks that nobody sees or hears, such as chapters, may last longer than those that are converted.
+double playedDuration(const Input& input, const Outline& outline) {
+  double end = 0;
+  for (const AVStream* stream : {outline.video, outline.audio}) {
+    if (stream == nullptr) continue;
+    if (!input.isMovieFamily() || stream->duration == AV_NOPTS_VALUE) return outline.duration;
+    const double start = stream->start_time == AV_NOPTS_VALUE ? 0 : seconds(stream->start_time, stream->time_base);
+    end = std::max(end, start - startTime(input) + seconds(stream->duration, stream->time_base));
+  }
+  return outline.duration > 0 && end > 0 ? std::min(end, outline.duration) : outline.duration;
+}
+
 // Looks at the file through a reading position of its own.
 Result<Facts> gatherFacts(const std::filesystem::path& file, bool hasPicture) {
   Result<Input> input = Input::open(file, kInspectionSeconds);
   if (!input) return input.error();
   Result<Outline> found = outline(*input);
   if (!found) return found.error();
-  Facts facts{.duration = found->duration, .chapters = std::move(found->chapters)};
+  Facts facts;
+  facts.duration = playedDuration(*input, *found);
+  facts.chapters = chapters(*input, facts.duration);
   if (hasPicture && found->video != nullptr) facts.fields = probeFields(*input, *found->video, facts.duration);
   return facts;
 }

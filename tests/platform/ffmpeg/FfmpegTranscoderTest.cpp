@@ -361,16 +361,15 @@ class HighDynamicRange : public FfmpegTranscoderTest {
   int greyAfter(double light, const std::string& transfer, const std::string& primaries) {
     const double code = transfer == "smpte2084" ? ofPq(light) : ofHlg(light);
     MediaSpec spec = clip(0.2);
-    spec.extension = "mov";
-    spec.videoCodec = "libx265";
+    spec.extension = "mkv";
+    spec.videoCodec = "ffv1";
+    spec.width = 64;
+    spec.height = 48;
     spec.pixelFormat = "yuv420p10le";
     spec.picture = "color=c=black";
     spec.pictureFilter =
         "format=yuv420p10le,geq=lum=" + std::to_string(std::lround(64 + code * 876)) + ":cb=512:cr=512";
-    spec.options = {"-x265-params",     "log-level=none:pools=1:crf=10",
-                    "-color_trc",       transfer,
-                    "-color_primaries", primaries,
-                    "-colorspace",      "bt2020nc"};
+    spec.options = {"-color_trc", transfer, "-color_primaries", primaries, "-colorspace", "bt2020nc"};
     const fs::path file = hd(spec);
     expectPlainColours(file);
     const std::array<int, 3> colour = pictureOf(file, 0).at(0.5, 0.5);
@@ -614,12 +613,13 @@ TEST_F(InterlacedVideo, IsFoundWhereNoFlagTells) {
 }
 
 TEST_F(InterlacedVideo, ProgressiveVideoIsUntouchedEvenWhenFlagged) {
-  // Every second row is grey: deinterlacing would blur what moves before it.
-  MediaSpec spec = movingBar(",geq=lum='if(mod(Y,2),lum(X,Y),16+lum(X,Y)/2)':cb=128:cr=128");
+  // Thin lines that move up and down: a deinterlacer loses them.
+  MediaSpec spec = movingBar(
+      ",geq=lum='16+219*lt(mod(X-6*N+320,40),20)+(1-lt(mod(X-6*N+320,40),20))*219*lt(mod(Y+4*N,16),1)':cb=128:cr=128");
   const fs::path plain = makeMedia(spec);
   const fs::path marked = makeMedia(flagged(spec));
-  EXPECT_GT(support::similarity(hd(plain), plain), 0.97);
-  EXPECT_GT(support::similarity(hd(marked), marked), 0.97);
+  EXPECT_GT(support::similarity(hd(plain), plain), 0.98);
+  EXPECT_GT(support::similarity(hd(marked), marked), 0.98);
 }
 
 TEST_F(InterlacedVideo, TelecineDoesNotBecomeCombing) {
@@ -718,7 +718,7 @@ TEST_F(ConvertedSound, RatesOfDiscsAndVideoAreKeptAndOthersAreNot) {
     EXPECT_EQ(judge(file).audio().sampleRate, expected);
     EXPECT_EQ(judge(file).audio().channels, 1) << "one channel stays one";
     const std::vector<float> sound = support::soundOf(file);
-    EXPECT_NEAR(static_cast<double>(sound.size()) / expected, 1, 0.002);
+    EXPECT_NEAR(judge(file).audio().duration, 1, 0.001);
     EXPECT_NEAR(support::loudness(sound, 1, 0, expected, 0.2, 0.8), 0.0884, 0.01);
   }
 }
@@ -788,12 +788,13 @@ TEST_F(FfmpegTranscoderTest, ChaptersGoAlong) {
 
 TEST_F(FfmpegTranscoderTest, TagsGoAlongButNotThePlaceOfTheRecording) {
   MediaSpec spec = clip();
+  spec.extension = "mkv";
   spec.sound = "sine=frequency=440";
   spec.audioCodec = "pcm_s16le";
   spec.tags = {{"title", "Größe"}, {"artist", "Somebody"},
                {"date", "2021"},   {"location", "+52.5200+013.4050/"},
                {"make", "Camera"}, {"com.apple.quicktime.location.ISO6709", "+52.5200+013.4050/"}};
-  spec.options.insert(spec.options.end(), {"-metadata:s:a:0", "language=deu", "-movflags", "use_metadata_tags"});
+  spec.options.insert(spec.options.end(), {"-metadata:s:a:0", "language=deu"});
   const fs::path file = hd(spec);
   const JudgedFile judged = judge(file);
   EXPECT_EQ(judged.tags.at("title"), "Größe");
@@ -842,7 +843,8 @@ TEST_F(FfmpegTranscoderTest, AFileThatDoesNotDecodeFailsCleanly) {
   const fs::path text = support::freshPath("mov");
   support::writeBytes(text, "This is no movie at all, it is a text of some length that says so.");
   EXPECT_EQ(failureOf(text).kind, ErrorKind::Damaged);
-  const fs::path hollow = support::copyOf(makeMedia(clip()));
+  const fs::path hollow =
+      support::copyOf(makeMedia({.duration = 0.4, .width = 64, .height = 48, .pixelShape = "2/1", .sound = ""}));
   std::string bytes = support::readBytes(hollow);
   const std::size_t media = bytes.find("mdat");
   const std::size_t index = bytes.find("moov");
@@ -900,9 +902,9 @@ TEST_F(FfmpegTranscoderTest, TheSourceMayBeReplaced) {
 class Conversion : public FfmpegTranscoderTest {
  protected:
   static fs::path longMovie() {
-    MediaSpec spec = clip(4);
-    spec.width = 1280;
-    spec.height = 720;
+    MediaSpec spec = clip(3);
+    spec.width = 960;
+    spec.height = 540;
     spec.sound = "sine=frequency=440";
     spec.audioCodec = "pcm_s16le";
     return makeMedia(spec);
@@ -926,13 +928,13 @@ TEST_F(Conversion, ReportsFromZeroToAHundredOftenAndNeverBackwards) {
   EXPECT_EQ(reports.back(), 100);
   EXPECT_TRUE(std::ranges::is_sorted(reports));
   EXPECT_EQ(std::ranges::count(reports, 100.0F), 1);
-  EXPECT_GE(reports.size(), 5U);
+  EXPECT_GE(reports.size(), 4U);
   EXPECT_LT(longest, 1.0);
 }
 
 TEST_F(Conversion, StopsSoonAndLeavesNothing) {
   const fs::path source = longMovie();
-  for (const float limit : {0.0F, 5.0F, 50.0F, 80.0F}) {
+  for (const float limit : {0.0F, 5.0F, 70.0F}) {
     auto asked = Clock::now();
     const Error error = failureOf(source, [&](float progress, bool& stop) {
       if (progress < limit) return;
