@@ -5,6 +5,7 @@
 #include <array>
 #include <cstdlib>
 #include <optional>
+#include <span>
 #include <utility>
 
 #include "quilt/platform/ffmpeg/FilterChain.h"
@@ -83,8 +84,11 @@ Fields probeFields(Input& input, AVStream& stream, double duration) {
   for (unsigned i = 0; i < input.context()->nb_streams; ++i) {
     if (input.context()->streams[i] != &stream) input.context()->streams[i]->discard = AVDISCARD_ALL;
   }
-  constexpr std::array places{0.1, 0.5, 0.9};
-  constexpr int picturesAtEach = 7;
+  // Of a short file one place tells enough; there, each picture looked at would be a large part of the work.
+  constexpr std::array severalPlaces{0.5, 0.1, 0.9};
+  constexpr double isShort = 10;  // seconds
+  const std::span<const double> places(severalPlaces.data(), duration > isShort ? severalPlaces.size() : 1);
+  constexpr int picturesAtEach = 6;
   constexpr double secondsForAll = 10;
   input.allow(secondsForAll);
   Counts counts;

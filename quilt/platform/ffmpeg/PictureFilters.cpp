@@ -151,7 +151,13 @@ std::string sizing(PictureSize size) {
   return "w=" + std::to_string(size.width) + ":h=" + std::to_string(size.height) + ":filter=bicubic";
 }
 
-constexpr const char* kOutputColours = "m=709:p=709:t=709:r=limited:dither=ordered";
+constexpr const char* kOutputColours = "m=709:p=709:t=709:r=limited";
+
+// Deeper pictures are dithered. In others there is nothing between two values to show, and noise is costly to encode.
+const char* ditherOf(const AVFrame& frame) {
+  const AVPixFmtDescriptor* format = av_pix_fmt_desc_get(static_cast<AVPixelFormat>(frame.format));
+  return format != nullptr && format->comp[0].depth > 8 ? ":dither=ordered" : ":dither=none";
+}
 
 // Scaled in linear light first, so that there are fewer pixels to map; brightness up to half of reference white is
 // kept, what is above is rolled off, as in posters.
@@ -206,7 +212,7 @@ std::string pictureFilters(const AVFrame& frame, PictureSize size, const Orienta
     toneMap(chain, frame, colours, lying);
   } else if (isResized || colours != kOutput || frame.format != AV_PIX_FMT_YUV420P) {
     if (hasFilter("zscale")) {
-      chain.add("zscale=", sizing(lying), ":", inputColours(colours), ":", kOutputColours);
+      chain.add("zscale=", sizing(lying), ":", inputColours(colours), ":", kOutputColours, ditherOf(frame));
     } else {
       scalePlainly(chain, colours, lying);
     }
