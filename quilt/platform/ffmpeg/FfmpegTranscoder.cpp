@@ -179,7 +179,11 @@ Result<void> transcode(const Url& source, const Url& destination, OutputKind kin
   if (!progress.goOn()) return TranscodeProgress::stopped(file);
   const Result<void> done =
       Transcode(*std::move(input), *std::move(facts), progress).run(kind, box, destination.relativePath());
-  if (done) progress.complete();
+  if (done) {
+    progress.complete();
+  } else if (progress.isStopped()) {
+    return TranscodeProgress::stopped(file);
+  }
   return done;
 }
 

@@ -110,7 +110,7 @@ int MovieOutput::open(OutputKind kind) {
 
 Error MovieOutput::errorOf(int code) const {
   if (_progress.isStopped()) return TranscodeProgress::stopped(_destination);
-  return _writeError ? *_writeError : failure(code, _destination);
+  return _writeError ? *_writeError : conversionFailure(code, _destination);
 }
 
 int MovieOutput::writeBytes(void* self, std::uint8_t* bytes, int count) {

@@ -12,8 +12,9 @@ namespace quilt::platform::ffmpeg {
 
 namespace {
 
-constexpr double kLeap = 10;     // seconds; less may be a pause
-constexpr double kLeapBack = 1;  // seconds; packets of a stream are in order
+constexpr double kLeap = 10;                  // seconds; less may be a pause
+constexpr double kLeapBack = 1;               // seconds; packets of a stream are in order
+constexpr double kLongestPicture = 5 * 3600;  // seconds; the format cannot count many more of the finest ticks
 
 }  // namespace
 
@@ -81,6 +82,10 @@ std::int64_t FrameClock::place(std::int64_t time) {
     constexpr std::int64_t mostLate = 10;  // pictures; more means that there are too many of them
     if (_last - time > mostLate * _usual) return AV_NOPTS_VALUE;
     time = _last + std::max<std::int64_t>(1, _usual / 2);
+  }
+  if (static_cast<double>(time - _last) > kLongestPicture * kMostFramesPerSecond * _shortest) {
+    _shift += _last + _usual - time;
+    time = _last + _usual;
   }
   // Times may be rounded to thousandths of a second: a little early is in time, but lets nobody else come earlier.
   const double slack = _shortest / 4;

@@ -81,7 +81,7 @@ PictureSize fittedSize(PictureSize shown, PictureSize box) {
 AVRational fineTimeBase(AVRational source) {
   constexpr AVRational usual{1, 90000};
   constexpr int fineEnough = 10'000;
-  constexpr int finest = 1'000'000;
+  constexpr int finest = 100'000;
   if (source.num <= 0 || source.den <= 0 || source.den > finest) return usual;
   if (source.den >= fineEnough) return {1, source.den};
   if (usual.den % source.den == 0) return usual;

@@ -114,6 +114,11 @@ TEST_F(FrameClockTest, ATimeThatGoesBackIsRepaired) {
   EXPECT_THAT(places(_clock, {0, 80, 40, 120, 160}), ElementsAre(0, 80, 100, 120, 160));
 }
 
+TEST_F(FrameClockTest, APictureDoesNotLastForDays) {
+  EXPECT_THAT(places(_clock, {0, 40, 3'600'000, 900'000'000, 900'000'040}),
+              ElementsAre(0, 40, 3'600'000, 3'600'040, 3'600'080));
+}
+
 TEST_F(FrameClockTest, SixtyPicturesASecondPassAndMoreAreThinned) {
   EXPECT_THAT(places(_clock, every(1000.0 / 60, 120)), SizeIs(120)) << "rounded to milliseconds";
   EXPECT_THAT(places(_clock, every(1000.0 / 120, 240)),
