@@ -106,7 +106,7 @@ void compareSamples(const fs::path& folder, const fs::path& output) {
     if (!fs::exists(file)) continue;
     const double ours = bestMilliseconds(5, [&] {
       static_cast<void>(FfmpegAudioPreview().extractAudioSamplesFromAssetURL(Url::fileUrl(file),
-                                                                             Url::fileUrl(output / "samples.asc")));
+                                                                             Url::fileUrl(output / "samples.asc"), {}));
     });
     const double decode = bestMilliseconds(5, [&] { decodeOnly(file); });
     std::printf("%-40s %9.2f %9.2f | %.2f\n", name, ours, decode, ours / decode);

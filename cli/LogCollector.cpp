@@ -27,9 +27,10 @@ const char* nameOf(platform::LogLevel level) {
 }
 
 constexpr std::string_view kCopyFailed = "Copy failed with error code (-";
+constexpr std::string_view kCannotBeSized = "Source derivative at path \"";  // why a copy was not even begun
 
 bool isFailure(const std::string& message) {
-  return message.starts_with("Failed ") || message.starts_with(kCopyFailed);
+  return message.starts_with("Failed ") || message.starts_with(kCopyFailed) || message.starts_with(kCannotBeSized);
 }
 
 // The library ends a line with the error's own sentence in quotes: ... at path "/x": "The disk is full". Of a copy it

@@ -8,7 +8,7 @@ namespace quilt::cli {
 namespace {
 
 bool isDiskFull(const Path& at) {
-  constexpr std::uintmax_t kNothing = 64 * 1024;
+  constexpr std::uintmax_t kNothing = std::uintmax_t{64} << 10;
   std::error_code error;
   const std::filesystem::space_info space = std::filesystem::space(at, error);
   return !error && space.available < kNothing;

@@ -17,7 +17,7 @@ std::string Summary::text(const std::string& indent) const {
   std::string text;
   for (const auto& [name, value] : _rows) {
     if (!text.empty()) text += '\n';
-    text += indent + padded(name, width) + "  " + value;
+    text.append(indent).append(padded(name, width)).append("  ").append(value);
   }
   return text;
 }

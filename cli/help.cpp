@@ -4,6 +4,8 @@
 #include <algorithm>
 
 #include "cli/ActingDelegate.h"
+#include "cli/Completions.h"
+#include "cli/ManualPage.h"
 #include "cli/Options.h"
 #include "cli/Text.h"
 #include "cli/version.h"
@@ -67,12 +69,20 @@ std::string explain(const CommandDescription& command) {
 }  // namespace
 
 void ActingDelegate::perform(const HelpRequest& request) {
-  std::string text = overview();
-  if (request.command) {
-    const CommandDescription* command = findCommand(*request.command);
-    if (!command)
-      throw Failure(ExitCode::Usage, "There is no command " + inQuotes(*request.command) + "; see \"quilt help\"");
-    text = explain(*command);
+  const CommandDescription* command = request.command ? findCommand(*request.command) : nullptr;
+  if (request.command && !command)
+    throw Failure(ExitCode::Usage, "There is no command " + inQuotes(*request.command) + "; see \"quilt help\"");
+  std::string text;
+  if (request.as == "man") {
+    text = manualPage(command);
+  } else if (request.as == "bash") {
+    text = bashCompletion();
+  } else if (request.as == "zsh") {
+    text = zshCompletion();
+  } else if (request.as == "fish") {
+    text = fishCompletion();
+  } else {
+    text = command ? explain(*command) : overview();
   }
   _context.output.object({{"help", text}}, text);
 }

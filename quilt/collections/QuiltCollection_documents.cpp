@@ -88,6 +88,7 @@ std::vector<std::shared_ptr<QuiltDocument>> QuiltCollection::lastCreatedDocument
   dated.resize(std::min(dated.size(), count));
 
   std::vector<std::shared_ptr<QuiltDocument>> newest;
+  newest.reserve(dated.size());
   for (auto& [created, document] : dated) newest.push_back(std::move(document));
   return newest;
 }

@@ -133,7 +133,9 @@ class QuiltMedia : public platform::Object {
   void removeChild(List& list, const Child& child, const char* warning);
   bool flattenChildren(const ProgressionBlock& block);
   bool finalizeChildren(const ProgressionBlock& block);
+  /// The second source's poster with the first's as an inset; null without the second's.
   std::shared_ptr<ImageWrapper> dualSourcePoster();
+  /// The first four sources' posters in a grid, under a badge.
   std::shared_ptr<ImageWrapper> montagePoster();
 
   platform::Property<std::string> _uuid{*this, "uuid"};

@@ -63,10 +63,6 @@ std::shared_ptr<ImageWrapper> QuiltMedia::posterImage() {
   return poster;
 }
 
-// The compositions need drawing, which this version does not have yet: both answer none.
-std::shared_ptr<ImageWrapper> QuiltMedia::dualSourcePoster() { return nullptr; }
-std::shared_ptr<ImageWrapper> QuiltMedia::montagePoster() { return nullptr; }
-
 platform::PropertyList QuiltMedia::posterImageWidth() {
   const auto poster = posterImage();
   return poster ? platform::PropertyList(poster->size().width) : platform::PropertyList(0);

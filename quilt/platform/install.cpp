@@ -18,6 +18,9 @@
 #include "quilt/platform/text/ScriptJsonWriter.h"
 #include "quilt/platform/types/TypeTable.h"
 
+#if QUILT_WITH_CAIRO
+#include "quilt/platform/cairo/CairoDrawing.h"
+#endif
 #if QUILT_WITH_FFMPEG
 #include "quilt/platform/ffmpeg/Capabilities.h"
 #include "quilt/platform/ffmpeg/FfmpegAudioPreview.h"
@@ -61,6 +64,11 @@ class BuildDiagnostics final : public Diagnostics {
     append(list, VipsImages::capabilities());
 #else
     list.push_back(leftOut("Images", "-DQUILT_WITH_VIPS"));
+#endif
+#if QUILT_WITH_CAIRO
+    list.push_back({"Composed posters", true, CairoDrawing::version(), ""});
+#else
+    list.push_back(leftOut("Composed posters", "-DQUILT_WITH_CAIRO"));
 #endif
 #if QUILT_WITH_MUPDF
     list.push_back({"PDF and EPUB inspection", true, MupdfInspector::version(), ""});
@@ -113,6 +121,11 @@ void install() {
   set.images = std::make_shared<VipsImages>();
 #else
   set.images = std::make_shared<AbsentImages>();
+#endif
+#if QUILT_WITH_CAIRO
+  set.drawing = std::make_shared<CairoDrawing>();
+#else
+  set.drawing = std::make_shared<AbsentDrawing>();
 #endif
 #if QUILT_WITH_FFMPEG
   set.movies = std::make_shared<FfmpegMovieToolkit>();

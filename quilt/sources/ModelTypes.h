@@ -18,6 +18,7 @@
 namespace quilt {
 
 using platform::Array;
+using platform::ContinueBlock;
 using platform::Date;
 using platform::Dictionary;
 using platform::ImageWrapper;

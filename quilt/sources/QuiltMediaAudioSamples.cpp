@@ -44,7 +44,7 @@ std::shared_ptr<QuiltMediaAudioSamples> QuiltMediaAudioSamples::initWithDictiona
   auto samples = init();
   samples->setSourceOwner(andMediaSource);
   if (const Text uuid = dictionary.string("UUID")) {
-    if (!isAcceptedName(*uuid, "audio samples file")) return nullptr;
+    if (!isAcceptedName(*uuid, "samples file")) return nullptr;
     samples->setUuid(uuid);
   }
   // The key only marks that there were samples; where they lie follows from the identity.
@@ -94,14 +94,14 @@ Path QuiltMediaAudioSamples::path() const {
   return folder / platform::withExtension(*identity, "asc");
 }
 
-bool QuiltMediaAudioSamples::flatten() {
+bool QuiltMediaAudioSamples::flatten(const ContinueBlock& goesOn) {
   if (isFlattened()) return true;
   const Path file = path();
   if (file.empty()) return false;
   // The second placeholder has no error to print: nothing failed, the place is not as it should be.
   const Path folder = file.parent_path();
   if (services().files->kindOfItemAtPath(folder) != platform::FileKind::Folder ||
-      !isInsidePackage(folder, documentOf(sourceOwner()), "audio samples file")) {
+      !isInsidePackage(folder, documentOf(sourceOwner()), "samples file")) {
     FDYLogger::logCritical("Expected audio samples folder at path \"%@\": \"%@\"", folder, std::nullopt);
     return false;
   }
@@ -111,7 +111,7 @@ bool QuiltMediaAudioSamples::flatten() {
   }
   const Url destination = Url::fileUrl(file);
   const auto source = sourceURL();
-  if (!source || !services().audioPreview->extractAudioSamplesFromAssetURL(*source, destination)) {
+  if (!source || !services().audioPreview->extractAudioSamplesFromAssetURL(*source, destination, goesOn)) {
     FDYLogger::logCritical("Failed to extract audio samples file at path \"%@\": \"%@\"", file, std::nullopt);
     return false;
   }

@@ -42,8 +42,9 @@ class QuiltMediaAudioSamples : public platform::Object {
   /// Where the samples file lies in the package: identity and "asc"; empty without a place in a document.
   Path path() const;
   /// Extracts the samples into the package. True at once when they are there; false silently without a place in a
-  /// document, false after a critical line when the folder is missing, a file is in the way or extraction fails.
-  bool flatten();
+  /// document, false after a critical line when the folder is missing, a file is in the way or extraction fails, also
+  /// because `goesOn` answered false; nothing is left behind then.
+  bool flatten(const ContinueBlock& goesOn = {});
   /// 0 unless flattened.
   double totalSizeInMegaBytes() const;
   void invalidateCaches() {}

@@ -20,8 +20,11 @@ constexpr const char* kCopyFailed = "Copy failed with error code (%d)";
 
 bool copyInto(const Path& source, const Path& destination, const ProgressionBlock& block) {
   const auto attributes = services().files->attributesOfItemAtPath(source);
-  if (!attributes) FDYLogger::logWarning(kCannotBeSized, source, attributes.error());
-  int result = copyReportingPercentage(source, destination, attributes ? attributes->size : 0, block);
+  if (!attributes) {
+    FDYLogger::logWarning(kCannotBeSized, source, attributes.error());
+    return false;
+  }
+  int result = copyReportingPercentage(source, destination, attributes->size, block);
   if (result >= 0) {
     // The next save of the document names the copy; from then on the original may go.
     result = services().files->syncItem(destination);
@@ -105,7 +108,8 @@ Path QuiltMediaDerivative::exportToPath(const Path& path, const ProgressionBlock
     FDYLogger::logWarning(kCannotBeSized, file, attributes.error());
     return {};
   }
-  if (!createDirectoryIfMissing(destination.parent_path())) return {};
+  // For a counted name in a subfolder. Where there can be none, the copy fails and says so.
+  (void)createDirectoryIfMissing(destination.parent_path());
   const int result = copyReportingPercentage(file, destination, attributes->size, withProgressionBlock);
   if (result < 0) {
     FDYLogger::logDebug(kCopyFailed, result);

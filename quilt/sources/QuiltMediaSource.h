@@ -120,9 +120,10 @@ class QuiltMediaSource : public platform::Object {
   std::shared_ptr<QuiltMediaAudioSamples> audioSamples() const { return _audioSamples.get(); }
   void setAudioSamples(std::shared_ptr<QuiltMediaAudioSamples> samples) { _audioSamples.set(std::move(samples)); }
   /// Extracts the main derivative's samples into the package and attaches them. False when there is no main derivative
-  /// or no sound; true does not promise that they were attached.
-  bool addAudioSamplesForMainDerivative();
-  void addAudioSamples(const std::shared_ptr<QuiltMediaAudioSamples>& samples);
+  /// or no sound; true does not promise that they were attached. `goesOn` can stop a long extraction.
+  bool addAudioSamplesForMainDerivative(const ContinueBlock& goesOn = {});
+  /// Extracts the samples unless they are, and attaches them; when that fails they are not.
+  void addAudioSamples(const std::shared_ptr<QuiltMediaAudioSamples>& samples, const ContinueBlock& goesOn = {});
   /// Deletes the samples file and leaves the source without samples.
   void removeAudioSamples(const std::shared_ptr<QuiltMediaAudioSamples>& samples);
   void removeAllAudioSamples();

@@ -27,7 +27,7 @@ class SamplesLock {
 
 }  // namespace
 
-bool QuiltMediaSource::addAudioSamplesForMainDerivative() {
+bool QuiltMediaSource::addAudioSamplesForMainDerivative(const ContinueBlock& goesOn) {
   const SamplesLock guard(audioSamples());
   const auto main = mainDerivative();
   const auto url = main ? main->url() : std::nullopt;
@@ -37,15 +37,16 @@ bool QuiltMediaSource::addAudioSamplesForMainDerivative() {
   }
   const auto samples = QuiltMediaAudioSamples::initWithURL(*url, main->uuid());
   if (!samples) return false;
-  addAudioSamples(samples);
+  addAudioSamples(samples, goesOn);
   return true;
 }
 
-void QuiltMediaSource::addAudioSamples(const std::shared_ptr<QuiltMediaAudioSamples>& samples) {
+void QuiltMediaSource::addAudioSamples(const std::shared_ptr<QuiltMediaAudioSamples>& samples,
+                                       const ContinueBlock& goesOn) {
   if (!samples) return;
   const SamplesLock guard(audioSamples());
   samples->setSourceOwner(shared(this));
-  if (samples->flatten()) {
+  if (samples->flatten(goesOn)) {
     changeOnMainThread("audioSamples", [&] { _audioSamples.store(samples); });
   } else {
     FDYLogger::logDebug("Failed to flatten source audio samples \"%@\" at URL \"%@\"", samples->uuid(),

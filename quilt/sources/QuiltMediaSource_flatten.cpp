@@ -4,6 +4,7 @@
 #include "quilt/sources/DocumentSave.h"
 #include "quilt/sources/ModelFiles.h"
 #include "quilt/sources/QuiltMediaSource.h"
+#include "quilt/sources/RepeatedReport.h"
 
 namespace quilt {
 
@@ -41,6 +42,7 @@ bool QuiltMediaSource::isFlattened() const {
 
 bool QuiltMediaSource::flattenCopy(bool copy, const ProgressionBlock& withProgressionBlock) {
   const SaveDeferral deferral;
+  RepeatedReport progress(withProgressionBlock);
   FDYLogger::logDebug("Flattening source at path \"%@\"", path());
 
   const auto flattenChildren = [&]() -> Outcome {
@@ -63,9 +65,8 @@ bool QuiltMediaSource::flattenCopy(bool copy, const ProgressionBlock& withProgre
       const double start = integerPercentage(step++, total);
       if (derivative->isFlattened()) return true;
       const auto url = derivative->url();
-      const bool done = derivative->flattenCopy(copy, [&](double percentage) {
-        return report(withProgressionBlock, start + percentage / static_cast<double>(total));
-      });
+      const bool done = derivative->flattenCopy(
+          copy, [&](double percentage) { return progress.report(start + percentage / static_cast<double>(total)); });
       if (!done)
         FDYLogger::logDebug("Failed to flatten source derivative \"%@\" during flattening at path \"%@\"", url, path());
       return done;
@@ -82,12 +83,13 @@ bool QuiltMediaSource::flattenCopy(bool copy, const ProgressionBlock& withProgre
         outcome = Outcome::Failed;
         return false;
       }
-      if (report(withProgressionBlock, integerPercentage(step++, total))) return true;
-      FDYLogger::logCritical("Flattening has been cancelled");
+      if (progress.report(integerPercentage(step++, total))) return true;
       outcome = Outcome::Cancelled;
       return false;
     });
-    return outcome;
+    if (outcome != Outcome::Done || contentCategory() == kQuiltMediaContentCategoryDocument) return outcome;
+    addAudioSamplesForMainDerivative(progress.continueBlock());
+    return progress.wasCancelled() ? Outcome::Cancelled : Outcome::Done;
   };
 
   switch (flattenChildren()) {
@@ -95,12 +97,12 @@ bool QuiltMediaSource::flattenCopy(bool copy, const ProgressionBlock& withProgre
       FDYLogger::logCritical("Failed to flatten source at path \"%@\"", path());
       return false;
     case Outcome::Cancelled:
+      FDYLogger::logCritical("Flattening has been cancelled");
       return false;
     case Outcome::Done:
       break;
   }
-  if (contentCategory() != kQuiltMediaContentCategoryDocument) addAudioSamplesForMainDerivative();
-  report(withProgressionBlock, 100);
+  progress.report(100);
   return true;
 }
 
@@ -142,24 +144,26 @@ Path QuiltMediaSource::exportToPath(const Path& path, const std::string& withFor
 }
 
 void QuiltMediaSource::reloadWithFileAtPath(const Path& path, const ProgressionBlock& withProgressionBlock) {
-  report(withProgressionBlock, 0);
+  RepeatedReport progress(withProgressionBlock);
+  progress.report(0);
   removeAllDerivatives();
   removeAllPreviews();
   removeAllAudioSamples();
   invalidateThumbnailImage();
   invalidatePosterImage();
   invalidateCaches();
-  report(withProgressionBlock, 10);
+  progress.report(10);
   const auto derivative = QuiltMediaDerivative::initWithURL(Url::fileUrl(path));
-  report(withProgressionBlock, 20);
+  progress.report(20);
   if (derivative) {
     addDerivative(derivative);
     derivative->flattenCopy(
-        /*copy=*/true, [&](double percentage) { return report(withProgressionBlock, percentage * 8.0 / 10.0 + 20.0); });
-    if (contentCategory() != kQuiltMediaContentCategoryDocument) addAudioSamplesForMainDerivative();
+        /*copy=*/true, [&](double percentage) { return progress.report(percentage * 8.0 / 10.0 + 20.0); });
+    if (contentCategory() != kQuiltMediaContentCategoryDocument)
+      addAudioSamplesForMainDerivative(progress.continueBlock());
   }
   if (const auto owner = document()) owner->update();
-  report(withProgressionBlock, 100);
+  progress.report(100);
 }
 
 }  // namespace quilt

@@ -55,6 +55,12 @@ TEST_F(LogCollectorTest, AFailedCopyIsNamedByItsNumber) {
   EXPECT_EQ(ExitCode::InputOutput, exitCodeForCause(log.cause()));
 }
 
+TEST_F(LogCollectorTest, ACopyThatWasNotBegunIsNamedByTheReason) {
+  log.write(LogLevel::Warning, "Source derivative at path \"/a\" cannot be sized: \"There is no such file\"");
+  log.write(LogLevel::Critical, "Failed to flatten source derivative \"file:///a\" at \"file:///b\"");
+  EXPECT_EQ("There is no such file", log.cause());
+}
+
 TEST_F(LogCollectorTest, WithoutAFailureThereIsNoCause) {
   EXPECT_EQ("", log.cause());
   log.write(LogLevel::Debug, "Failed to do it: \"x\"");

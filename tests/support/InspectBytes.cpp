@@ -71,7 +71,7 @@ void inspectBytes(std::span<const std::uint8_t> bytes) {
   }
   const ScratchFolder folder;
   static_cast<void>(FfmpegAudioPreview().extractAudioSamplesFromAssetURL(Url::fileUrl(file.path()),
-                                                                         Url::fileUrl(folder / "samples.asc")));
+                                                                         Url::fileUrl(folder / "samples.asc"), {}));
 }
 
 }  // namespace quilt::support

@@ -39,6 +39,12 @@ except Exception as problem:
     print("error", problem)
 )";
 
+constexpr const char* kBinaryProgram = R"(
+import plistlib, sys
+with open(sys.argv[1], "rb") as file: value = plistlib.load(file)
+with open(sys.argv[1] + ".binary", "wb") as file: plistlib.dump(value, file, fmt=plistlib.FMT_BINARY, sort_keys=False)
+)";
+
 std::vector<std::string> linesOf(const char* program, const std::filesystem::path& file) {
   // Test folders have names without quotes.
   const std::string command = "python3 -c '" + std::string(program) + "' '" + file.native() + "' 2>&1";
@@ -60,6 +66,13 @@ std::vector<std::string> linesOf(const char* program, const std::filesystem::pat
 std::vector<std::string> entriesByPython(const std::filesystem::path& file) { return linesOf(kProgram, file); }
 
 std::vector<std::string> treeByPython(const std::filesystem::path& file) { return linesOf(kTreeProgram, file); }
+
+bool writeBinaryByPython(const std::filesystem::path& file, const std::filesystem::path& binaryFile) {
+  if (!linesOf(kBinaryProgram, file).empty()) return false;
+  std::error_code problem;
+  std::filesystem::rename(file.native() + ".binary", binaryFile, problem);
+  return !problem;
+}
 
 std::vector<std::string> keysByPython(const std::filesystem::path& file) {
   std::vector<std::string> keys = entriesByPython(file);

@@ -16,6 +16,9 @@ std::vector<std::string> entriesByPython(const std::filesystem::path& file);
 /// count, before those of what it holds.
 std::vector<std::string> treeByPython(const std::filesystem::path& file);
 
+/// Writes what Python reads in one file to another, in the binary form. False when it cannot.
+bool writeBinaryByPython(const std::filesystem::path& file, const std::filesystem::path& binaryFile);
+
 /// Only the keys, in order.
 std::vector<std::string> keysByPython(const std::filesystem::path& file);
 

@@ -23,13 +23,16 @@ Result<std::shared_ptr<ImageWrapper>> AbsentImages::imageWithBitmap(Bitmap /*bit
   return _absence.error({});
 }
 
+Result<std::unique_ptr<Canvas>> AbsentDrawing::makeCanvas(Size /*size*/) const { return _absence.error({}); }
+
 Result<std::unique_ptr<Movie>> AbsentMovieToolkit::openMovie(const std::filesystem::path& path) const {
   return _absence.error(path);
 }
 
 Result<MediaFacts> AbsentInspector::inspect(const std::filesystem::path& path) const { return _absence.error(path); }
 
-Result<void> AbsentAudioPreview::extractAudioSamplesFromAssetURL(const Url& assetURL, const Url& /*toSampleURL*/) {
+Result<void> AbsentAudioPreview::extractAudioSamplesFromAssetURL(const Url& assetURL, const Url& /*toSampleURL*/,
+                                                                 const ContinueBlock& /*goesOn*/) {
   return _absence.error(assetURL.relativePath());
 }
 

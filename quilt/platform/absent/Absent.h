@@ -4,6 +4,7 @@
 #include <mutex>
 #include <string>
 
+#include "quilt/platform/interfaces/Drawing.h"
 #include "quilt/platform/interfaces/FDYArchive.h"
 #include "quilt/platform/interfaces/FDYAudioPreview.h"
 #include "quilt/platform/interfaces/FDYMedia.h"
@@ -38,6 +39,14 @@ class AbsentImages final : public Images {
   Absence _absence{"Reading and writing of images"};
 };
 
+class AbsentDrawing final : public Drawing {
+ public:
+  Result<std::unique_ptr<Canvas>> makeCanvas(Size size) const override;
+
+ private:
+  Absence _absence{"Drawing of posters"};
+};
+
 class AbsentMovieToolkit final : public MovieToolkit {
  public:
   Result<std::unique_ptr<Movie>> openMovie(const std::filesystem::path& path) const override;
@@ -58,7 +67,8 @@ class AbsentInspector final : public MediaInspector {
 
 class AbsentAudioPreview final : public FDYAudioPreview {
  public:
-  Result<void> extractAudioSamplesFromAssetURL(const Url& assetURL, const Url& toSampleURL) override;
+  Result<void> extractAudioSamplesFromAssetURL(const Url& assetURL, const Url& toSampleURL,
+                                               const ContinueBlock& goesOn) override;
 
  private:
   Absence _absence{"Extraction of audio samples"};

@@ -9,11 +9,6 @@ namespace {
 
 using namespace std::chrono;
 
-// system_clock counts nanoseconds in 64 bits, so dates from 1678 to 2261 are all that it can hold; dates outside are
-// clamped to whole days inside that range.
-constexpr sys_days kEarliest{year{1678} / 1 / 1};
-constexpr sys_days kLatest{year{2262} / 1 / 1};
-
 void appendPadded(std::string& out, int value, std::size_t digits) {
   const std::string text = std::to_string(value);
   out.append(digits > text.size() ? digits - text.size() : 0, '0').append(text);
@@ -62,8 +57,9 @@ std::optional<Date> parseIso8601(std::string_view text) {
   if (!y || !mo || !d || !h || !mi || !s) return std::nullopt;
   const year_month_day calendar{year{*y}, month{static_cast<unsigned>(*mo)}, day{static_cast<unsigned>(*d)}};
   if (!calendar.ok() || *h > 23 || *mi > 59 || *s > 60) return std::nullopt;
-  const sys_days day = std::clamp(sys_days{calendar}, kEarliest, kLatest);
-  return Date{day + hours{*h} + minutes{*mi} + seconds{*s}};
+  const sys_days day = std::clamp(sys_days{calendar}, kEarliestDay, kLatestDay);
+  const sys_seconds time = day + hours{*h} + minutes{*mi} + seconds{*s};
+  return Date{std::min<sys_seconds>(time, kLatestDay + days{1} - seconds{1})};  // a leap second would lead out
 }
 
 }  // namespace quilt::platform

@@ -10,8 +10,11 @@ namespace quilt::platform {
 
 using Date = std::chrono::system_clock::time_point;
 
+/// The days that the clock holds in full; what lies outside is clamped when it is read.
+inline constexpr std::chrono::sys_days kEarliestDay{std::chrono::year{1678} / 1 / 1};
+inline constexpr std::chrono::sys_days kLatestDay{std::chrono::year{2262} / 1 / 1};
+
 /// "2026-03-05T14:07:09Z": UTC, whole seconds (fractions are dropped, toward the past).
-/// The clock holds the years 1678 to 2262; what lies outside is clamped when it is read.
 std::string formatIso8601(Date date);
 
 /// Reads exactly the form that formatIso8601 writes; none for anything else or for a day that does not exist.

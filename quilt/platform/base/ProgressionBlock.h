@@ -14,6 +14,10 @@ using ProgressionBlock = std::function<bool(double percentage)>;
 template <class T>
 using ObjectProgressionBlock = std::function<bool(const std::shared_ptr<T>& object, double percentage)>;
 
+/// Asked from time to time by an operation that has no percentage to tell: true to go on, false to cancel. An empty
+/// block is never called and always goes on.
+using ContinueBlock = std::function<bool()>;
+
 inline bool report(const ProgressionBlock& block, double percentage) { return !block || block(percentage); }
 
 template <class T>

@@ -41,6 +41,8 @@ void Dictionary::append(std::string key, PropertyList value) {
   _entries.emplace_back(std::move(key), std::move(value));
 }
 
+void Dictionary::reserve(std::size_t count) { _entries.reserve(count); }
+
 void Dictionary::remove(std::string_view key) {
   std::erase_if(_entries, [key](const Entry& entry) { return entry.first == key; });
 }

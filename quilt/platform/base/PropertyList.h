@@ -37,6 +37,8 @@ class Dictionary {
   void set(std::string key, PropertyList value);
   /// Appends without looking for the key; the caller knows that it is not there.
   void append(std::string key, PropertyList value);
+  /// Makes room for this many keys in all.
+  void reserve(std::size_t count);
   void remove(std::string_view key);
 
   /// The value of a key, or null. Valid until the dictionary changes.

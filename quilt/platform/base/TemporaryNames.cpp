@@ -1,11 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "quilt/platform/base/TemporaryNames.h"
 
-#include <sys/random.h>
-
 #include <algorithm>
-#include <array>
-#include <cerrno>
+#include <random>
 
 namespace quilt::platform {
 
@@ -17,11 +14,9 @@ constexpr std::string_view kLetters = "abcdefghijklmnopqrstuvwxyz234567";
 constexpr std::size_t kLetterCount = 8;
 
 std::string randomLetters() {
-  std::array<unsigned char, kLetterCount> bytes{};
-  // Without randomness (EAGAIN early at boot) the names repeat; whoever makes the item tries the next one.
-  if (::getrandom(bytes.data(), bytes.size(), 0) < 0) bytes.fill(static_cast<unsigned char>(errno));
+  std::random_device random;
   std::string text;
-  for (const unsigned char byte : bytes) text += kLetters[byte % kLetters.size()];
+  for (std::size_t i = 0; i < kLetterCount; ++i) text += kLetters[random() % kLetters.size()];
   return text;
 }
 

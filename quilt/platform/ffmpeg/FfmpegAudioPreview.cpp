@@ -21,7 +21,7 @@ using namespace ffmpeg;
 
 namespace {
 
-constexpr std::size_t kFlushedBytes = 64 * 1024;
+constexpr std::size_t kFlushedBytes = std::size_t{64} << 10;
 constexpr double kStalledSeconds = 30;  // for one packet
 
 std::string littleEndian(std::uint64_t value) {
@@ -153,6 +153,8 @@ class Extraction {
   bool _isMixed = false;
 };
 
+Error cancelled(const Input& input) { return {ErrorKind::Cancelled, "Reading the sound was stopped.", input.path()}; }
+
 // Decodes the whole stream; what does not decode is left out.
 Result<void> decodeAll(Input& input, const AVStream& stream, AVCodecContext& decoder, Extraction& extraction) {
   const Packet packet(av_packet_alloc());
@@ -166,26 +168,31 @@ Result<void> decodeAll(Input& input, const AVStream& stream, AVCodecContext& dec
     }
     return {};
   };
-  while (input.allow(kStalledSeconds), av_read_frame(input.context(), packet.get()) >= 0) {
+  while (input.allow(kStalledSeconds), input.goesOn() && av_read_frame(input.context(), packet.get()) >= 0) {
     if (packet->stream_index == stream.index) {
       avcodec_send_packet(&decoder, packet.get());
       if (Result<void> received = receive(); !received) return received;
     }
     av_packet_unref(packet.get());
   }
+  if (!input.goesOn()) return cancelled(input);
   avcodec_send_packet(&decoder, nullptr);
   return receive();
 }
 
 }  // namespace
 
-Result<void> FfmpegAudioPreview::extractAudioSamplesFromAssetURL(const Url& assetURL, const Url& toSampleURL) {
+Result<void> FfmpegAudioPreview::extractAudioSamplesFromAssetURL(const Url& assetURL, const Url& toSampleURL,
+                                                                 const ContinueBlock& goesOn) {
   for (const Url* url : {&assetURL, &toSampleURL}) {
     if (!url->isFileUrl()) return Error{ErrorKind::Unsupported, "Audio samples are made of local files only.", {}};
   }
   Result<Input> input = Input::open(assetURL.relativePath(), kInspectionSeconds);
   if (!input) return input.error();
-  if (Result<void> completed = completeStreams(*input); !completed) return completed;
+  input->heed(goesOn);
+  Result<void> completed = completeStreams(*input);
+  if (!input->goesOn()) return cancelled(*input);
+  if (!completed) return completed;
   const AVStream* stream = mainAudio(*input);
   if (stream == nullptr) return Error{ErrorKind::Unsupported, "The file holds no sound.", input->path()};
   for (unsigned i = 0; i < input->context()->nb_streams; ++i) {

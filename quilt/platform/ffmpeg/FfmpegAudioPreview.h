@@ -11,7 +11,8 @@ namespace quilt::platform {
 /// Damaged stretches are left out; a file that breaks off gives the points up to there. It fails when there is not one.
 class FfmpegAudioPreview final : public FDYAudioPreview {
  public:
-  Result<void> extractAudioSamplesFromAssetURL(const Url& assetURL, const Url& toSampleURL) override;
+  Result<void> extractAudioSamplesFromAssetURL(const Url& assetURL, const Url& toSampleURL,
+                                               const ContinueBlock& goesOn) override;
 };
 
 }  // namespace quilt::platform

@@ -10,6 +10,7 @@
 #include <chrono>
 #include <cstring>
 #include <mutex>
+#include <utility>
 #include <vector>
 
 #include "quilt/platform/ffmpeg/Failure.h"
@@ -39,6 +40,8 @@ struct Input::Source {
   std::int64_t size = 0;
   std::int64_t position = 0;
   SteadyClock::time_point deadline;
+  ContinueBlock block;
+  bool isCancelled = false;
   AVIOContext* io = nullptr;
 
   Source() = default;
@@ -52,11 +55,19 @@ struct Input::Source {
 
   [[nodiscard]] bool outOfTime() const { return SteadyClock::now() > deadline; }
 
-  static int isInterrupted(void* opaque) { return static_cast<const Source*>(opaque)->outOfTime() ? 1 : 0; }
+  bool goesOn() {
+    isCancelled = isCancelled || (block && !block());
+    return !isCancelled;
+  }
+
+  static int isInterrupted(void* opaque) {
+    auto& source = *static_cast<Source*>(opaque);
+    return source.outOfTime() || !source.goesOn() ? 1 : 0;
+  }
 
   static int read(void* opaque, std::uint8_t* bytes, int count) {
     auto& source = *static_cast<Source*>(opaque);
-    if (source.outOfTime()) return AVERROR_EXIT;
+    if (source.outOfTime() || !source.goesOn()) return AVERROR_EXIT;
     ssize_t got = 0;
     do {
       got = pread(source.descriptor, bytes, static_cast<std::size_t>(count), source.position);
@@ -147,6 +158,8 @@ Result<Input> Input::open(const std::filesystem::path& path, double seconds) {
 const std::filesystem::path& Input::path() const { return _source->path; }
 std::uint64_t Input::size() const { return static_cast<std::uint64_t>(_source->size); }
 bool Input::outOfTime() const { return _source->outOfTime(); }
+void Input::heed(ContinueBlock block) { _source->block = std::move(block); }
+bool Input::goesOn() { return _source->goesOn(); }
 
 bool Input::isMovieFamily() const { return std::string_view(_context->iformat->name).starts_with("mov,"); }
 

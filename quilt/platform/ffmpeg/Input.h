@@ -6,6 +6,7 @@
 #include <memory>
 #include <string_view>
 
+#include "quilt/platform/base/ProgressionBlock.h"
 #include "quilt/platform/base/Result.h"
 #include "quilt/platform/ffmpeg/Handles.h"
 
@@ -35,6 +36,11 @@ class Input {
   /// Makes what follows fail as too slow after this many seconds from now.
   void allow(double seconds);
   [[nodiscard]] bool outOfTime() const;
+
+  /// Has every read from now on ask the block; after its first false all reads fail.
+  void heed(ContinueBlock block);
+  /// Asks as well, for work between the reads. False for good after the first false.
+  [[nodiscard]] bool goesOn();
 
   /// Fills in what the header does not say about the streams, by reading and decoding the start of the file.
   Result<void> findStreamInfo();

@@ -171,7 +171,7 @@ std::optional<SequenceParameters> readParameterSet(BitReader reader) {
   if (reader.flag()) {
     const int chroma = separatePlanes ? 0 : result.chromaFormat;
     const std::int64_t unitX = chroma == 1 || chroma == 2 ? 2 : 1;
-    const std::int64_t unitY = (chroma == 1 ? 2 : 1) * (framesOnly ? 1 : 2);
+    const std::int64_t unitY = std::int64_t{chroma == 1 ? 2 : 1} * (framesOnly ? 1 : 2);
     const std::int64_t left = reader.unsignedCode();
     const std::int64_t right = reader.unsignedCode();
     const std::int64_t top = reader.unsignedCode();

@@ -112,6 +112,8 @@ void ToneMap::apply(const std::uint16_t* source, std::uint8_t* destination, std:
       }
     }
     const auto encode = [&](float light) {
+      // Never negative, so that the cheap rounding, for every pixel, is right.
+      // NOLINTNEXTLINE(bugprone-incorrect-roundings)
       return _encoded[static_cast<std::size_t>(std::clamp(light, 0.0F, 1.0F) * last + 0.5F)];
     };
     destination[0] = encode(red);

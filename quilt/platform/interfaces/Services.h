@@ -8,6 +8,7 @@
 #include "quilt/platform/interfaces/Clock.h"
 #include "quilt/platform/interfaces/DateFormatter.h"
 #include "quilt/platform/interfaces/Diagnostics.h"
+#include "quilt/platform/interfaces/Drawing.h"
 #include "quilt/platform/interfaces/FDYArchive.h"
 #include "quilt/platform/interfaces/FDYAudioPreview.h"
 #include "quilt/platform/interfaces/FDYMedia.h"
@@ -35,6 +36,7 @@ struct Services {
   std::shared_ptr<TypeIdentifiers> types;
   std::shared_ptr<MediaInspector> inspector;
   std::shared_ptr<Images> images;
+  std::shared_ptr<Drawing> drawing;
   std::shared_ptr<MovieToolkit> movies;
   std::shared_ptr<FDYAudioPreview> audioPreview;
   std::shared_ptr<FDYMediaTranscoder> transcoder;

@@ -1,10 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "quilt/platform/plist/BinaryReader.h"
 
+#include <algorithm>
 #include <bit>
 #include <cmath>
 
+#include "quilt/platform/plist/Limits.h"
 #include "quilt/platform/plist/XmlReader.h"
+#include "quilt/platform/plist/XmlText.h"
 
 namespace quilt::platform {
 
@@ -118,9 +121,11 @@ class Reader {
     if (size > 16 || !holds(at + 1, size)) return damaged("An integer of the binary property list is cut short");
     if (size == 16) {
       // Sixteen bytes hold what exceeds 63 bits without a sign.
+      const auto high = std::bit_cast<std::int64_t>(number(at + 1, 8));
       const std::uint64_t low = number(at + 9, 8);
-      if (number(at + 1, 8) != 0 || low <= INT64_MAX) return PropertyList(std::bit_cast<std::int64_t>(low));
-      return PropertyList(static_cast<double>(low));
+      const auto whole = std::bit_cast<std::int64_t>(low);
+      if (high == (whole < 0 ? -1 : 0)) return PropertyList(whole);
+      return PropertyList(std::ldexp(static_cast<double>(high), 64) + static_cast<double>(low));
     }
     return PropertyList(std::bit_cast<std::int64_t>(number(at + 1, size)));
   }
@@ -134,21 +139,23 @@ class Reader {
 
   Result<PropertyList> date(std::uint64_t at) const {
     if (!holds(at + 1, 8)) return damaged("A date of the binary property list is cut short");
-    const double seconds = std::bit_cast<double>(number(at + 1, 8));
-    constexpr double farthest = 8e9;  // about 250 years, what the clock holds
-    if (!(std::abs(seconds) < farthest)) return damaged("A date of the binary property list is out of range");
+    using Seconds = std::chrono::duration<double>;
     constexpr std::chrono::sys_days epoch{std::chrono::year{2001} / 1 / 1};
-    return PropertyList(Date{epoch} +
-                        std::chrono::duration_cast<Date::duration>(std::chrono::duration<double>(seconds)));
+    const Seconds seconds = epoch.time_since_epoch() + Seconds(std::bit_cast<double>(number(at + 1, 8)));
+    if (std::isnan(seconds.count())) return damaged("A date of the binary property list is no time");
+    const Seconds held = std::clamp<Seconds>(seconds, kEarliestDay.time_since_epoch(), kLatestDay.time_since_epoch());
+    return PropertyList(Date{std::chrono::duration_cast<Date::duration>(held)});
   }
 
-  Result<PropertyList> bytes(unsigned kind, Span span) const {
+  Result<PropertyList> bytes(unsigned kind, Span span) {
     const std::uint64_t width = kind == 0x6 ? 2 : 1;
     if (span.count > _bytes.size() || !holds(span.start, span.count * width))
       return damaged("A text of the binary property list is cut short");
+    _unfolded += span.count * width;
+    if (_unfolded > kMostUnfolded) return damaged("The binary property list unfolds to too many bytes");
     const std::string_view part = _bytes.substr(span.start, span.count * width);
     if (kind == 0x4) return PropertyList(Data(part.begin(), part.end()));
-    if (kind == 0x5) return PropertyList(std::string(part));
+    if (kind == 0x5) return PropertyList(isXmlText(part) ? std::string(part) : xmlTextFrom(part));
     std::string text;
     for (std::uint64_t i = 0; i < span.count; ++i) {
       auto unit = static_cast<std::uint32_t>(number(span.start + 2 * i, 2));
@@ -163,7 +170,7 @@ class Reader {
       }
       appendUtf8(text, unit);
     }
-    return PropertyList(std::move(text));
+    return PropertyList(isXmlText(text) ? std::move(text) : xmlTextFrom(text));
   }
 
   [[nodiscard]] bool holdsReferences(Span span, std::uint64_t each) const {
@@ -207,6 +214,7 @@ class Reader {
   std::uint64_t _count = 0;
   std::uint64_t _table = 0;
   std::size_t _seen = 0;
+  std::uint64_t _unfolded = 0;
 };
 
 }  // namespace

@@ -5,7 +5,8 @@
 
 namespace quilt::platform {
 
-/// Property lists in their XML form, on the installed files; reads the binary form too.
+/// Property lists in their XML form, on the installed files; reads the binary form too. What memory does not suffice
+/// for is an error, but for serialize, which throws as any text may.
 class XmlPropertyLists final : public PropertyLists {
  public:
   [[nodiscard]] Result<PropertyList> parse(std::string_view bytes) const override;

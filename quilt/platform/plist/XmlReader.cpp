@@ -1,20 +1,58 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "quilt/platform/plist/XmlReader.h"
 
+#include <locale.h>
+#include <stdlib.h>
+
 #include <algorithm>
 #include <charconv>
 #include <pugixml.hpp>
 #include <unordered_map>
+#include <utility>
 
 #include "quilt/platform/plist/Base64.h"
+#include "quilt/platform/plist/Limits.h"
+#include "quilt/platform/plist/XmlText.h"
 
 namespace quilt::platform {
 
 namespace {
 
-constexpr unsigned kOptions = pugi::parse_cdata | pugi::parse_escapes | pugi::parse_eol | pugi::parse_ws_pcdata_single;
+// The first text of an element is kept in the element itself, which saves every second node.
+constexpr unsigned kOptions = pugi::parse_cdata | pugi::parse_escapes | pugi::parse_eol | pugi::parse_embed_pcdata;
 
-Error damaged(std::string text) { return {ErrorKind::Damaged, std::move(text), {}}; }
+Error damaged(std::string_view what, std::ptrdiff_t place) {
+  return {ErrorKind::Damaged, std::string(what) + " (at byte " + std::to_string(place) + ")", {}};
+}
+
+Error errorOf(const pugi::xml_parse_result& parsed) {
+  if (parsed.status == pugi::status_out_of_memory) return {ErrorKind::InputOutput, "There is not enough memory", {}};
+  return damaged(parsed.description(), parsed.offset);
+}
+
+/// Whether a byte is a character or a part of one, as far as a look at the first two tells.
+bool isInBytes(std::string_view buffer) { return buffer.size() > 1 && buffer[0] == '<' && buffer[1] != '\0'; }
+
+/// Whether comments, sections or instructions may split a text. What stands before the root looks alike, but for the
+/// usual first lines.
+bool mayHoldSplitTexts(std::string_view buffer) {
+  if (!isInBytes(buffer)) return true;
+  const auto holds = [buffer](char mark, std::string_view expected) {
+    for (std::size_t at = buffer.find(mark, 1); at != std::string_view::npos; at = buffer.find(mark, at + 1))
+      if (buffer[at - 1] == '<' && !buffer.substr(at + 1).starts_with(expected)) return true;
+    return false;
+  };
+  return holds('!', "DOCTYPE") || holds('?', "xml ");
+}
+
+/// Whether the parser may answer texts that could not be written again: it takes bytes and numbered characters as they
+/// come.
+bool mayHoldForeignBytes(std::string_view buffer) {
+  if (!isInBytes(buffer)) return true;
+  for (std::size_t at = buffer.find('&'); at != std::string_view::npos; at = buffer.find('&', at + 1))
+    if (buffer.substr(at + 1).starts_with('#')) return true;
+  return !isXmlText(buffer);
+}
 
 std::string_view trimmed(std::string_view text) {
   constexpr std::string_view space = " \t\r\n";
@@ -23,141 +61,186 @@ std::string_view trimmed(std::string_view text) {
                                          : text.substr(first, text.find_last_not_of(space) - first + 1);
 }
 
-/// The element's text; comments and sections in between do not split it.
-std::string textOf(pugi::xml_node element) {
-  const pugi::xml_node only = element.first_child();
-  if (only && !only.next_sibling()) return only.value();
-  std::string text;
-  for (const pugi::xml_node piece : element.children()) text += piece.value();
-  return text;
+bool isBlank(std::string_view text) { return trimmed(text).empty(); }
+
+std::string_view withoutPlus(std::string_view text) {
+  const bool isMarked = text.size() > 1 && text[0] == '+' && text[1] != '-' && text[1] != '+';
+  return isMarked ? text.substr(1) : text;
+}
+
+/// Reads the whole text as a number; invalid_argument when it is none.
+template <class Number, class... Base>
+std::errc numberFrom(std::string_view text, Number& number, Base... base) {
+  const auto [stop, problem] = std::from_chars(text.data(), text.data() + text.size(), number, base...);
+  return stop == text.data() + text.size() && !text.empty() ? problem : std::errc::invalid_argument;
+}
+
+std::optional<double> realFrom(std::string_view text) {
+  text = withoutPlus(trimmed(text));
+  double number = 0;
+  const std::errc problem = numberFrom(text, number);
+  if (problem == std::errc()) return number;
+  if (problem != std::errc::result_out_of_range) return std::nullopt;
+  // Beyond the range of reals: strtod tells whether that is infinity or nothing, here in no one's language.
+  static const locale_t plain = newlocale(LC_ALL_MASK, "C", nullptr);
+  return strtod_l(std::string(text).c_str(), nullptr, plain);
 }
 
 std::optional<PropertyList> integerFrom(std::string_view text) {
-  text = trimmed(text);
-  if (text.starts_with('+')) text.remove_prefix(1);
-  const bool isNegative = text.starts_with('-');
-  const bool isHexadecimal = text.starts_with("0x") || text.starts_with("0X");
-  const char* begin = text.data() + (isHexadecimal ? 2 : 0);
-  const char* end = text.data() + text.size();
+  text = withoutPlus(trimmed(text));
+  if (text.starts_with("0x") || text.starts_with("0X")) {
+    std::uint64_t number = 0;
+    if (numberFrom(text.substr(2), number, 16) != std::errc()) return std::nullopt;
+    return std::in_range<std::int64_t>(number) ? PropertyList(static_cast<std::int64_t>(number))
+                                               : PropertyList(static_cast<double>(number));
+  }
   std::int64_t number = 0;
-  const auto [stop, problem] = std::from_chars(begin, end, number, isHexadecimal ? 16 : 10);
-  if (stop != end || begin == end) return std::nullopt;
+  const std::errc problem = numberFrom(text, number);
   if (problem == std::errc()) return PropertyList(number);
-  // Beyond 64 signed bits: the nearest real is closer to it than any integer that fits.
-  double real = 0;
-  if (!isHexadecimal && std::from_chars(begin, end, real).ec == std::errc()) return PropertyList(real);
-  return PropertyList(isNegative ? INT64_MIN : INT64_MAX);
+  if (problem != std::errc::result_out_of_range) return std::nullopt;
+  // The nearest real is closer to it than any integer that fits.
+  const auto real = realFrom(text);
+  return real ? std::optional<PropertyList>(*real) : std::nullopt;
 }
 
-std::optional<PropertyList> realFrom(std::string_view text) {
-  text = trimmed(text);
-  if (text.starts_with('+')) text.remove_prefix(1);
-  double number = 0;
-  const auto [stop, problem] = std::from_chars(text.data(), text.data() + text.size(), number);
-  if (stop != text.data() + text.size() || text.empty()) return std::nullopt;
-  if (problem == std::errc()) return PropertyList(number);
-  return std::nullopt;
-}
-
+/// Makes values of elements. After the first failure only error() is of use.
 class Builder {
  public:
-  Result<PropertyList> value(pugi::xml_node element, std::size_t depth) {
-    if (depth > kDeepestNesting) return wrong(element, "nests too deeply");
+  explicit Builder(bool repairsTexts) : _repairsTexts(repairsTexts) {}
+
+  bool read(pugi::xml_node element, std::size_t depth, PropertyList& value) {
+    if (depth > kDeepestNesting) return fail(element, "nests too deeply");
     const std::string_view name = element.name();
-    if (name == "string") return PropertyList(textOf(element));
-    if (name == "dict") return dictionary(element, depth);
-    if (name == "array") return array(element, depth);
-    if (name == "true") return PropertyList(true);
-    if (name == "false") return PropertyList(false);
-    std::optional<PropertyList> scalar;
-    const std::string text = textOf(element);
-    if (name == "integer") {
-      scalar = integerFrom(text);
-    } else if (name == "real") {
-      scalar = realFrom(text);
-    } else if (name == "date") {
-      if (const auto date = parseIso8601(trimmed(text))) scalar = PropertyList(*date);
-    } else if (name == "data") {
-      if (auto data = decodeBase64(text)) scalar = PropertyList(*std::move(data));
-    } else {
-      return wrong(element, "is no kind of value");
+    if (name == "string") {
+      std::string text;
+      if (!readText(element, text)) return false;
+      value = PropertyList(std::move(text));
+      return true;
     }
-    if (!scalar) return wrong(element, "cannot be read");
-    return *std::move(scalar);
+    if (name == "dict") return readDictionary(element, depth, value);
+    if (name == "array") return readArray(element, depth, value);
+    if (!readText(element, _text)) return false;
+    if (name == "true" || name == "false") {
+      if (!isBlank(_text)) return fail(element, "holds text");
+      value = PropertyList(name == "true");
+      return true;
+    }
+    std::optional<PropertyList> scalar;
+    if (name == "integer") {
+      scalar = integerFrom(_text);
+    } else if (name == "real") {
+      if (const auto real = realFrom(_text)) scalar = PropertyList(*real);
+    } else if (name == "date") {
+      if (const auto date = parseIso8601(trimmed(_text))) scalar = PropertyList(*date);
+    } else if (name == "data") {
+      if (auto data = decodeBase64(_text)) scalar = PropertyList(*std::move(data));
+    } else {
+      return fail(element, "is no kind of value");
+    }
+    if (!scalar) return fail(element, "cannot be read");
+    value = *std::move(scalar);
+    return true;
   }
 
-  /// Where the last error lies in the buffer.
-  [[nodiscard]] std::ptrdiff_t place() const { return _place; }
+  [[nodiscard]] Error error() const { return damaged(_what, _place); }
 
  private:
-  Result<PropertyList> array(pugi::xml_node element, std::size_t depth) {
-    Array items;
-    for (const pugi::xml_node child : element.children()) {
-      if (child.type() != pugi::node_element) {
-        if (trimmed(child.value()).empty()) continue;
-        return wrong(element, "holds text between its values");
-      }
-      auto item = value(child, depth + 1);
-      if (!item) return item.error();
-      items.push_back(*std::move(item));
+  bool readText(pugi::xml_node element, std::string& text) {
+    text = element.value();
+    for (pugi::xml_node piece = element.first_child(); piece; piece = piece.next_sibling()) {
+      if (piece.type() == pugi::node_element) return fail(piece, "stands inside a text");
+      text += piece.value();
     }
-    return PropertyList(std::move(items));
+    if (_repairsTexts && !isXmlText(text)) text = xmlTextFrom(text);
+    return true;
   }
 
-  Result<PropertyList> dictionary(pugi::xml_node element, std::size_t depth) {
+  bool readArray(pugi::xml_node element, std::size_t depth, PropertyList& value) {
+    if (!isBlank(element.value())) return fail(element, "holds text between its values");
+    Array items;
+    for (pugi::xml_node child = element.first_child(); child; child = child.next_sibling()) {
+      if (isSpace(child)) continue;
+      items.emplace_back(false);
+      if (!read(child, depth + 1, items.back())) return false;
+    }
+    value = PropertyList(std::move(items));
+    return true;
+  }
+
+  bool readDictionary(pugi::xml_node element, std::size_t depth, PropertyList& value) {
+    if (!isBlank(element.value())) return fail(element, "holds text between its values");
+    std::size_t count = 0;
+    for (pugi::xml_node child = element.first_child(); child; child = child.next_sibling()) ++count;
     Dictionary entries;
+    entries.reserve(count / 2);
     pugi::xml_node key;
-    for (const pugi::xml_node child : element.children()) {
-      if (child.type() != pugi::node_element) {
-        if (trimmed(child.value()).empty()) continue;
-        return wrong(element, "holds text between its values");
-      }
+    std::string name;
+    for (pugi::xml_node child = element.first_child(); child; child = child.next_sibling()) {
+      if (isSpace(child)) continue;
       const bool isKey = std::string_view(child.name()) == "key";
-      if (isKey == static_cast<bool>(key)) return wrong(child, isKey ? "follows another key" : "has no key");
+      if (isKey == static_cast<bool>(key)) return fail(child, isKey ? "follows another key" : "has no key");
       if (isKey) {
+        if (!readText(child, name)) return false;
         key = child;
         continue;
       }
-      auto item = value(child, depth + 1);
-      if (!item) return item.error();
-      entries.append(textOf(key), *std::move(item));
+      PropertyList item(false);
+      if (!read(child, depth + 1, item)) return false;
+      entries.append(std::exchange(name, {}), std::move(item));
       key = {};
     }
-    if (key) return wrong(key, "has no value");
+    if (key) return fail(key, "has no value");
     dropRepeatedKeys(entries);
-    return PropertyList(std::move(entries));
+    value = PropertyList(std::move(entries));
+    return true;
   }
 
-  Error wrong(pugi::xml_node element, const std::string& what) {
+  /// Whether it is the space between values; other text is no element and so fails as one.
+  static bool isSpace(pugi::xml_node child) { return child.type() != pugi::node_element && isBlank(child.value()); }
+
+  bool fail(pugi::xml_node element, std::string_view what) {
+    const bool isElement = element.type() == pugi::node_element;
+    constexpr std::size_t longest = 32;  // of a name that the file made up
+    const std::string name = xmlTextFrom(std::string_view(element.name()).substr(0, longest));
+    _what = isElement ? "<" + name + "> " : "A text ";
+    _what += what;
     _place = element.offset_debug();
-    return damaged("<" + std::string(element.name()) + "> " + what);
+    return false;
   }
 
-  std::ptrdiff_t _place = -1;
+  const bool _repairsTexts;
+  std::string _text;  // of the scalar being read
+  std::string _what;
+  std::ptrdiff_t _place = 0;
 };
 
-std::string atByte(std::ptrdiff_t place) { return " (at byte " + std::to_string(place) + ")"; }
-
-/// Whether any two entries share a key. Records are small, and comparing lengths settles most pairs.
-bool hasRepeatedKeys(const Dictionary& dictionary) {
+/// Whether any two entries may share a key. Records are small, and comparing lengths settles most pairs.
+bool mayRepeatKeys(const Dictionary& dictionary) {
   constexpr std::size_t small = 32;
   if (dictionary.size() > small) return true;  // looked at properly
-  for (auto one = dictionary.begin(); one != dictionary.end(); ++one)
-    for (auto other = one + 1; other != dictionary.end(); ++other)
+  const auto end = dictionary.end();
+  for (auto one = dictionary.begin(); one != end; ++one)
+    for (auto other = one + 1; other != end; ++other)
       if (one->first == other->first) return true;
   return false;
+}
+
+pugi::xml_node nextElement(pugi::xml_node node) {
+  while (node && node.type() != pugi::node_element) node = node.next_sibling();
+  return node;
 }
 
 }  // namespace
 
 void dropRepeatedKeys(Dictionary& dictionary) {
-  if (!hasRepeatedKeys(dictionary)) return;
+  if (!mayRepeatKeys(dictionary)) return;
   std::unordered_map<std::string_view, std::size_t> last;
   last.reserve(dictionary.size());
   std::size_t position = 0;
   for (const auto& [key, value] : dictionary) last[key] = position++;
   if (last.size() == dictionary.size()) return;
   Dictionary unique;
+  unique.reserve(last.size());
   for (const auto& [key, value] : dictionary) {
     const auto found = last.find(key);
     if (found == last.end()) continue;
@@ -168,20 +251,25 @@ void dropRepeatedKeys(Dictionary& dictionary) {
 }
 
 Result<PropertyList> readXml(std::string& buffer) {
+  const auto tags = std::count(buffer.begin(), buffer.end(), '<') + std::count(buffer.begin(), buffer.end(), '=');
+  if (std::cmp_greater(tags, kMostTags)) return damaged("The property list holds too many values", 0);
+  const unsigned space = mayHoldSplitTexts(buffer) ? pugi::parse_ws_pcdata : pugi::parse_ws_pcdata_single;
+  Builder builder(mayHoldForeignBytes(buffer));
   pugi::xml_document document;
-  const auto parsed = document.load_buffer_inplace(buffer.data(), buffer.size(), kOptions);
-  if (!parsed) return damaged(std::string(parsed.description()) + atByte(parsed.offset));
+  const auto parsed = document.load_buffer_inplace(buffer.data(), buffer.size(), kOptions | space);
+  if (!parsed) return errorOf(parsed);
+
   const pugi::xml_node root = document.document_element();
-  pugi::xml_node content;
-  for (const pugi::xml_node child : root.children()) {
-    if (child.type() != pugi::node_element) continue;
-    if (content) return damaged("The property list holds more than one value");
-    content = child;
-  }
-  if (std::string_view(root.name()) != "plist" || !content) return damaged("This is no property list");
-  Builder builder;
-  auto value = builder.value(content, 1);
-  if (!value) return damaged(value.error().text + atByte(builder.place()));
+  if (std::string_view(root.name()) != "plist") return damaged("This is no property list", root.offset_debug());
+  if (const auto other = nextElement(root.next_sibling()))
+    return damaged("Something follows the property list", other.offset_debug());
+  const pugi::xml_node content = nextElement(root.first_child());
+  if (!content) return damaged("The property list holds no value", root.offset_debug());
+  if (const auto other = nextElement(content.next_sibling()))
+    return damaged("The property list holds more than one value", other.offset_debug());
+
+  PropertyList value(false);
+  if (!builder.read(content, 1, value)) return builder.error();
   return value;
 }
 

@@ -5,18 +5,12 @@
 #include <charconv>
 #include <cmath>
 
-#include "quilt/platform/base/Utf8.h"
 #include "quilt/platform/plist/Base64.h"
+#include "quilt/platform/plist/XmlText.h"
 
 namespace quilt::platform {
 
 namespace {
-
-/// Whether XML 1.0 may hold the character.
-bool isXmlCharacter(const Utf8Character& character) {
-  const char32_t code = character.code;
-  return character.isValid && (code >= 0x20 || code == '\t' || code == '\n') && code != 0xFFFE && code != 0xFFFF;
-}
 
 class Writer {
  public:

@@ -39,7 +39,7 @@ class ForgetfulDisk : public SystemCalls {
   struct Identity {
     dev_t device;
     ino_t inode;
-    auto operator<=>(const Identity&) const = default;
+    auto operator<=>(const Identity&) const = default;  // NOLINT(modernize-use-nullptr): its own expansion
   };
   struct Item {
     Descriptor pin;  // keeps the inode, and its number, from being given to another file

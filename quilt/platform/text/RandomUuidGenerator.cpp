@@ -2,6 +2,7 @@
 #include "quilt/platform/text/RandomUuidGenerator.h"
 
 #include <sys/random.h>
+#include <unistd.h>
 
 #include <array>
 #include <cstdint>
@@ -11,23 +12,29 @@ namespace quilt::platform {
 
 namespace {
 
+using Bytes = std::array<std::uint8_t, 16>;
+
 /// Random bytes, fetched for many UUIDs at once: loading a library makes a hundred thousand.
 class Pool {
  public:
-  std::uint8_t next() {
-    if (_used == _bytes.size()) refill();
-    return _bytes[_used++];
+  const Bytes& next() {
+    // A process made by fork must not go on with its parent's bytes.
+    const pid_t process = ::getpid();
+    if (process != _process || _used == _uuids.size()) refill();
+    _process = process;
+    return _uuids[_used++];
   }
 
  private:
   void refill() {
     // Up to 256 bytes come whole and without interruption; without random numbers there are no identities.
-    if (::getrandom(_bytes.data(), _bytes.size(), 0) != static_cast<ssize_t>(_bytes.size())) std::abort();
+    if (::getrandom(_uuids.data(), sizeof _uuids, 0) != static_cast<ssize_t>(sizeof _uuids)) std::abort();
     _used = 0;
   }
 
-  std::array<std::uint8_t, 256> _bytes{};
-  std::size_t _used = _bytes.size();
+  std::array<Bytes, 16> _uuids{};
+  std::size_t _used = _uuids.size();
+  pid_t _process = 0;
 };
 
 }  // namespace
@@ -35,15 +42,15 @@ class Pool {
 std::string RandomUuidGenerator::generateUUID() {
   thread_local Pool pool;
   constexpr char hex[] = "0123456789ABCDEF";
-  std::string text;
-  text.reserve(36);
-  for (int i = 0; i < 16; ++i) {
-    if (i == 4 || i == 6 || i == 8 || i == 10) text += '-';
-    unsigned byte = pool.next();
-    if (i == 6) byte = 0x40U | (byte & 0x0FU);  // version 4
-    if (i == 8) byte = 0x80U | (byte & 0x3FU);  // the standard variant
-    text += hex[byte >> 4U];
-    text += hex[byte & 15U];
+  Bytes bytes = pool.next();
+  bytes[6] = static_cast<std::uint8_t>(0x40U | (bytes[6] & 0x0FU));  // version 4
+  bytes[8] = static_cast<std::uint8_t>(0x80U | (bytes[8] & 0x3FU));  // the standard variant
+  std::string text(36, '-');
+  char* out = text.data();
+  for (std::size_t i = 0; i < bytes.size(); ++i) {
+    if (i == 4 || i == 6 || i == 8 || i == 10) ++out;
+    *out++ = hex[bytes[i] >> 4U];
+    *out++ = hex[bytes[i] & 15U];
   }
   return text;
 }

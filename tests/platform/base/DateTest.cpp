@@ -31,6 +31,7 @@ TEST(DateTest, ReadsWhatItWrites) {
 TEST(DateTest, ClampsWhatTheClockCannotHold) {
   EXPECT_EQ("1678-01-01T00:00:00Z", formatIso8601(*parseIso8601("0001-01-01T00:00:00Z")));
   EXPECT_EQ("2262-01-01T23:00:00Z", formatIso8601(*parseIso8601("9999-12-31T23:00:00Z")));
+  EXPECT_EQ("2262-01-01T23:59:59Z", formatIso8601(*parseIso8601("9999-12-31T23:59:60Z")));
 }
 
 TEST(DateTest, RefusesEverythingElse) {

@@ -2,6 +2,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <chrono>
 #include <cmath>
 #include <cstring>
 #include <numbers>
@@ -9,6 +10,7 @@
 #include "quilt/platform/ffmpeg/FfmpegAudioPreview.h"
 #include "tests/support/MediaFixtures.h"
 #include "tests/support/ScratchFolder.h"
+#include "tests/support/SourceServices.h"
 
 namespace quilt::platform {
 namespace {
@@ -20,8 +22,8 @@ using Samples = std::vector<std::int16_t>;
 
 class FfmpegAudioPreviewTest : public ::testing::Test {
  protected:
-  Result<void> extract(const std::filesystem::path& source) {
-    return FfmpegAudioPreview().extractAudioSamplesFromAssetURL(Url::fileUrl(source), Url::fileUrl(_output));
+  Result<void> extract(const std::filesystem::path& source, const ContinueBlock& goesOn = {}) {
+    return FfmpegAudioPreview().extractAudioSamplesFromAssetURL(Url::fileUrl(source), Url::fileUrl(_output), goesOn);
   }
   // The bytes of the samples file.
   std::string samplesOf(const std::filesystem::path& source) {
@@ -244,16 +246,72 @@ TEST_F(FfmpegAudioPreviewTest, NoTemporaryFileIsLeftWhenItSucceeds) {
   EXPECT_EQ(std::distance(std::filesystem::directory_iterator(_folder.path()), {}), 1);
 }
 
+// ---- Stopping
+
+TEST_F(FfmpegAudioPreviewTest, AFalseAnswerStopsALongFileAtOnceAndLeavesNothing) {
+  const std::filesystem::path source = support::longSilence();
+  int asked = 0;
+  bool wroteMeanwhile = false;
+  auto answered = std::chrono::steady_clock::time_point::max();
+  const Result<void> result = extract(source, [&] {
+    if (++asked < 1000) return true;
+    wroteMeanwhile = !std::filesystem::is_empty(_folder.path());
+    answered = std::chrono::steady_clock::now();
+    return false;
+  });
+  EXPECT_LT(std::chrono::steady_clock::now() - answered, std::chrono::seconds(1));
+  ASSERT_FALSE(result);
+  EXPECT_EQ(result.error().kind, ErrorKind::Cancelled);
+  EXPECT_EQ(result.error().text, "Reading the sound was stopped.");
+  EXPECT_EQ(result.error().file, source);
+  EXPECT_EQ(asked, 1000) << "a false answer is final";
+  EXPECT_TRUE(wroteMeanwhile) << "it was stopped before it began";
+  EXPECT_TRUE(std::filesystem::is_empty(_folder.path()));
+}
+
+TEST_F(FfmpegAudioPreviewTest, ItAsksManyTimesASecond) {
+  const std::filesystem::path source = support::longSilence();
+  using Clock = std::chrono::steady_clock;
+  const Clock::time_point start = Clock::now();
+  Clock::time_point last = start;
+  Clock::duration longest{};
+  const Result<void> result = extract(source, [&] {
+    const Clock::time_point now = Clock::now();
+    longest = std::max(longest, now - last);
+    last = now;
+    return now - start < std::chrono::milliseconds(500);
+  });
+  ASSERT_FALSE(result);
+  EXPECT_EQ(result.error().kind, ErrorKind::Cancelled);
+  EXPECT_LT(longest, std::chrono::milliseconds(500));
+}
+
+TEST_F(FfmpegAudioPreviewTest, StoppingBeforeItBeginsOpensNoOutput) {
+  const Result<void> result = extract(makeMedia(support::mp3Sound()), [] { return false; });
+  ASSERT_FALSE(result);
+  EXPECT_EQ(result.error().kind, ErrorKind::Cancelled);
+  EXPECT_TRUE(std::filesystem::is_empty(_folder.path()));
+}
+
+TEST_F(FfmpegAudioPreviewTest, AnAnswerThatStaysTrueChangesNothing) {
+  const std::filesystem::path source = makeMedia(support::mp3Sound());
+  const std::string alone = samplesOf(source);
+  int asked = 0;
+  ASSERT_TRUE(extract(source, [&asked] { return ++asked > 0; }));
+  EXPECT_GT(asked, 10);
+  EXPECT_TRUE(support::readBytes(_output) == alone);
+}
+
 TEST_F(FfmpegAudioPreviewTest, AMissingFolderIsReported) {
   const Result<void> result = FfmpegAudioPreview().extractAudioSamplesFromAssetURL(
-      Url::fileUrl(makeWav(Samples(600), 1)), Url::fileUrl(_folder / "missing" / "sound.asc"));
+      Url::fileUrl(makeWav(Samples(600), 1)), Url::fileUrl(_folder / "missing" / "sound.asc"), {});
   ASSERT_FALSE(result);
   EXPECT_EQ(result.error().kind, ErrorKind::NotFound);
 }
 
 TEST_F(FfmpegAudioPreviewTest, WebAddressesAreRefused) {
   const Result<void> result = FfmpegAudioPreview().extractAudioSamplesFromAssetURL(
-      *Url::parse("http://example.com/a.mp3"), Url::fileUrl(_output));
+      *Url::parse("http://example.com/a.mp3"), Url::fileUrl(_output), {});
   ASSERT_FALSE(result);
   EXPECT_EQ(result.error().kind, ErrorKind::Unsupported);
 }
