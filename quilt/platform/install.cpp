@@ -32,6 +32,7 @@
 #include "quilt/platform/vips/VipsInspector.h"
 #endif
 #if QUILT_WITH_MUPDF
+#include "quilt/platform/mupdf/MupdfDocuments.h"
 #include "quilt/platform/mupdf/MupdfInspector.h"
 #endif
 #if QUILT_WITH_ZIP
@@ -70,9 +71,9 @@ class BuildDiagnostics final : public Diagnostics {
     list.push_back(leftOut("Composed posters", "-DQUILT_WITH_CAIRO"));
 #endif
 #if QUILT_WITH_MUPDF
-    list.push_back({"PDF and EPUB inspection", true, MupdfInspector::version(), ""});
+    list.push_back({"PDF and EPUB pages", true, MupdfInspector::version(), ""});
 #else
-    list.push_back(leftOut("PDF and EPUB inspection", "-DQUILT_WITH_MUPDF"));
+    list.push_back(leftOut("PDF and EPUB pages", "-DQUILT_WITH_MUPDF"));
 #endif
 #if QUILT_WITH_ZIP
     list.push_back({"Zip archives", true, ZipArchive::version(), ""});
@@ -132,6 +133,11 @@ void install() {
 #else
   set.movies = std::make_shared<AbsentMovieToolkit>();
   set.audioPreview = std::make_shared<AbsentAudioPreview>();
+#endif
+#if QUILT_WITH_MUPDF
+  set.documents = std::make_shared<MupdfDocuments>();
+#else
+  set.documents = std::make_shared<AbsentDocumentToolkit>();
 #endif
   set.transcoder = std::make_shared<AbsentTranscoder>();
 #if QUILT_WITH_ZIP

@@ -3,6 +3,7 @@
 
 #include <mupdf/fitz.h>
 
+#include <chrono>
 #include <cstddef>
 #include <filesystem>
 #include <functional>
@@ -17,8 +18,12 @@ namespace quilt::platform::mupdf {
 /// The most memory that one document may take while it is looked at.
 inline constexpr std::size_t kMaximumMemory = 256 << 20;
 
-/// One call's use of MuPDF, which reports failures by long jumps. Shares nothing with other contexts, so any number may
-/// be used at once, each by one thread. Scripts in documents are never run, and nothing is written to standard error.
+/// The longest that one step of the work on a document may take.
+inline constexpr std::chrono::seconds kMaximumTime{20};
+
+/// A use of MuPDF, which reports failures by long jumps. Shares nothing with other contexts, so any number may
+/// be used at once, each by one thread at a time. Scripts in documents are never run, and nothing is written to
+/// standard error.
 class MupdfContext {
  public:
   MupdfContext();
@@ -30,6 +35,9 @@ class MupdfContext {
   /// middle, so it owns nothing that needs a destructor.
   Result<void> run(std::string_view sentence, const std::filesystem::path& file,
                    const std::function<void(fz_context*)>& body);
+
+  /// What stops a page that is being drawn or read for text once it takes too long. For `body`.
+  fz_cookie* cookie() { return &_budget.cookie; }
 
   /// The C object's owner: drops it with MuPDF's function. Must not outlive the context.
   template <class T>
@@ -50,8 +58,16 @@ class MupdfContext {
   };
 
  private:
+  static constexpr auto kNever = std::chrono::steady_clock::time_point::max();
+
   struct Budget {
     std::size_t used = 0;
+    unsigned count = 0;
+    std::chrono::steady_clock::time_point deadline = kNever;
+    bool isLate = false;
+    fz_cookie cookie{};
+
+    bool isOver();
   };
   static void* allocate(void* user, std::size_t size);
   static void* reallocate(void* user, void* old, std::size_t size);
