@@ -10,6 +10,7 @@
 #include "quilt/platform/inspection/CachedInspection.h"
 #include "quilt/platform/inspection/InspectionByKind.h"
 #include "quilt/platform/interfaces/Services.h"
+#include "quilt/platform/office/OfficeDocuments.h"
 #include "quilt/platform/plist/XmlPropertyLists.h"
 #include "quilt/platform/runloop/BuiltInRunLoop.h"
 #include "quilt/platform/text/IcuDateFormatter.h"
@@ -75,6 +76,7 @@ class BuildDiagnostics final : public Diagnostics {
 #else
     list.push_back(leftOut("PDF and EPUB pages", "-DQUILT_WITH_MUPDF"));
 #endif
+    list.push_back(OfficeDocuments::capability());
 #if QUILT_WITH_ZIP
     list.push_back({"Zip archives", true, ZipArchive::version(), ""});
 #else
@@ -135,7 +137,7 @@ void install() {
   set.audioPreview = std::make_shared<AbsentAudioPreview>();
 #endif
 #if QUILT_WITH_MUPDF
-  set.documents = std::make_shared<MupdfDocuments>();
+  set.documents = std::make_shared<OfficeDocuments>(std::make_shared<MupdfDocuments>());
 #else
   set.documents = std::make_shared<AbsentDocumentToolkit>();
 #endif

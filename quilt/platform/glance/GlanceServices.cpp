@@ -85,7 +85,7 @@ std::shared_ptr<ImageWrapper> GlanceServices::pictureOfPage(const std::filesyste
   if (!found) return nullptr;
   const Result<Size> points = found->document->sizeOfPage(index);
   if (points) return std::make_shared<PageImage>(PageImage::Page{_documents, path, found->identity, index}, *points);
-  if (points.error().kind != ErrorKind::NotFound) _documents->warn(found->identity, points.error());
+  if (points.error().kind != ErrorKind::NotFound) _documents->warn(path, found->identity, points.error());
   return nullptr;
 }
 
@@ -108,7 +108,7 @@ std::optional<DocumentPage> GlanceServices::documentPageAtIndex(const std::files
   if (!found) return std::nullopt;
   // A page whose text cannot be read is shown without it.
   const Result<std::string> text = found->document->textOfPage(index);
-  if (!text) _documents->warn(found->identity, text.error());
+  if (!text) _documents->warn(path, found->identity, text.error());
   return DocumentPage{image, text ? *text : std::string()};
 }
 

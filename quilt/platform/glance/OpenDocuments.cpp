@@ -46,7 +46,7 @@ Result<OpenDocuments::Found> OpenDocuments::open(const std::filesystem::path& pa
   }
   // Unlocked: it may take long, and two threads that open one document at once do no harm.
   Result<std::shared_ptr<PagedDocument>> opened = services().documents->openDocument(path);
-  if (!opened) warn(identity, opened.error());
+  if (!opened) warn(path, identity, opened.error());
   const std::lock_guard lock(_mutex);
   Entry& known = entry(identity);
   if (!opened) {
@@ -88,7 +88,7 @@ Result<std::size_t> OpenDocuments::pageCount(const std::filesystem::path& path) 
   const Result<Found> found = open(path);
   if (!found) return found.error();
   const Result<std::size_t> count = found->document->pageCount();
-  if (!count) warn(found->identity, count.error());
+  if (!count) warn(path, found->identity, count.error());
   const std::lock_guard lock(_mutex);
   Entry& known = entry(found->identity);
   if (count) {
@@ -100,12 +100,12 @@ Result<std::size_t> OpenDocuments::pageCount(const std::filesystem::path& path) 
   return count;
 }
 
-void OpenDocuments::warn(const FileIdentity& identity, const Error& error) {
+void OpenDocuments::warn(const std::filesystem::path& path, const FileIdentity& identity, const Error& error) {
   {
     const std::lock_guard lock(_mutex);
     if (std::exchange(entry(identity).isWarned, true)) return;
   }
-  FDYLogger::logWarning("Pages of document at path \"%@\" cannot be shown: \"%@\"", error.file, error);
+  FDYLogger::logWarning("Pages of document at path \"%@\" cannot be shown: \"%@\"", path, error);
 }
 
 }  // namespace quilt::platform

@@ -35,7 +35,7 @@ class OpenDocuments {
   Result<std::size_t> pageCount(const std::filesystem::path& path);
 
   /// Logs that the document, or a page of it, is of no use, unless that was logged of this file before.
-  void warn(const FileIdentity& identity, const Error& error);
+  void warn(const std::filesystem::path& path, const FileIdentity& identity, const Error& error);
 
  private:
   struct Entry {
