@@ -30,6 +30,9 @@ class ActingDelegate : public Delegate {
   void perform(const NewCollectionRequest& request) override;
   void perform(const NewDocumentRequest& request) override;
   void perform(const SetRequest& request) override;
+  void perform(const AddRequest& request) override;
+  void perform(const MoveRequest& request) override;
+  void perform(const ConvertRequest& request) override;
   void perform(const RemoveRequest& request) override;
   void perform(const ExportRequest& request) override;
   void perform(const DoctorRequest& request) override;
@@ -53,6 +56,9 @@ class PreviewDelegate final : public ActingDelegate {
   void perform(const NewCollectionRequest& request) override;
   void perform(const NewDocumentRequest& request) override;
   void perform(const SetRequest& request) override;
+  void perform(const AddRequest& request) override;
+  void perform(const MoveRequest& request) override;
+  void perform(const ConvertRequest& request) override;
   void perform(const RemoveRequest& request) override;
   void perform(const ExportRequest& request) override;
 

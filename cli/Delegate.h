@@ -17,6 +17,9 @@ class Delegate {
   virtual void perform(const NewCollectionRequest& request) = 0;
   virtual void perform(const NewDocumentRequest& request) = 0;
   virtual void perform(const SetRequest& request) = 0;
+  virtual void perform(const AddRequest& request) = 0;
+  virtual void perform(const MoveRequest& request) = 0;
+  virtual void perform(const ConvertRequest& request) = 0;
   virtual void perform(const RemoveRequest& request) = 0;
   virtual void perform(const ExportRequest& request) = 0;
   virtual void perform(const DoctorRequest& request) = 0;
@@ -38,6 +41,9 @@ class RecordingDelegate final : public Delegate {
   void perform(const NewCollectionRequest& request) override { commands.emplace_back(request); }
   void perform(const NewDocumentRequest& request) override { commands.emplace_back(request); }
   void perform(const SetRequest& request) override { commands.emplace_back(request); }
+  void perform(const AddRequest& request) override { commands.emplace_back(request); }
+  void perform(const MoveRequest& request) override { commands.emplace_back(request); }
+  void perform(const ConvertRequest& request) override { commands.emplace_back(request); }
   void perform(const RemoveRequest& request) override { commands.emplace_back(request); }
   void perform(const ExportRequest& request) override { commands.emplace_back(request); }
   void perform(const DoctorRequest& request) override { commands.emplace_back(request); }

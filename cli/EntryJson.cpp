@@ -21,4 +21,18 @@ Json toJson(const CollectionEntry& collection) {
   return json;
 }
 
+Json toJson(const QuiltMedia& item) {
+  return {{"uuid", item.uuid()},
+          {"title", item.title().value_or("")},
+          {"category", item.contentCategory().value_or("")},
+          {"path", item.path().native()}};
+}
+
+Json toJson(const QuiltMediaSource& source) {
+  return {{"uuid", source.uuid()},
+          {"title", source.title().value_or("")},
+          {"category", source.contentCategory().value_or("")},
+          {"path", source.path().native()}};
+}
+
 }  // namespace quilt::cli

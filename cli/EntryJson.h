@@ -3,6 +3,7 @@
 
 #include "cli/Catalogue.h"
 #include "cli/Failure.h"
+#include "quilt/media/QuiltMedia.h"
 
 namespace quilt::cli {
 
@@ -10,5 +11,9 @@ namespace quilt::cli {
 /// "documents".
 Json toJson(const DocumentEntry& document);
 Json toJson(const CollectionEntry& collection);
+
+/// {"uuid", "title", "category", "path"}.
+Json toJson(const QuiltMedia& item);
+Json toJson(const QuiltMediaSource& source);
 
 }  // namespace quilt::cli

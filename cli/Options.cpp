@@ -2,6 +2,8 @@
 #include "cli/Options.h"
 
 #include <algorithm>
+#include <charconv>
+#include <cmath>
 
 #include "cli/Failure.h"
 #include "cli/Text.h"
@@ -63,6 +65,73 @@ Command setRequest(const Arguments& arguments) {
   return request;
 }
 
+double readTimecode(const std::string& text) {
+  double seconds = 0;
+  const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), seconds);
+  if (error != std::errc() || end != text.data() + text.size() || !std::isfinite(seconds) || seconds < 0)
+    refuse("--timecode is a number of seconds, not " + inQuotes(text));
+  return seconds;
+}
+
+AddRequest::Kind kindOf(const Arguments& arguments) {
+  struct Choice {
+    const char* option;
+    AddRequest::Kind kind;
+  };
+  constexpr Choice choices[] = {{"--montage", AddRequest::Kind::Montage},
+                                {"--dual", AddRequest::Kind::DualSource},
+                                {"--extra-of", AddRequest::Kind::Extras},
+                                {"--commentary-of", AddRequest::Kind::Commentary}};
+  const Choice* chosen = nullptr;
+  for (const Choice& choice : choices) {
+    if (!arguments.has(choice.option)) continue;
+    if (chosen) refuse(std::string(chosen->option) + " and " + choice.option + " do not go together");
+    chosen = &choice;
+  }
+  return chosen ? chosen->kind : AddRequest::Kind::Items;
+}
+
+Command addRequest(const Arguments& arguments) {
+  AddRequest request{*arguments.first("DOCUMENT"), arguments.all("SOURCE"), kindOf(arguments),
+                     arguments.first("--title"), arguments.first("--commentary")};
+  using Kind = AddRequest::Kind;
+  if (request.kind == Kind::Extras) request.item = arguments.first("--extra-of");
+  if (request.kind == Kind::Commentary) request.item = arguments.first("--commentary-of");
+  for (const std::string& text : arguments.all("--timecode")) request.timecodes.push_back(readTimecode(text));
+
+  const bool areMany = request.sources.size() > 1 && request.kind != Kind::Montage && request.kind != Kind::DualSource;
+  if (request.title && !isText(*request.title)) refuse("--title is not UTF-8, or has control characters");
+  if (request.title && areMany) refuse("--title goes with one item; add the files one by one");
+  if (request.commentary && areMany) refuse("--commentary goes with one item; add the files one by one");
+  if (request.commentary && request.item) refuse("--commentary goes with new items only");
+  if (request.kind == Kind::Commentary && areMany) refuse("An item has one commentary: name one file");
+  if (request.timecodes.size() > request.sources.size()) refuse("There are more timecodes than sources");
+  return request;
+}
+
+Command moveRequest(const Arguments& arguments) {
+  MoveRequest request{*arguments.first("DOCUMENT"), arguments.all("ITEM"), 0};
+  const std::optional<std::string> to = arguments.first("--to");
+  if (!to) refuse("--to is missing: name the place to move to, counted from 0");
+  const auto [end, error] = std::from_chars(to->data(), to->data() + to->size(), request.to);
+  if (error != std::errc() || end != to->data() + to->size())
+    refuse("--to is a place counted from 0, not " + inQuotes(*to));
+  return request;
+}
+
+std::vector<std::string> formatsOf(const Arguments& arguments) {
+  std::vector<std::string> formats;
+  for (std::string& format : arguments.all("--format"))
+    if (std::find(formats.begin(), formats.end(), format) == formats.end()) formats.push_back(std::move(format));
+  return formats;
+}
+
+Command convertRequest(const Arguments& arguments) {
+  ConvertRequest request{*arguments.first("DOCUMENT"), formatsOf(arguments)};
+  if (request.formats.empty()) refuse("--format is missing: name Desktop, 720p or 480p");
+  return request;
+}
+
 Command removeRequest(const Arguments& arguments) {
   RemoveRequest request{arguments.all("OBJECT"), arguments.first("--from"), arguments.has("--force")};
   if (!request.from && request.objects.size() > 1)
@@ -71,11 +140,8 @@ Command removeRequest(const Arguments& arguments) {
 }
 
 Command exportRequest(const Arguments& arguments) {
-  ExportRequest request{
-      *arguments.first("DOCUMENT"), *arguments.first("DIR"), arguments.has("--zip"), {}, arguments.first("--theme")};
-  for (std::string& format : arguments.all("--format"))
-    if (std::find(request.formats.begin(), request.formats.end(), format) == request.formats.end())
-      request.formats.push_back(std::move(format));
+  ExportRequest request{*arguments.first("DOCUMENT"), *arguments.first("DIR"), arguments.has("--zip"),
+                        formatsOf(arguments), arguments.first("--theme")};
   if (request.formats.empty()) request.formats.emplace_back("Desktop");
   return request;
 }
@@ -181,6 +247,38 @@ const std::vector<CommandDescription>& commands() {
        {},
        true,
        setRequest},
+      {"add",
+       "add items to a document, or companions to an item",
+       "Each SOURCE becomes an item, or all of them one montage or one dual-source item; with --extra-of they\n"
+       "become extras of an item, with --commentary-of its audio commentary. Files are copied into the\n"
+       "package. Prints a line an item: UUID, category, title; of companions the UUID. A file that cannot be\n"
+       "added is reported, and the rest is done; of a montage or a dual-source item all or nothing.\n",
+       {{"DOCUMENT", "the document"},
+        {"SOURCE", "a movie, audio, image, PDF, EPUB or office file, or a web address", true, true}},
+       {{"--title", "", "T", "the title (else that in the file, else its name)"},
+        {"--montage", "", "", "make one montage of all images"},
+        {"--dual", "", "", "make one item of two sources that play together"},
+        {"--commentary", "", "FILE", "the audio commentary of the new item"},
+        {"--timecode", "", "S", "seconds at which a source stands in its item; one for each, in order", true},
+        {"--extra-of", "", "ITEM", "add extras to this item"},
+        {"--commentary-of", "", "ITEM", "set the audio commentary of this item"}},
+       true,
+       addRequest},
+      {"move",
+       "move items of a document",
+       "The items keep their order and stand together; the first of them comes to be at INDEX.\n",
+       {{"DOCUMENT", "the document"}, {"ITEM", "an item of it", true, true}},
+       {{"--to", "", "INDEX", "the place to move to, counted from 0"}},
+       true,
+       moveRequest},
+      {"convert",
+       "make the missing derivatives of a document",
+       "Every source that is larger than a format gets a smaller copy of itself. Prints a line a new\n"
+       "derivative: UUID, format, title of its source.\n",
+       {{"DOCUMENT", "the document"}},
+       {{"--format", "", "FORMAT", "Desktop, 720p or 480p", true, {"Desktop", "720p", "480p"}}},
+       true,
+       convertRequest},
       {"remove",
        "remove a document or collection, or items of a document, with the files",
        "Asks on a terminal; elsewhere --force is needed.\n",

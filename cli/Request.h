@@ -53,6 +53,32 @@ struct SetRequest {
   bool operator==(const SetRequest&) const = default;
 };
 
+struct AddRequest {
+  /// What the sources become: an item each, one item of all, or companions of an item that is there.
+  enum class Kind { Items, Montage, DualSource, Extras, Commentary };
+  std::string document;
+  std::vector<std::string> sources{};  ///< files and web addresses
+  Kind kind = Kind::Items;
+  std::optional<std::string> title{};
+  std::optional<std::string> commentary{};  ///< a file, for new items
+  std::vector<double> timecodes{};          ///< seconds, of the sources in their order
+  std::optional<std::string> item{};        ///< whom Extras and Commentary go with
+  bool operator==(const AddRequest&) const = default;
+};
+
+struct MoveRequest {
+  std::string document;
+  std::vector<std::string> items{};
+  std::size_t to = 0;  ///< the place of the first of them after the move
+  bool operator==(const MoveRequest&) const = default;
+};
+
+struct ConvertRequest {
+  std::string document;
+  std::vector<std::string> formats{};  ///< never empty
+  bool operator==(const ConvertRequest&) const = default;
+};
+
 struct RemoveRequest {
   std::vector<std::string> objects{};
   std::optional<std::string>
@@ -84,9 +110,9 @@ struct VersionRequest {
   bool operator==(const VersionRequest&) const = default;
 };
 
-using Command =
-    std::variant<ImportRequest, ListRequest, ShowRequest, InfoRequest, NewCollectionRequest, NewDocumentRequest,
-                 SetRequest, RemoveRequest, ExportRequest, DoctorRequest, HelpRequest, VersionRequest>;
+using Command = std::variant<ImportRequest, ListRequest, ShowRequest, InfoRequest, NewCollectionRequest,
+                             NewDocumentRequest, SetRequest, AddRequest, MoveRequest, ConvertRequest, RemoveRequest,
+                             ExportRequest, DoctorRequest, HelpRequest, VersionRequest>;
 
 enum class ProgressStyle { Automatic, Json, None };
 

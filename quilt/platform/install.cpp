@@ -27,6 +27,7 @@
 #include "quilt/platform/ffmpeg/FfmpegAudioPreview.h"
 #include "quilt/platform/ffmpeg/FfmpegInspector.h"
 #include "quilt/platform/ffmpeg/FfmpegMovieToolkit.h"
+#include "quilt/platform/ffmpeg/FfmpegTranscoder.h"
 #endif
 #if QUILT_WITH_VIPS
 #include "quilt/platform/vips/VipsImages.h"
@@ -132,16 +133,17 @@ void install() {
 #if QUILT_WITH_FFMPEG
   set.movies = std::make_shared<FfmpegMovieToolkit>();
   set.audioPreview = std::make_shared<FfmpegAudioPreview>();
+  set.transcoder = std::make_shared<FfmpegTranscoder>();
 #else
   set.movies = std::make_shared<AbsentMovieToolkit>();
   set.audioPreview = std::make_shared<AbsentAudioPreview>();
+  set.transcoder = std::make_shared<AbsentTranscoder>();
 #endif
 #if QUILT_WITH_MUPDF
   set.documents = std::make_shared<OfficeDocuments>(std::make_shared<MupdfDocuments>());
 #else
   set.documents = std::make_shared<AbsentDocumentToolkit>();
 #endif
-  set.transcoder = std::make_shared<AbsentTranscoder>();
 #if QUILT_WITH_ZIP
   set.archive = std::make_shared<ZipArchive>();
 #else

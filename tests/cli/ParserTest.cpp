@@ -74,6 +74,45 @@ TEST(ParserTest, TheOtherCommandsBecomeRequests) {
   EXPECT_EQ(Command(VersionRequest{}), asked({"--version"}));
 }
 
+TEST(ParserTest, AddTellsWhatTheSourcesBecome) {
+  using Kind = AddRequest::Kind;
+  EXPECT_EQ(Command(AddRequest{"D", {"a", "b"}}), asked({"add", "D", "a", "b"}));
+  EXPECT_EQ(Command(AddRequest{"D", {"a"}, Kind::Items, "T", "voice"}),
+            asked({"add", "D", "a", "--title", "T", "--commentary", "voice"}));
+  EXPECT_EQ(Command(AddRequest{"D", {"a", "b"}, Kind::Montage, "T", "voice", {0, 4.5}}),
+            asked({"add", "D", "a", "b", "--montage", "--title", "T", "--commentary", "voice", "--timecode", "0",
+                   "--timecode", "4.5"}));
+  EXPECT_EQ(Command(AddRequest{"D", {"a", "b"}, Kind::DualSource}), asked({"add", "D", "a", "b", "--dual"}));
+  EXPECT_EQ(Command(AddRequest{"D", {"a", "b"}, Kind::Extras, {}, {}, {}, "I"}),
+            asked({"add", "D", "a", "b", "--extra-of", "I"}));
+  EXPECT_EQ(Command(AddRequest{"D", {"a"}, Kind::Commentary, {}, {}, {}, "I"}),
+            asked({"add", "D", "a", "--commentary-of", "I"}));
+}
+
+TEST(ParserTest, AddRefusesWhatDoesNotGoTogether) {
+  EXPECT_THAT(complaint({"add", "D"}), HasSubstr("SOURCE is missing"));
+  EXPECT_THAT(complaint({"add", "D", "a", "--dual", "--montage"}),
+              HasSubstr("--montage and --dual do not go together"));
+  EXPECT_THAT(complaint({"add", "D", "a", "b", "--title", "T"}), HasSubstr("--title goes with one item"));
+  EXPECT_THAT(complaint({"add", "D", "a", "b", "--commentary", "v"}), HasSubstr("--commentary goes with one item"));
+  EXPECT_THAT(complaint({"add", "D", "a", "--commentary", "v", "--extra-of", "I"}), HasSubstr("new items only"));
+  EXPECT_THAT(complaint({"add", "D", "a", "b", "--commentary-of", "I"}), HasSubstr("one commentary"));
+  EXPECT_THAT(complaint({"add", "D", "a", "--timecode", "1", "--timecode", "2"}), HasSubstr("more timecodes"));
+  for (const char* wrong : {"x", "-1", "1s", "", "nan", "inf"})
+    EXPECT_THAT(complaint({"add", "D", "a", std::string("--timecode=") + wrong}), HasSubstr("--timecode")) << wrong;
+  EXPECT_THAT(complaint({"add", "D", "a", "--title", "\xff"}), HasSubstr("not UTF-8"));
+}
+
+TEST(ParserTest, MoveAndConvertNeedTheirOptions) {
+  EXPECT_EQ(Command(MoveRequest{"D", {"1", "2"}, 3}), asked({"move", "D", "1", "2", "--to", "3"}));
+  EXPECT_THAT(complaint({"move", "D", "1"}), HasSubstr("--to is missing"));
+  for (const char* wrong : {"-1", "x", "1.5", "99999999999999999999"})
+    EXPECT_THAT(complaint({"move", "D", "1", std::string("--to=") + wrong}), HasSubstr("counted from 0")) << wrong;
+  EXPECT_EQ(Command(ConvertRequest{"D", {"720p", "480p"}}),
+            asked({"convert", "D", "--format", "720p", "--format", "480P", "--format", "720p"}));
+  EXPECT_THAT(complaint({"convert", "D"}), HasSubstr("--format is missing"));
+}
+
 TEST(ParserTest, SetSplitsAtTheFirstEqualsSign) {
   EXPECT_EQ(Command(SetRequest{"D", {{"title", "a=b"}, {"author", ""}, {"keywords", "-x"}}}),
             asked({"set", "D", "title=a=b", "author=", "keywords=-x"}));

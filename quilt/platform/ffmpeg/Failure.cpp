@@ -45,4 +45,9 @@ Error failure(int code, const std::filesystem::path& file) {
   }
 }
 
+Error conversionFailure(int code, const std::filesystem::path& file) {
+  if (code != AVERROR(EINVAL)) return failure(code, file);
+  return {ErrorKind::Unsupported, "The file's pictures or sound are of a kind that cannot be converted.", file};
+}
+
 }  // namespace quilt::platform::ffmpeg

@@ -63,6 +63,14 @@ Result<void> TemporaryOutput::write(std::int64_t offset, std::string_view bytes)
   return {};
 }
 
+std::int64_t TemporaryOutput::readAt(std::int64_t offset, void* bytes, std::size_t count) const {
+  ssize_t got = 0;
+  do {
+    got = pread(_descriptor, bytes, count, offset);
+  } while (got < 0 && errno == EINTR);
+  return got;
+}
+
 Result<void> TemporaryOutput::publish() {
   if (fsync(_descriptor) != 0) return failure(AVERROR(errno), _destination);
   if (std::rename(_path.c_str(), _destination.c_str()) != 0) return failure(AVERROR(errno), _destination);

@@ -21,8 +21,10 @@ class TemporaryOutput {
   [[nodiscard]] const std::filesystem::path& path() const { return _path; }
 
   Result<void> append(std::string_view bytes);
-  /// Overwrites bytes that were written before.
+  /// Writes bytes at an offset; `append` does not take notice.
   Result<void> writeAt(std::uint64_t offset, std::string_view bytes);
+  /// Reads back up to `count` bytes; answers how many, fewer at the end, or -1.
+  std::int64_t readAt(std::int64_t offset, void* bytes, std::size_t count) const;
 
   /// Syncs the file, renames it to the destination, replacing what is there, and syncs the folder.
   Result<void> publish();

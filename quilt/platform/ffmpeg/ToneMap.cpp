@@ -14,8 +14,7 @@ namespace quilt::platform::ffmpeg {
 
 namespace {
 
-constexpr double kReferenceWhite = 203;  // cd/m², ITU-R BT.2408
-constexpr double kUsualPeak = 1000;      // cd/m², when the stream does not say
+constexpr double kUsualPeak = 1000;  // cd/m², when the stream does not say
 
 // Light in cd/m² of a PQ code value 0…1 (SMPTE ST 2084).
 double lightOfPq(double code) {
@@ -42,14 +41,15 @@ double srgbOfLight(double light) {
   return light <= 0.0031308 ? light * 12.92 : 1.055 * std::pow(light, 1 / 2.4) - 0.055;
 }
 
-double peakOf(const AVFrame& frame) {
+}  // namespace
+
+double ToneMap::peakOf(const AVFrame& frame) {
+  if (frame.color_trc == AVCOL_TRC_ARIB_STD_B67) return kUsualPeak;
   const AVFrameSideData* data = av_frame_get_side_data(&frame, AV_FRAME_DATA_CONTENT_LIGHT_LEVEL);
   if (data == nullptr) return kUsualPeak;
   const auto* level = reinterpret_cast<const AVContentLightMetadata*>(data->data);
   return level->MaxCLL == 0 ? kUsualPeak : std::clamp<double>(level->MaxCLL, kReferenceWhite * 1.01, 10'000);
 }
-
-}  // namespace
 
 bool ToneMap::isNeeded(const AVFrame& frame) {
   return isHighDynamicRange(frame.color_trc) || frame.color_primaries == AVCOL_PRI_BT2020;
@@ -59,7 +59,7 @@ ToneMap::ToneMap(const AVFrame& frame)
     : _isHybridLogGamma(frame.color_trc == AVCOL_TRC_ARIB_STD_B67),
       _isHighRange(isHighDynamicRange(frame.color_trc)),
       _isWideGamut(frame.color_primaries == AVCOL_PRI_BT2020 || frame.color_primaries == AVCOL_PRI_UNSPECIFIED),
-      _peak(static_cast<float>((_isHybridLogGamma ? kUsualPeak : peakOf(frame)) / kReferenceWhite)) {
+      _peak(static_cast<float>(peakOf(frame) / kReferenceWhite)) {
   for (std::size_t i = 0; i < kSteps; ++i) {
     const double code = static_cast<double>(i) / (kSteps - 1);
     double light = 0;

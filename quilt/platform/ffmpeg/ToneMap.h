@@ -17,6 +17,10 @@ class ToneMap {
   /// Whether a frame with these properties needs it: PQ or HLG, whatever its primaries, or BT.2020 primaries.
   static bool isNeeded(const AVFrame& frame);
 
+  static constexpr double kReferenceWhite = 203;  ///< cd/m², ITU-R BT.2408
+  /// The brightest light in the frame, in cd/m²: what the stream says, within reason, or what is usual.
+  static double peakOf(const AVFrame& frame);
+
   explicit ToneMap(const AVFrame& frame);
 
   /// `count` pixels of 16-bit RGBA, full range, to 8-bit RGBA.

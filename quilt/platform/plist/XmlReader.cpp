@@ -54,6 +54,12 @@ bool mayHoldForeignBytes(std::string_view buffer) {
   return !isXmlText(buffer);
 }
 
+bool holdsTooManyTags(std::string_view buffer) {
+  if (buffer.size() <= kMostTags) return false;
+  const auto tags = std::count(buffer.begin(), buffer.end(), '<') + std::count(buffer.begin(), buffer.end(), '=');
+  return std::cmp_greater(tags, kMostTags);
+}
+
 std::string_view trimmed(std::string_view text) {
   constexpr std::string_view space = " \t\r\n";
   const std::size_t first = text.find_first_not_of(space);
@@ -251,8 +257,7 @@ void dropRepeatedKeys(Dictionary& dictionary) {
 }
 
 Result<PropertyList> readXml(std::string& buffer) {
-  const auto tags = std::count(buffer.begin(), buffer.end(), '<') + std::count(buffer.begin(), buffer.end(), '=');
-  if (std::cmp_greater(tags, kMostTags)) return damaged("The property list holds too many values", 0);
+  if (holdsTooManyTags(buffer)) return damaged("The property list holds too many values", 0);
   const unsigned space = mayHoldSplitTexts(buffer) ? pugi::parse_ws_pcdata : pugi::parse_ws_pcdata_single;
   Builder builder(mayHoldForeignBytes(buffer));
   pugi::xml_document document;

@@ -1,0 +1,40 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <memory>
+
+#include "quilt/platform/base/Result.h"
+#include "quilt/platform/ffmpeg/Handles.h"
+#include "quilt/platform/ffmpeg/MovieOutput.h"
+#include "quilt/platform/ffmpeg/TranscodePlan.h"
+
+namespace quilt::platform::ffmpeg {
+
+/// Carries one stream from the packets of a file to those of another.
+class StreamChain {
+ public:
+  virtual ~StreamChain() = default;
+
+  /// Takes the packet's content; times are ticks of the source stream, zero at the file's start. What does not decode
+  /// is left out.
+  virtual Result<void> take(AVPacket& packet) = 0;
+  /// Delivers what is still on its way.
+  virtual Result<void> finish() = 0;
+  /// Whether anything came out.
+  [[nodiscard]] virtual bool hasDelivered() const = 0;
+};
+
+/// Passes packets on as they are; repairs decoding times that do not rise.
+Result<std::unique_ptr<StreamChain>> makeCopyChain(const AVStream& source, MovieOutput& output);
+
+/// H.264 High with the plan's size; `fields` as found out before.
+enum class Fields;
+enum class Company { Alone, WithSound };
+Result<std::unique_ptr<StreamChain>> makeVideoEncodeChain(const Input& input, AVStream& source, const VideoPlan& plan,
+                                                          Fields fields, Company company, MovieOutput& output);
+
+/// AAC-LC, without gaps: sound that starts late or pauses is filled with silence.
+Result<std::unique_ptr<StreamChain>> makeAudioEncodeChain(const Input& input, const AVStream& source,
+                                                          const AudioPlan& plan, MovieOutput& output);
+
+}  // namespace quilt::platform::ffmpeg
