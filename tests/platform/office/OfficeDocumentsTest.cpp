@@ -92,12 +92,12 @@ TEST_F(OfficeDocumentsTest, OtherKindsAreNotConverted) {
 
 TEST_F(OfficeDocumentsTest, EveryNamedKindIsConverted) {
   std::size_t expected = 0;
-  for (const char* extension : {"doc", "docx", "wordml", "odt", "fodt", "ppt", "pptx", "odp", "fodp"}) {
-    const bool isText = std::string("doc wordml fodt fodp").find(extension) != std::string::npos;
-    const std::string bytes = isText ? "<words>" : "PK\3\4" + std::string(30, '\0');
-    const Path file =
-        document(std::string("a.") + extension, extension == std::string("ppt") ? "\xD0\xCF words" : bytes);
-    EXPECT_EQ(pageCount(file), 3U) << extension;
+  const std::string packed = "PK\3\4" + std::string(30, '\0'), binary = "\1 words", text = "<words>";
+  const std::pair<const char*, std::string> kinds[] = {{"doc", binary},  {"docx", packed}, {"wordml", text},
+                                                       {"odt", packed},  {"fodt", text},   {"ppt", binary},
+                                                       {"pptx", packed}, {"odp", packed},  {"fodp", text}};
+  for (const auto& [extension, bytes] : kinds) {
+    EXPECT_EQ(pageCount(document(std::string("a.") + extension, bytes)), 3U) << extension;
     EXPECT_EQ(runs(), ++expected) << extension;
   }
 }
