@@ -10,6 +10,7 @@
 #include <memory>
 #include <string>
 #include <string_view>
+#include <utility>
 
 #include "quilt/platform/base/Result.h"
 
@@ -46,8 +47,10 @@ class MupdfContext {
     Owner(MupdfContext& context, void (*drop)(fz_context*, T*)) : _context(context), _drop(drop) {}
     Owner(const Owner&) = delete;
     Owner& operator=(const Owner&) = delete;
-    ~Owner() {
-      if (object) _drop(_context._context, object);
+    ~Owner() { reset(); }
+
+    void reset() {
+      if (object) _drop(_context._context, std::exchange(object, nullptr));
     }
 
     T* object = nullptr;

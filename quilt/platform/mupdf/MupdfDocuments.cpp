@@ -83,11 +83,10 @@ class MupdfDocument final : public PagedDocument {
       return Error{ErrorKind::Unsupported, "The document is protected by a password.", _path};
     }
     if (!opened) return opened;
-    MupdfContext::Owner<fz_page> first(_context, fz_drop_page);
-    const Result<bool> found = load(0, first);
-    if (!found) return found.error();
-    if (!*found) return Error{ErrorKind::Damaged, "The document has no pages.", _path};
-    return {};
+    const Result<fz_rect> first = load(0);
+    if (first || load(1)) return {};  // a damaged first page does not spoil the others
+    if (first.error().kind != ErrorKind::NotFound) return first.error();
+    return Error{ErrorKind::Damaged, "The document has no pages.", _path};
   }
 
   [[nodiscard]] Result<std::size_t> pageCount() override {
@@ -111,8 +110,7 @@ class MupdfDocument final : public PagedDocument {
 
   [[nodiscard]] Result<Size> sizeOfPage(std::size_t index) override {
     const std::lock_guard lock(_mutex);
-    MupdfContext::Owner<fz_page> page(_context, fz_drop_page);
-    const Result<fz_rect> box = loadBounded(index, page);
+    const Result<fz_rect> box = load(index);
     if (!box) return box.error();
     return Size{box->x1 - box->x0, box->y1 - box->y0};
   }
@@ -122,8 +120,7 @@ class MupdfDocument final : public PagedDocument {
     if (!(pixels.width >= 1 && pixels.height >= 1 && pixels.width <= kMaximumSide && pixels.height <= kMaximumSide)) {
       return Error{ErrorKind::Unsupported, "A page cannot be drawn in this size.", _path};
     }
-    MupdfContext::Owner<fz_page> page(_context, fz_drop_page);
-    const Result<fz_rect> box = loadBounded(index, page);
+    const Result<fz_rect> box = load(index);
     if (!box) return box.error();
     const auto scaleAcross = static_cast<float>(pixels.width / (box->x1 - box->x0));
     const auto scaleDown = static_cast<float>(pixels.height / (box->y1 - box->y0));
@@ -138,7 +135,7 @@ class MupdfDocument final : public PagedDocument {
           fz_new_pixmap_with_data(c, fz_device_rgb(c), static_cast<int>(bitmap.width), static_cast<int>(bitmap.height),
                                   nullptr, 1, static_cast<int>(bitmap.width * 4), bitmap.pixels.data());
       device.object = fz_new_draw_device(c, fz_identity, pixmap.object);
-      fz_run_page(c, page.object, device.object, matrix, _context.cookie());
+      fz_run_page(c, _page.object, device.object, matrix, _context.cookie());
       fz_close_device(c, device.object);
     });
     if (!drawn) return drawn.error();
@@ -147,8 +144,7 @@ class MupdfDocument final : public PagedDocument {
 
   [[nodiscard]] Result<std::string> textOfPage(std::size_t index) override {
     const std::lock_guard lock(_mutex);
-    MupdfContext::Owner<fz_page> page(_context, fz_drop_page);
-    const Result<fz_rect> box = loadBounded(index, page);
+    const Result<fz_rect> box = load(index);
     if (!box) return box.error();
     MupdfContext::Owner<fz_stext_page> text(_context, fz_drop_stext_page);
     MupdfContext::Owner<fz_device> device(_context, fz_drop_device);
@@ -157,7 +153,7 @@ class MupdfDocument final : public PagedDocument {
       options.flags = FZ_STEXT_MEDIABOX_CLIP;
       text.object = fz_new_stext_page(c, *box);
       device.object = fz_new_stext_device(c, text.object, &options);
-      fz_run_page(c, page.object, device.object, fz_identity, _context.cookie());
+      fz_run_page(c, _page.object, device.object, fz_identity, _context.cookie());
       fz_close_device(c, device.object);
     });
     if (!read) return read.error();
@@ -165,36 +161,30 @@ class MupdfDocument final : public PagedDocument {
   }
 
  private:
-  // Whether there is such a page. Lays out no chapter behind it.
-  Result<bool> load(std::size_t index, MupdfContext::Owner<fz_page>& page) {
+  // Makes it the page that `_page` holds, and answers where on it the displayed part lies. Lays out no chapter behind.
+  Result<fz_rect> load(std::size_t index) {
+    if (_page.object && _index == index) return _box;
+    _page.reset();
     const Result<void> loaded = _context.run(kDamagedPage, _path, [&](fz_context* c) {
       const int chapters = fz_count_chapters(c, _document.object);
       std::size_t left = index;
       for (int chapter = 0; chapter < chapters; ++chapter) {
         const auto count = static_cast<std::size_t>(std::max(0, fz_count_chapter_pages(c, _document.object, chapter)));
         if (left < count) {
-          page.object = fz_load_chapter_page(c, _document.object, chapter, static_cast<int>(left));
+          _page.object = fz_load_chapter_page(c, _document.object, chapter, static_cast<int>(left));
+          _box = fz_bound_page(c, _page.object);
           return;
         }
         left -= count;
       }
     });
-    if (!loaded) return loaded.error();
-    return page.object != nullptr;
-  }
-
-  Result<fz_rect> loadBounded(std::size_t index, MupdfContext::Owner<fz_page>& page) {
-    const Result<bool> found = load(index, page);
-    if (!found) return found.error();
-    if (!*found) return Error{ErrorKind::NotFound, "The document has no such page.", _path};
-    fz_rect box = fz_empty_rect;
-    const Result<void> bounded =
-        _context.run(kDamagedPage, _path, [&](fz_context* c) { box = fz_bound_page(c, page.object); });
-    if (!bounded) return bounded.error();
-    const float width = box.x1 - box.x0;
-    const float height = box.y1 - box.y0;
-    if (std::isfinite(width) && std::isfinite(height) && width > 0 && height > 0) return box;
-    return Error{ErrorKind::Damaged, "The page has no size.", _path};
+    if (loaded && !_page.object) return Error{ErrorKind::NotFound, "The document has no such page.", _path};
+    const float width = _box.x1 - _box.x0;
+    const float height = _box.y1 - _box.y0;
+    _index = index;
+    if (loaded && std::isfinite(width) && std::isfinite(height) && width > 0 && height > 0) return _box;
+    _page.reset();
+    return loaded ? Error{ErrorKind::Damaged, "The page has no size.", _path} : loaded.error();
   }
 
   const std::filesystem::path _path;
@@ -204,6 +194,9 @@ class MupdfDocument final : public PagedDocument {
   MupdfContext::Owner<fz_stream> _stream{_context, fz_drop_stream};
   MupdfContext::Owner<fz_document> _document{_context, fz_drop_document};
   std::optional<std::size_t> _count;
+  MupdfContext::Owner<fz_page> _page{_context, fz_drop_page};  // the last one asked for: it is often asked for again
+  std::size_t _index = 0;
+  fz_rect _box = fz_empty_rect;
 };
 
 }  // namespace
