@@ -50,7 +50,8 @@ bool isProgram(const fs::path& path) {
 
 // The user's fonts and language, and nothing that could lead to a network or a display.
 std::vector<std::string> environmentFor(const fs::path& work) {
-  std::vector<std::string> environment{"TMPDIR=" + work.native(), "SAL_USE_VCLPLUGIN=svp"};
+  std::vector<std::string> environment{"TMPDIR=" + work.native(), "SAL_USE_VCLPLUGIN=svp",
+                                       "XDG_RUNTIME_DIR=" + work.native(), "GSETTINGS_BACKEND=memory"};
   for (const char* name :
        {"HOME", "PATH", "LANG", "LC_ALL", "LC_CTYPE", "LC_TIME", "LC_NUMERIC", "XDG_DATA_HOME", "XDG_CACHE_HOME"}) {
     if (const char* value = std::getenv(name)) environment.push_back(std::string(name) + "=" + value);
@@ -133,45 +134,37 @@ Result<std::shared_ptr<PagedDocument>> OfficeDocuments::openDocument(const fs::p
 
 Result<std::shared_ptr<PagedDocument>> OfficeDocuments::openConverted(const fs::path& path) const {
   const std::lock_guard lock(_conversion);
-  const Result<FileAttributes> attributes = services().files->attributesOfItemAtPath(path);
-  if (!attributes) return attributes.error();
   const std::string extension = plainExtension(path);
-  const fs::path pdf = _cache.path(attributes->identity, extension);
-  if (_cache.use(pdf)) {
+  const Result<fs::path> kept = _cache.pathFor(path, extension);
+  if (!kept) return kept.error();
+  if (_cache.use(*kept)) {
     // One that cannot be opened was damaged in the cache, and is made anew.
-    if (Result<std::shared_ptr<PagedDocument>> opened = _pdf->openDocument(pdf)) return opened;
+    if (Result<std::shared_ptr<PagedDocument>> opened = _pdf->openDocument(*kept)) return opened;
   }
-  if (const Result<void> converted = convert(path, attributes->identity, extension, pdf); !converted) {
-    return converted.error();
-  }
-  Result<std::shared_ptr<PagedDocument>> opened = _pdf->openDocument(pdf);
+  const Result<fs::path> converted = convert(path, extension);
+  if (!converted) return converted.error();
+  Result<std::shared_ptr<PagedDocument>> opened = _pdf->openDocument(*converted);
   if (!opened) return Error{opened.error().kind, opened.error().text, path};
   return opened;
 }
 
-Result<void> OfficeDocuments::convert(const fs::path& path, const FileIdentity& identity, const std::string& extension,
-                                      const fs::path& pdf) const {
+Result<fs::path> OfficeDocuments::convert(const fs::path& path, const std::string& extension) const {
   if (_settings.program.empty()) {
     return Error{ErrorKind::NotFound, "LibreOffice, which office documents need, is not installed.", path};
   }
   const Result<fs::path> work = _cache.makeWorkFolder();
   if (!work) return work.error();
   const fs::path copy = *work / withExtension("document", extension);
-  Result<void> converted;
-  if (services().files->copyfile(path, copy, nullptr, nullptr) != 0) {
-    converted = Error{ErrorKind::InputOutput, "The document cannot be copied to be converted.", path};
-  } else {
-    converted = convertIn(*work, path, copy);
-  }
-  if (converted) {
-    const Result<FileAttributes> after = services().files->attributesOfItemAtPath(path);
-    const bool isSame = after && after->identity == identity;
-    converted = isSame ? _cache.put(*work / "out/document.pdf", pdf)
-                       : Error{ErrorKind::InputOutput, "The document was changed while it was converted.", path};
+  Result<fs::path> pdf = Error{ErrorKind::InputOutput, "The document cannot be copied to be converted.", path};
+  if (services().files->copyfile(path, copy, nullptr, nullptr) == 0) pdf = _cache.pathFor(copy, extension);
+  if (pdf) {
+    Result<void> made = convertIn(*work, path, copy);
+    if (made) made = _cache.put(*work / "out/document.pdf", *pdf);
+    if (!made) pdf = made.error();
   }
   std::error_code ignored;
   fs::remove_all(*work, ignored);
-  return converted;
+  return pdf;
 }
 
 Result<void> OfficeDocuments::convertIn(const fs::path& work, const fs::path& path, const fs::path& copy) const {

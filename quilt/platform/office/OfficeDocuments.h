@@ -14,9 +14,9 @@
 namespace quilt::platform {
 
 /// Text documents and presentations, which LibreOffice turns into PDF in a process of its own; the PDF is opened by
-/// another toolkit, to which documents of every other kind go as well. A document is converted once: its PDF is kept in
-/// the user's cache. One conversion runs at a time, for at most two minutes, on a copy and with a fresh profile, in
-/// which macros, links to other files and the network are switched off. Any thread.
+/// another toolkit, to which documents of every other kind go as well. A document is converted once, copies included:
+/// its PDF is kept in the user's cache. One conversion runs at a time, for at most two minutes, on a copy and with a
+/// fresh profile, in which macros, links to other files and the network are switched off. Any thread.
 ///
 /// Without LibreOffice an office document is NotFound, with a sentence that names what is missing.
 class OfficeDocuments final : public DocumentToolkit {
@@ -40,8 +40,7 @@ class OfficeDocuments final : public DocumentToolkit {
 
  private:
   Result<std::shared_ptr<PagedDocument>> openConverted(const std::filesystem::path& path) const;
-  Result<void> convert(const std::filesystem::path& path, const FileIdentity& identity, const std::string& extension,
-                       const std::filesystem::path& pdf) const;
+  Result<std::filesystem::path> convert(const std::filesystem::path& path, const std::string& extension) const;
   Result<void> convertIn(const std::filesystem::path& work, const std::filesystem::path& path,
                          const std::filesystem::path& copy) const;
 

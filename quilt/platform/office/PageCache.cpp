@@ -3,9 +3,12 @@
 
 #include <algorithm>
 #include <array>
+#include <bit>
 #include <charconv>
 #include <chrono>
 #include <cstdlib>
+#include <cstring>
+#include <fstream>
 #include <system_error>
 #include <utility>
 #include <vector>
@@ -22,11 +25,35 @@ constexpr const char* kExtension = ".pdf";
 constexpr const char* kWorkPrefix = ".converting-";
 constexpr auto kAbandoned = std::chrono::hours(1);
 
-std::string hexadecimal(std::uint64_t number) {
-  std::array<char, 16> digits{};
-  const auto end = std::to_chars(digits.data(), digits.data() + digits.size(), number, 16).ptr;
-  return {digits.data(), end};
-}
+constexpr std::size_t kPart = 1 << 20;  // a multiple of a word's size
+
+// Tells files apart, not forgeries: who makes two documents that look the same to it has their own pages mixed up.
+class Digest {
+ public:
+  void add(const char* bytes, std::size_t length) {
+    _length += length;
+    for (std::size_t at = 0; at < length; at += sizeof(std::uint64_t)) {
+      std::uint64_t word = 0;
+      std::memcpy(&word, bytes + at, std::min(sizeof word, length - at));
+      _first = std::rotl((_first ^ word) * 0x9E3779B97F4A7C15U, 29);
+      _second = std::rotl((_second + word) * 0xC2B2AE3D27D4EB4FU, 31) ^ _first;
+    }
+  }
+  [[nodiscard]] std::string text() const {
+    return hexadecimal(_first) + "-" + hexadecimal(_second) + "-" + hexadecimal(_length);
+  }
+
+ private:
+  static std::string hexadecimal(std::uint64_t number) {
+    std::array<char, 16> digits{};
+    const auto end = std::to_chars(digits.data(), digits.data() + digits.size(), number, 16).ptr;
+    return {digits.data(), end};
+  }
+
+  std::uint64_t _length = 0;
+  std::uint64_t _first = 0;
+  std::uint64_t _second = 0;
+};
 
 std::vector<fs::directory_entry> entriesOf(const fs::path& folder) {
   std::vector<fs::directory_entry> entries;
@@ -50,13 +77,16 @@ fs::path PageCache::usualFolder() {
   return cache.empty() ? fs::path() : cache / "quilt" / "pages";
 }
 
-fs::path PageCache::path(const FileIdentity& identity, const std::string& extension) const {
-  std::string name;
-  for (const std::uint64_t part :
-       {identity.device, identity.inode, identity.size, static_cast<std::uint64_t>(identity.changed)}) {
-    name += hexadecimal(part) + "-";
+Result<fs::path> PageCache::pathFor(const fs::path& document, const std::string& extension) const {
+  std::ifstream stream(document, std::ios::binary);
+  if (!stream) return Error{ErrorKind::PermissionDenied, "The document cannot be opened.", document};
+  Digest digest;
+  for (std::vector<char> part(kPart); stream;) {
+    stream.read(part.data(), static_cast<std::streamsize>(part.size()));
+    digest.add(part.data(), static_cast<std::size_t>(stream.gcount()));
   }
-  return _folder / (name + extension + kExtension);
+  if (stream.bad()) return Error{ErrorKind::InputOutput, "The document cannot be read.", document};
+  return _folder / (digest.text() + "-" + extension + kExtension);
 }
 
 bool PageCache::use(const fs::path& path) const {

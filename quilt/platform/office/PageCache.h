@@ -6,12 +6,12 @@
 #include <string>
 
 #include "quilt/platform/base/Result.h"
-#include "quilt/platform/interfaces/FileManager.h"
 
 namespace quilt::platform::office {
 
 /// The PDF files that office documents were converted to, in a folder that only the user may read. A document is known
-/// by device, inode, size, change time and the extension that tells its kind. Processes may share the folder.
+/// by its bytes and the extension that tells its kind, so that its copies in packages need no conversion of their own.
+/// Processes may share the folder.
 class PageCache {
  public:
   static constexpr std::uint64_t kUsualMaximum = std::uint64_t{512} << 20;
@@ -22,8 +22,9 @@ class PageCache {
   /// "quilt/pages" in $XDG_CACHE_HOME, else in ~/.cache; empty when neither is set.
   static std::filesystem::path usualFolder();
 
-  /// Where the document's PDF is or would be.
-  [[nodiscard]] std::filesystem::path path(const FileIdentity& identity, const std::string& extension) const;
+  /// Where the document's PDF is or would be. Reads the document.
+  [[nodiscard]] Result<std::filesystem::path> pathFor(const std::filesystem::path& document,
+                                                      const std::string& extension) const;
 
   /// Whether the PDF is there; it then counts as just used.
   bool use(const std::filesystem::path& path) const;

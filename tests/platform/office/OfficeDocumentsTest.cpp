@@ -75,6 +75,14 @@ TEST_F(OfficeDocumentsTest, ADocumentIsConvertedOnce) {
   EXPECT_EQ(runs(), 1U);
 }
 
+TEST_F(OfficeDocumentsTest, ACopyIsNotConvertedAgain) {
+  const Path file = document();
+  pageCount(file);
+  std::filesystem::copy_file(file, folder() / "copy.docx");
+  EXPECT_EQ(pageCount(folder() / "copy.docx"), 3U);
+  EXPECT_EQ(runs(), 1U);
+}
+
 TEST_F(OfficeDocumentsTest, AChangedDocumentIsConvertedAgain) {
   pageCount(document());
   convertsTo(support::makePages(5));
@@ -108,7 +116,7 @@ TEST_F(OfficeDocumentsTest, NothingIsLeftBesideTheDocumentOrInTheCache) {
   EXPECT_THAT(namesIn(folder() / "documents"), ElementsAre("a.docx"));
   EXPECT_THAT(namesIn(settings.cache), ElementsAre(::testing::EndsWith("-docx.pdf")));
   program("exit 0");
-  error(document("documents/b.docx"));
+  error(document("documents/b.docx", "PK\3\4 others"));
   EXPECT_EQ(namesIn(settings.cache).size(), 1U);
 }
 
@@ -118,7 +126,8 @@ TEST_F(OfficeDocumentsTest, TheCacheIsForItsOwnerAlone) {
 }
 
 TEST_F(OfficeDocumentsTest, TheLeastUsedMakeRoom) {
-  const Path first = document("1.docx"), second = document("2.docx"), third = document("3.docx");
+  const Path first = document("1.docx", "PK\3\4 1"), second = document("2.docx", "PK\3\4 2"),
+             third = document("3.docx", "PK\3\4 3");
   settings.maximumCache = 2 * support::makePages(3).size();
   const auto age = [&](std::chrono::hours hours) {
     for (const auto& entry : std::filesystem::directory_iterator(settings.cache)) {
@@ -175,7 +184,7 @@ TEST_F(OfficeDocumentsTest, TheProgramMayAskToBeStartedAgain) {
   EXPECT_EQ(pageCount(document()), 3U);
   EXPECT_EQ(runs(), 2U);
   program("exit 81");
-  EXPECT_EQ(error(document("b.docx")).kind, ErrorKind::Damaged);
+  EXPECT_EQ(error(document("b.docx", "PK\3\4 others")).kind, ErrorKind::Damaged);
   EXPECT_EQ(runs(), 4U) << "once";
 }
 
@@ -208,7 +217,7 @@ TEST_F(OfficeDocumentsTest, WhatTakesTooLongIsKilledWithItsChildren) {
 TEST_F(OfficeDocumentsTest, NoNameReachesAShellOrAnOption) {
   program("echo \"$@\" > words\ncp made.pdf \"$out/document.pdf\"");
   for (const char* name : {"$(touch escaped).docx", "-i.docx", "|x.docx", "a.doc;touch escaped"}) {
-    const Path file = document(name);
+    const Path file = document(name, std::string("PK\3\4 ") + name);
     if (FDYTypePreferredIdentifier(file) == types::kWordOpenXML) {
       EXPECT_EQ(pageCount(file), 3U) << name;
     }
@@ -283,6 +292,15 @@ TEST_F(LibreOfficeTest, AWebPageCalledDocumentIsShownWithoutPicturesFromElsewher
   const Bitmap page = *opened->drawPage(0, {300, 400});
   for (std::size_t i = 0; i < page.pixels.size(); i += 4) {
     ASSERT_FALSE(page.pixels[i] > 200 && page.pixels[i + 1] < 50 && page.pixels[i + 2] < 50) << "a red pixel";
+  }
+}
+
+TEST_F(LibreOfficeTest, NothingOfItsOwnIsLeftInTheHomeFolder) {
+  const support::Environment home("HOME", (folder() / "home").c_str());
+  const support::Environment cached("XDG_CACHE_HOME", nullptr), data("XDG_DATA_HOME", nullptr);
+  ASSERT_TRUE(open(writeFile(folder() / "a.doc", "<html><body>Hello</body></html>")));
+  for (const char* name : {"home/.cache/dconf", "home/.config", "home/.local"}) {
+    EXPECT_FALSE(std::filesystem::exists(folder() / name)) << name;
   }
 }
 
