@@ -43,13 +43,16 @@
       }}), makeHead(), view);
     }
 
-    function apply(isAnew) {
+    // Shows the choices of the reader; anew when words or marks on the page change.
+    function apply(isAnew, before) {
       const appearance = memory.choice('appearance', 'system');
       root.dataset.appearance = appearance;
       root.dataset.motion = memory.choice('motion', true) ? 'on' : 'off';
       document.querySelector('meta[name=color-scheme]').content = appearance === 'light' ? 'light' : appearance === 'system' ? 'light dark' : 'dark';
       if (!isAnew) return;
       note(true);
+      close();
+      if (before) before();
       build();
       route();
     }
@@ -245,10 +248,12 @@
 
     function close() {
       if (!stage) return;
-      note(true);
-      if (stage.cancelNext) stage.cancelNext();
-      stage.close();
-      stage = current = null;
+      keepPlace();
+      const left = stage;
+      stage = null;  // what it still says is no news
+      if (left.cancelNext) left.cancelNext();
+      left.close();
+      current = null;
       wake();
     }
 
@@ -257,15 +262,19 @@
     // Remembers where the reader is, in the address and in the store.
     function note(isAtOnce) {
       const now = Date.now();
-      if (!stage || !current || !stage.element.isConnected || (!isAtOnce && now - lastNote < kNoteEvery)) return;
+      if (!stage || !stage.element.isConnected || (!isAtOnce && now - lastNote < kNoteEvery)) return;
       lastNote = now;
-      const player = stage.player;
-      const seconds = player ? Math.round(player.time * 10) / 10 : 0;
+      const seconds = stage.player ? Math.round(stage.player.time * 10) / 10 : 0;
       Olive.address.note({item: isLonely() && !seconds && !stage.pager ? '' : current.id, t: seconds || undefined,
                           page: stage.pager && stage.pager.index >= 0 ? stage.pager.index + 1 : undefined, view: stage.view ? stage.view.value : undefined});
-      if (player && seconds && !stage.pager && !player.hasEnded) {
+      keepPlace();
+    }
+
+    function keepPlace() {
+      const player = stage.player;
+      if (player && player.time > 0 && !stage.pager && !player.hasEnded) {
         const share = player.duration ? player.time / player.duration : 0;
-        memory.keep(current, {time: seconds, share, ...(share > 0.97 ? {done: true} : player.isPlaying ? {done: false} : {})});
+        memory.keep(current, {time: player.time, share, ...(share > 0.97 ? {done: true} : player.isPlaying ? {done: false} : {})});
       }
     }
 

@@ -12,7 +12,10 @@
            Olive.iconButton('close', say('close'), () => dialog.close())),
       content);
     dialog.addEventListener('click', (event) => { if (event.target === dialog) dialog.close(); });
-    dialog.addEventListener('close', () => dialog.remove());
+    dialog.addEventListener('close', () => {
+      dialog.remove();
+      if (document.activeElement === document.body) document.getElementById('main').focus();  // the page was built anew
+    });
     document.body.append(dialog);
     dialog.showModal();
     return dialog;
@@ -84,16 +87,15 @@
     return make('label', {class: 'setting'}, make('span', {text: label}), box);
   }
 
-  // apply(): shows the page anew by the choices.
+  // apply(isAnew, before): shows the choices; anew when words or marks change, after before() was done.
   Olive.openSettings = function (memory, apply) {
     const set = (name, isAtOnce) => (value) => {
       memory.choose(name, value);
       apply(isAtOnce);
     };
     const forget = make('button', {type: 'button', class: 'quiet', text: say('forget'), onclick: () => {
-      memory.forget();
+      apply(true, memory.forget);
       Olive.announce(say('forgotten'));
-      apply(true);
       forget.disabled = true;
     }});
     forget.disabled = !memory.hasPlaces();

@@ -4,12 +4,14 @@
 
 (function (Olive) {
   // make('a', {class, href, text, onclick, 'aria-label', …}, child, …): null and false properties and children are left
-  // out, true is an attribute without value, functions are listeners.
+  // out, true is an attribute without value (but aria-… says "true" or "false"), functions are listeners.
   Olive.make = function (tag, properties, ...children) {
     const node = document.createElement(tag);
     for (const [name, value] of Object.entries(properties || {})) {
-      if (value === null || value === undefined || value === false) continue;
-      if (typeof value === 'function') node.addEventListener(name.slice(2), value);
+      if (value === null || value === undefined) continue;
+      if (name.startsWith('aria-')) node.setAttribute(name, value);
+      else if (value === false) continue;
+      else if (typeof value === 'function') node.addEventListener(name.slice(2), value);
       else if (name === 'text') node.textContent = value;
       else node.setAttribute(name, value === true ? '' : value);
     }

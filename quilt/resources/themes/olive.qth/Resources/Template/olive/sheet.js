@@ -18,7 +18,8 @@
       if (!picture) return;
       const width = size.width || picture.naturalWidth, height = size.height || picture.naturalHeight;
       if (!width || !height) return;
-      const fitted = Math.min(pane.clientWidth / width, pane.clientHeight / height);
+      const margin = 2 * parseFloat(getComputedStyle(pane).paddingTop);
+      const fitted = Math.min((pane.clientWidth - margin) / width, (pane.clientHeight - margin) / height);
       picture.style.width = width * fitted * factor + 'px';
       picture.style.height = height * fitted * factor + 'px';
       pane.classList.toggle('zoomed', factor > 1);

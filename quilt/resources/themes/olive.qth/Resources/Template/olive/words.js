@@ -31,12 +31,15 @@
     return word.replace(/\{(\w+)\}/g, (whole, name) => (values && name in values ? values[name] : whole));
   };
 
-  Olive.number = (value, digits) => new Intl.NumberFormat(current, {maximumFractionDigits: digits || 0}).format(value);
-  Olive.day = (date) => new Intl.DateTimeFormat(current, {dateStyle: 'long'}).format(date);
+  // The reader's own region of the language, for dates and numbers.
+  const region = () => (navigator.languages || []).find((tag) => tag.toLowerCase().split('-')[0] === current) || current;
+
+  Olive.number = (value, digits) => new Intl.NumberFormat(region(), {maximumFractionDigits: digits || 0}).format(value);
+  Olive.day = (date) => new Intl.DateTimeFormat(region(), {dateStyle: 'long'}).format(date);
   // "1 hour 12 minutes" for those who listen; the clock form is for the eye.
   Olive.spokenTime = function (seconds) {
     const whole = Math.floor(seconds), parts = [];
-    const unit = (value, name) => new Intl.NumberFormat(current, {style: 'unit', unit: name, unitDisplay: 'long'}).format(value);
+    const unit = (value, name) => new Intl.NumberFormat(region(), {style: 'unit', unit: name, unitDisplay: 'long'}).format(value);
     if (whole >= 3600) parts.push(unit(Math.floor(whole / 3600), 'hour'));
     if (whole >= 60) parts.push(unit(Math.floor(whole / 60) % 60, 'minute'));
     parts.push(unit(whole % 60, 'second'));
