@@ -9,7 +9,7 @@
   Olive.start = function (data) {
     const root = document.documentElement, app = document.getElementById('app');
     const memory = Olive.openMemory(typeof data.UUID === 'string' ? data.UUID : 'package');
-    let pack, find, printAll, stage = null, current = null, frame = null, follow = null, query = '', terms = [], lastNote = 0, view;
+    let pack, find, printAll, stage = null, current = null, frame = null, query = '', terms = [], lastNote = 0, view;
 
     const isLonely = () => pack.items.length === 1;
     const neighbour = (step) => (current ? pack.items[current.index + step] : null);
@@ -130,14 +130,13 @@
         panels.push({name: 'pages', label: say('pages'), content: lists.pages.element});
       }
       if (!isLonely()) panels.push({name: 'contents', label: say('contents'), content: Olive.makeContents(pack.items, item, memory)});
-      follow = () => { if (lists.chapters) lists.chapters.follow(stage.player.time); };
 
       frame = make('section', {class: 'player', tabindex: -1, 'aria-label': say('player')}, stage.element, stage.controls);
       view.className = 'item' + (panels.length ? '' : ' alone');
       view.replaceChildren(
         make('div', {class: 'main-column'}, frame, makeAbout(item)),
         ...(panels.length ? [makePanels(panels)] : []));
-      if (stage.player) watch(stage.player);
+      if (stage.player) watch(stage.player, lists.chapters);
       mediaSession(item);
       scrollTo({top: 0, behavior: 'instant'});
       frame.focus({preventScroll: true});
@@ -190,9 +189,9 @@
       return make('aside', {class: 'side', 'aria-label': say('lists')}, bar, boxes);
     }
 
-    function watch(player) {
+    function watch(player, chapters) {
       player.addEventListener('time', () => {
-        follow();
+        if (chapters) chapters.follow(player.time);
         if (player.isPlaying) note(false);
       });
       player.addEventListener('state', () => {

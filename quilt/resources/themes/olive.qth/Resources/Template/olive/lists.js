@@ -81,7 +81,7 @@
     if (!address) return null;
     const ending = (/\.(\w{1,5})$/.exec(file.name) || [])[1] || '';
     const title = extra.title || kindOf({category: extra.category}) || say('file');
-    const size = file.megaBytes > 0 ? say('megaBytes', {size: Olive.number(file.megaBytes, file.megaBytes < 10 ? 1 : 0)}) : '';
+    const size = file.megaBytes > 0 ? Olive.fileSize(file.megaBytes) : '';
     return make('li', null, make('a', {class: 'extra', href: address, target: '_blank', rel: 'noopener noreferrer',
                                        download: file.address ? title.replace(/[\\/:*?"<>|]/g, '_') + (ending ? '.' + ending : '') : null},
       Olive.icon(file.address ? 'download' : 'open'),

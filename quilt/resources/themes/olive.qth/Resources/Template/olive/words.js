@@ -24,7 +24,7 @@
 
   Olive.language = () => current;
 
-  // say('resumeAt', {time: '4:05'}); `n` among the values chooses the plural form.
+  // say('continueAt', {time: '4:05'}); `n` among the values chooses the plural form.
   Olive.say = function (key, values) {
     let word = Olive.languages[current].words[key] || Olive.languages.en.words[key];
     if (typeof word === 'object') word = word[new Intl.PluralRules(current).select(values.n)] || word.other;
@@ -36,6 +36,10 @@
 
   Olive.number = (value, digits) => new Intl.NumberFormat(region(), {maximumFractionDigits: digits || 0}).format(value);
   Olive.day = (date) => new Intl.DateTimeFormat(region(), {dateStyle: 'long'}).format(date);
+  Olive.fileSize = function (megaBytes) {
+    const [value, unit] = megaBytes < 1 ? [Math.ceil(megaBytes * 1024), 'kilobyte'] : [megaBytes, 'megabyte'];
+    return new Intl.NumberFormat(region(), {style: 'unit', unit, maximumFractionDigits: value < 10 ? 1 : 0}).format(value);
+  };
   // "1 hour 12 minutes" for those who listen; the clock form is for the eye.
   Olive.spokenTime = function (seconds) {
     const whole = Math.floor(seconds), parts = [];

@@ -64,7 +64,6 @@ window.Olive.languages.ar = {
     leaveFullscreen: 'الخروج من ملء الشاشة',
     linkCopied: 'تم نسخ الرابط',
     lists: 'القوائم',
-    megaBytes: '{size} م.ب',
     motion: 'الحركة',
     mute: 'كتم الصوت',
     muted: 'الصوت مكتوم',

@@ -64,7 +64,6 @@ window.Olive.languages.de = {
     leaveFullscreen: 'Vollbild verlassen',
     linkCopied: 'Link kopiert',
     lists: 'Listen',
-    megaBytes: '{size} MB',
     motion: 'Animationen',
     mute: 'Ton aus',
     muted: 'Ton aus',

@@ -64,7 +64,6 @@ window.Olive.languages.en = {
     leaveFullscreen: 'Leave full screen',
     linkCopied: 'Link copied',
     lists: 'Lists',
-    megaBytes: '{size} MB',
     motion: 'Animations',
     mute: 'Sound off',
     muted: 'Sound off',

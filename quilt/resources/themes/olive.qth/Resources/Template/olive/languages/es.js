@@ -64,7 +64,6 @@ window.Olive.languages.es = {
     leaveFullscreen: 'Salir de pantalla completa',
     linkCopied: 'Enlace copiado',
     lists: 'Listas',
-    megaBytes: '{size} MB',
     motion: 'Animaciones',
     mute: 'Silenciar',
     muted: 'Silenciado',

@@ -64,7 +64,6 @@ window.Olive.languages.fr = {
     leaveFullscreen: 'Quitter le plein écran',
     linkCopied: 'Lien copié',
     lists: 'Listes',
-    megaBytes: '{size} Mo',
     motion: 'Animations',
     mute: 'Couper le son',
     muted: 'Son coupé',

@@ -64,7 +64,6 @@ window.Olive.languages.ja = {
     leaveFullscreen: '全画面を終了',
     linkCopied: 'リンクをコピーしました',
     lists: '一覧',
-    megaBytes: '{size} MB',
     motion: 'アニメーション',
     mute: '消音',
     muted: '消音しました',
