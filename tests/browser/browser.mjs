@@ -28,8 +28,9 @@ export const fileUrl = (folder, hash = '') => pathToFileURL(join(folder, 'index.
 
 const kTypes = {'.html': 'text/html', '.js': 'text/javascript', '.css': 'text/css', '.mp4': 'video/mp4', '.m4a': 'audio/mp4', '.jpg': 'image/jpeg', '.png': 'image/png', '.pdf': 'application/pdf'};
 
-/// Serves the folder on the loopback address, byte ranges included; extra pages by path.
-export async function serve(folder, pages = {}) {
+/// Serves the folder on the loopback address, byte ranges included; extra pages by path. slow: {file, share, gate} holds
+/// back what comes after a share of that file until the gate opens.
+export async function serve(folder, pages = {}, slow = null) {
   const server = createServer((request, response) => {
     const path = decodeURIComponent(new URL(request.url, 'http://x').pathname);
     if (pages[path]) {
@@ -49,7 +50,14 @@ export async function serve(folder, pages = {}) {
     const start = range && range[1] ? Number(range[1]) : range ? size - Number(range[2]) : 0;
     const end = range && range[1] && range[2] ? Math.min(Number(range[2]), size - 1) : size - 1;
     response.writeHead(range ? 206 : 200, {...headers, 'Content-Length': end - start + 1, ...(range ? {'Content-Range': `bytes ${start}-${end}/${size}`} : {})});
-    createReadStream(file, {start, end}).pipe(response);
+    const limit = slow && file.endsWith(slow.file) ? Math.floor(size * slow.share) : Infinity;
+    if (end < limit) {
+      createReadStream(file, {start, end}).pipe(response);
+      return;
+    }
+    const rest = () => slow.gate.then(() => createReadStream(file, {start: Math.max(start, limit), end}).pipe(response));
+    if (start < limit) createReadStream(file, {start, end: limit - 1}).on('end', rest).pipe(response, {end: false});
+    else rest();
   });
   await new Promise((resolve) => server.listen(0, '127.0.0.1', resolve));
   return {origin: `http://127.0.0.1:${server.address().port}`, close: () => server.close()};

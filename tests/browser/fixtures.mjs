@@ -79,6 +79,13 @@ export class Fixtures {
       {category: 'Movie', title: 'The only one', sources: [{category: 'Movie', hasSound: true, files: [{path: film, width: 640, height: 360, duration: 12}]}]}]});
   }
 
+  /// A film that stands upright.
+  portrait() {
+    const film = this.media.movie('upright.mp4', {seconds: 4, size: '360x640'});
+    return makePackage(this.path('portrait'), {title: 'Upright', media: [
+      {category: 'Movie', title: 'Upright', sources: [{category: 'Movie', hasSound: true, files: [{path: film, width: 360, height: 640, duration: 4}]}]}]});
+  }
+
   /// Two long sources for the measurement of their distance.
   lecture() {
     const speaker = this.media.movie('speaker-long.mp4', {seconds: 90, colour: '0x39454d', size: '320x180'});
@@ -130,7 +137,7 @@ export class Fixtures {
 
   /// The course without some of its files.
   incomplete(name, ...missing) {
-    const made = makePackage(this.path(name), {...course(this.media), id: 'course'});
+    const made = makePackage(this.path(name), course(this.media));
     for (const file of missing) rmSync(join(made.folder, file), {recursive: true});
     return made;
   }

@@ -140,8 +140,7 @@
       mediaSession(item);
       scrollTo({top: 0, behavior: 'instant'});
       frame.focus({preventScroll: true});
-      const row = view.querySelector('.panel .row[aria-current]');
-      if (row) row.closest('.panel').scrollTop = row.offsetTop - 80;
+      Olive.reveal(view.querySelector('.panel:not([hidden]) .row[aria-current]'));
     }
 
     function makeAbout(item) {
@@ -176,6 +175,7 @@
           tab.tabIndex = i === index ? 0 : -1;
           boxes[i].hidden = i !== index;
         });
+        Olive.reveal(boxes[index].querySelector('[aria-current]'));
         tabs[index].focus();
       }
       const bar = make('div', {class: 'tabs', role: 'tablist', 'aria-label': say('lists'), onkeydown: (event) => {

@@ -58,6 +58,7 @@
       const first = results.querySelector('a');
       if (event.key === 'Enter' && first) first.click();
       else if (event.key === 'ArrowDown' && first) first.focus();
+      else if (event.key === 'Escape') dialog.close();  // at once, not after the field was emptied
       else return;
       event.preventDefault();
     });

@@ -38,6 +38,19 @@
       thumbnail(item, memory),
       make('span', {class: 'row-text'}, make('span', {class: 'row-title', dir: 'auto', text: item.title}), meta(item))))));
 
+  // Scrolls the list, and only the list, so that the entry is seen. Entries that were never drawn have estimated heights,
+  // so it looks again once they are.
+  Olive.reveal = function (entry) {
+    const box = entry && entry.closest('.panel');
+    if (!box) return;
+    const scroll = () => {
+      const [inner, outer] = [entry.getBoundingClientRect(), box.getBoundingClientRect()];
+      if (inner.height && (inner.top < outer.top || inner.bottom > outer.bottom)) box.scrollBy({top: inner.top - outer.top - outer.height / 3, behavior: 'instant'});
+    };
+    scroll();
+    requestAnimationFrame(() => requestAnimationFrame(scroll));
+  };
+
   // Chapters with their pictures; follow(time) marks the one that runs.
   Olive.makeChapters = function (chapters, onChoice) {
     const buttons = chapters.map((chapter) => make('button', {type: 'button', class: 'row', onclick: () => onChoice(chapter.start)},
@@ -51,7 +64,10 @@
         const index = chapters.filter((chapter) => chapter.start <= time + 0.05).length - 1;
         if (index === marked) return;
         if (buttons[marked]) buttons[marked].removeAttribute('aria-current');
-        if (buttons[index]) buttons[index].setAttribute('aria-current', 'true');
+        if (buttons[index]) {
+          buttons[index].setAttribute('aria-current', 'true');
+          Olive.reveal(buttons[index]);
+        }
         marked = index;
       },
     };
@@ -67,10 +83,8 @@
       follow(index) {
         if (buttons[marked]) buttons[marked].removeAttribute('aria-current');
         marked = index;
-        const button = buttons[index];
-        button.setAttribute('aria-current', 'true');
-        const box = button.closest('.panel');
-        if (box && box.scrollHeight > box.clientHeight) box.scrollTop = button.offsetTop - box.clientHeight / 3;
+        buttons[index].setAttribute('aria-current', 'true');
+        Olive.reveal(buttons[index]);
       },
     };
   };

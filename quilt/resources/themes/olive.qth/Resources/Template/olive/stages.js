@@ -40,7 +40,8 @@
     const grades = parts.map((part) => new Olive.Grades(part.source, wanted));
     const player = new Olive.Player(parts.map((part, i) => ({element: elements[i], grades: grades[i], offset: part.offset || 0, leads: part.leads})), item.duration);
     const content = options.content(elements, player);
-    const element = make('div', {class: 'stage ' + item.category.toLowerCase()}, content);
+    const under = [content].flat(2);
+    const element = make('div', {class: 'stage ' + item.category.toLowerCase()}, under);
     const spinner = make('div', {class: 'spinner', 'aria-hidden': 'true', hidden: true});
     element.append(spinner);
 
@@ -74,11 +75,13 @@
       make('div', {class: 'cover-actions'}, bigButton,
            resumeAt > 0 && make('button', {type: 'button', class: 'quiet', text: say('startOver'), onclick: () => startHere(0)})));
     element.append(cover);
+    under.forEach((node) => { node.inert = true; });
     cover.addEventListener('click', (event) => { if (event.target === cover || event.target.localName === 'img') startHere(resumeAt || null); });
 
     player.addEventListener('state', () => {
       if (player.isPlaying) {
         cover.remove();
+        under.forEach((node) => { node.inert = false; });
         element.querySelectorAll('.blocked').forEach((node) => node.remove());
       }
       spinner.hidden = !player.isWaiting;
@@ -105,6 +108,10 @@
       }
     }
     player.addEventListener('failed', (event) => complain(event.detail));
+    player.addEventListener('duration', () => {
+      const {videoWidth, videoHeight} = elements[0] || {};
+      element.classList.toggle('upright', videoHeight > videoWidth);
+    });
 
     queueMicrotask(() => {
       player.open(Olive.pixelsAcross(element));
