@@ -60,7 +60,7 @@ describe('every control', () => {
         document.activeElement.blur();
         window.walk = [];
         const shown = (node) => node.getClientRects().length > 0 && getComputedStyle(node).visibility !== 'hidden';
-        return [...document.querySelectorAll('a[href], button, input, select, [tabindex]')].filter((node) => shown(node) && !node.disabled && node.tabIndex >= 0).length;
+        return [...document.querySelectorAll('a[href], button, input, select, [tabindex]')].filter((node) => shown(node) && !node.disabled && node.tabIndex >= 0 && !node.closest('[inert]')).length;
       });
       const seen = new Set();
       for (let i = 0; i < all + 3; ++i) {

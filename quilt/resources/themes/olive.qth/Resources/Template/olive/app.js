@@ -78,7 +78,7 @@
             make('div', {class: 'lead'}, Olive.paragraphs(pack.description)),
             make('p', {class: 'facts'}, [
               say('itemCount', {n: pack.items.length}), total ? Olive.clock(total) : '', pack.modified ? Olive.day(pack.modified) : '', pack.category, pack.advisory,
-            ].filter(Boolean).map((fact) => make('span', {dir: 'auto', text: fact}))),
+            ].filter(Boolean).map((fact) => make('span', null, make('bdi', {text: fact})))),
             start && make('a', {class: 'primary', href: Olive.address.to({item: start.id})}, Olive.icon('play'),
                           last ? say('continueWith', {title: last.title, time: Olive.clock(place.time)}) : say('start')))),
         pack.items.length ? make('section', {class: 'contents', 'aria-labelledby': 'contents-title'},

@@ -31,8 +31,8 @@
     return word.replace(/\{(\w+)\}/g, (whole, name) => (values && name in values ? values[name] : whole));
   };
 
-  // The reader's own region of the language, for dates and numbers.
-  const region = () => (navigator.languages || []).find((tag) => tag.toLowerCase().split('-')[0] === current) || current;
+  // The reader's own region of the language, for dates and numbers; digits as on the clock.
+  const region = () => ((navigator.languages || []).find((tag) => tag.toLowerCase().split('-')[0] === current) || current) + '-u-nu-latn';
 
   Olive.number = (value, digits) => new Intl.NumberFormat(region(), {maximumFractionDigits: digits || 0}).format(value);
   Olive.day = (date) => new Intl.DateTimeFormat(region(), {dateStyle: 'long'}).format(date);
