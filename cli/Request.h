@@ -96,6 +96,24 @@ struct ExportRequest {
   bool operator==(const ExportRequest&) const = default;
 };
 
+struct FinalizeRequest {
+  std::string document;
+  bool operator==(const FinalizeRequest&) const = default;
+};
+
+struct BuildRequest {
+  std::string manifest;
+  std::string output;  ///< a folder
+  bool zip = false;
+  std::vector<std::string> formats{};  ///< empty: the manifest says
+  std::optional<std::string> theme{};
+  bool operator==(const BuildRequest&) const = default;
+};
+
+struct ThemesRequest {
+  bool operator==(const ThemesRequest&) const = default;
+};
+
 struct DoctorRequest {
   bool operator==(const DoctorRequest&) const = default;
 };
@@ -112,7 +130,8 @@ struct VersionRequest {
 
 using Command = std::variant<ImportRequest, ListRequest, ShowRequest, InfoRequest, NewCollectionRequest,
                              NewDocumentRequest, SetRequest, AddRequest, MoveRequest, ConvertRequest, RemoveRequest,
-                             ExportRequest, DoctorRequest, HelpRequest, VersionRequest>;
+                             ExportRequest, FinalizeRequest, BuildRequest, ThemesRequest, DoctorRequest, HelpRequest,
+                             VersionRequest>;
 
 enum class ProgressStyle { Automatic, Json, None };
 
