@@ -35,8 +35,8 @@ void refuseIncomplete(const Path& exported, const QuiltDocument& document, const
   if (cause.empty()) cause = log.warning("Failed to create import");
   if (cause.empty()) return;
   (void)services().files->removeItem(exported, target.folder);
-  throw Failure(ExitCode::Invalid,
-                fmt::format("The document {} cannot be exported in full: {}", name, escaped(cause)), document.path());
+  throw Failure(ExitCode::Invalid, fmt::format("The document {} cannot be exported in full: {}", name, escaped(cause)),
+                document.path());
 }
 
 }  // namespace

@@ -43,8 +43,8 @@ struct ManifestCollection {
 struct Manifest {
   Path path;  ///< relative names are meant from its folder
   Text title, author, description, keywords, category;
-  Text theme;   ///< an identifier or a path
-  Text poster;  ///< a file
+  Text theme;                        ///< an identifier or a path
+  Text poster;                       ///< a file
   std::vector<std::string> formats;  ///< may be empty
   std::optional<ManifestCollection> collection;
   std::vector<ManifestItem> media;  ///< never empty

@@ -128,10 +128,10 @@ struct VersionRequest {
   bool operator==(const VersionRequest&) const = default;
 };
 
-using Command = std::variant<ImportRequest, ListRequest, ShowRequest, InfoRequest, NewCollectionRequest,
-                             NewDocumentRequest, SetRequest, AddRequest, MoveRequest, ConvertRequest, RemoveRequest,
-                             ExportRequest, FinalizeRequest, BuildRequest, ThemesRequest, DoctorRequest, HelpRequest,
-                             VersionRequest>;
+using Command =
+    std::variant<ImportRequest, ListRequest, ShowRequest, InfoRequest, NewCollectionRequest, NewDocumentRequest,
+                 SetRequest, AddRequest, MoveRequest, ConvertRequest, RemoveRequest, ExportRequest, FinalizeRequest,
+                 BuildRequest, ThemesRequest, DoctorRequest, HelpRequest, VersionRequest>;
 
 enum class ProgressStyle { Automatic, Json, None };
 

@@ -69,8 +69,7 @@ Plan look(const BuildRequest& request, const Context& context) {
   Plan plan{readManifest(request.manifest), {absolutePath(request.output), request.zip, request.formats}, {}, {}, {}};
   if (plan.target.formats.empty()) plan.target.formats = plan.manifest.formats;
   if (plan.target.formats.empty()) plan.target.formats = {kQuiltMediaDerivativeCompatibilityTagDesktop};
-  checkDestination(plan.target.folder,
-                   context.settings.library ? absolutePath(*context.settings.library) : Path());
+  checkDestination(plan.target.folder, context.settings.library ? absolutePath(*context.settings.library) : Path());
   std::vector<Failure> problems;
   plan.theme = chooseTheme(request, plan.manifest, problems);
   plan.poster = readPoster(plan.manifest, problems);
@@ -109,8 +108,7 @@ class NewDocument {
     _document = _collection->newDocumentWithType(kQuiltDocumentTypeInteractive);
     if (_document) return;
     giveUp();
-    throw explain("The package " + nameOf(manifest) + " cannot be made", log, _collection->path(),
-                  _collection->path());
+    throw explain("The package " + nameOf(manifest) + " cannot be made", log, _collection->path(), _collection->path());
   }
   NewDocument(const NewDocument&) = delete;
   NewDocument& operator=(const NewDocument&) = delete;
@@ -180,10 +178,10 @@ void addItems(QuiltDocument& document, const Plan& plan, const Context& context)
       context.log.beginOperation();
       const double weight = weightOf(item);
       const bool done = addItem(document, item, [&](double percentage) {
-        const double share = (before + weight * percentage / 100) / total;
-        context.progress.report("Adding " + item.title, kLooked + share * (kCopied - kLooked));
-        return !Interrupt::isRequested();
-      }) != nullptr;
+                          const double share = (before + weight * percentage / 100) / total;
+                          context.progress.report("Adding " + item.title, kLooked + share * (kCopied - kLooked));
+                          return !Interrupt::isRequested();
+                        }) != nullptr;
       if (!done) return;
       if (!context.settings.quiet) context.log.showWarnings();
       before += weight;
@@ -191,9 +189,9 @@ void addItems(QuiltDocument& document, const Plan& plan, const Context& context)
   });
   if (Interrupt::isRequested()) throw Interrupt::failure("Nothing was exported");
   if (added < plan.items.size())
-    throw manifestFailure(plan.manifest.path, plan.manifest.media[added].place,
-                          explain("Cannot add " + inQuotes(plan.items[added].title), context.log, document.path(),
-                                  document.path()));
+    throw manifestFailure(
+        plan.manifest.path, plan.manifest.media[added].place,
+        explain("Cannot add " + inQuotes(plan.items[added].title), context.log, document.path(), document.path()));
   context.log.beginOperation();
 }
 
@@ -253,9 +251,8 @@ void PreviewDelegate::perform(const BuildRequest& request) {
                          {"zip", plan.target.zip},
                          {"theme", plan.theme->identifier().value_or("")}},
                         fmt::format("Would export {} to {} as {}, format {}, theme {}", nameOf(plan.manifest),
-                                    inQuotes(plan.target.folder.native()),
-                                    plan.target.zip ? "an archive" : "a package", formats,
-                                    escaped(plan.theme->localizedName().value_or(""))));
+                                    inQuotes(plan.target.folder.native()), plan.target.zip ? "an archive" : "a package",
+                                    formats, escaped(plan.theme->localizedName().value_or(""))));
 }
 
 }  // namespace quilt::cli

@@ -47,8 +47,8 @@ void ActingDelegate::perform(const ExportRequest& request) {
   _context.log.beginOperation();
   if (plan.theme && !changeAndSave(*document, [&] { document->setTheme(plan.theme); }))
     throw explain(cannot, _context.log, document->path(), document->path());
-  const Path exported = exportPackage(*document, nameOf(*plan.found.document),
-                                      {plan.folder, request.zip, request.formats}, _context);
+  const Path exported =
+      exportPackage(*document, nameOf(*plan.found.document), {plan.folder, request.zip, request.formats}, _context);
   _context.output.object({{"uuid", document->uuid()},
                           {"title", document->title().value_or("")},
                           {"type", document->type().value_or("")},

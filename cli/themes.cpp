@@ -9,6 +9,7 @@ void ActingDelegate::perform(const ThemesRequest&) {
   _context.output.beginList();
   const auto themes = installedThemes();
   const auto standard = QuiltThemesController::defaultController()->defaultTheme();
+  if (themes.empty()) _context.messages.note("No theme is installed");
   for (const auto& theme : themes) {
     const std::string identifier = theme->identifier().value_or("");
     const std::string name = theme->localizedName().value_or("");
