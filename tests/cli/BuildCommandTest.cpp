@@ -379,7 +379,7 @@ TEST_F(BuildCommandTest, ProgressNeverGoesBackAndEndsAtOneHundred) {
 
 TEST_F(BuildCommandTest, CtrlCInAnyStageLeavesNothing) {
   json content{{"title", "A talk"}, {"media", json::array()}};
-  for (int i = 0; i < 150; ++i) {
+  for (int i = 0; i < 80; ++i) {
     const std::string name = "picture" + std::to_string(i) + ".jpg";
     image(name, 640);
     content["media"].push_back({{"source", name}});
