@@ -79,6 +79,9 @@ describe('the keyboard', () => {
     assert.equal(await page.inputValue('.page-number'), '2');
     await page.keyboard.press('PageUp');
     assert.equal(await page.inputValue('.page-number'), '1');
+    assert.equal(await page.locator('.controls').isVisible(), false);
+    await page.mouse.move(600, 400);
+    assert.equal(await page.locator('.controls').isVisible(), true);
     const blank = () => page.evaluate(() => document.documentElement.classList.contains('blank'));
     await page.keyboard.press('b');
     assert.equal(await blank(), true);
@@ -132,7 +135,7 @@ describe('links and memory', () => {
   test('the link at this time is copied', () => shared.visit(course, async (page, {context}) => {
     await page.evaluate(() => { navigator.clipboard.writeText = async (text) => { window.copied = text; }; });
     await page.evaluate(() => window.Olive.app.stage.player.seek(6.5));
-    await page.keyboard.press('c');
+    await page.keyboard.press('u');
     await until(page, () => window.copied);
     assert.equal(await page.evaluate(() => window.copied), fileUrl(course.folder, `#item=${course.items[0]}&t=6.5`));
     assert.ok(context);

@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
-// What an item looks like on the stage, by its category. A stage is {element, controls, player, pager, view, close}:
+// What an item looks like on the stage, by its category. A stage is {element, controls, player, transport, pager, sheet, view,
+// toggleText, close}:
 // player is a Player or null; pager {count, index, go(index)} or null; view {value, set(name), swap()} of two pictures.
 'use strict';
 
@@ -54,7 +55,7 @@
         context.memory.choose('grade', grade);
         player.choose(grade, Olive.pixelsAcross(element));
       },
-      extras: [options.extras ? options.extras(player, elements) : [], context.frameButtons(item, elements)].flat(),
+      extras: [options.extras ? options.extras(player, elements) : [], context.frameButtons(elements)].flat(),
       memory: context.memory,
     });
 
@@ -378,7 +379,7 @@
       element,
       sheet,
       controls: make('div', {class: 'controls'}, make('div', {class: 'buttons'}, sheet.tools, make('span', {class: 'gap'}),
-        item.commentary ? [] : context.frameButtons(item, []))),
+        item.commentary ? [] : context.frameButtons([]))),
       player: null,
       close: sheet.close,
     };
@@ -417,6 +418,7 @@
       words.hidden = !isShown;
       textButton.setAttribute('aria-pressed', isShown);
     }
+    const hasText = pages.some((page) => page.text);
 
     const pager = {
       count: pages.length,
@@ -447,11 +449,12 @@
       controls: make('div', {class: 'controls'}, make('div', {class: 'buttons'},
         make('div', {class: 'tools', role: 'group', 'aria-label': say('pages')}, previous, number,
              make('span', {class: 'count', text: '/ ' + pages.length}), next),
-        sheet.tools, pages.some((page) => page.text) && textButton, make('span', {class: 'gap'}),
+        sheet.tools, hasText && textButton, make('span', {class: 'gap'}),
         file && make('a', {class: 'icon-button', href: file.address, target: '_blank', rel: 'noopener', 'aria-label': say('openFile'), title: say('openFile')}, Olive.icon('open')),
-        item.commentary ? [] : context.frameButtons(item, []))),
+        item.commentary ? [] : context.frameButtons([]))),
       player: null,
       pager: pages.length ? pager : null,
+      toggleText: () => hasText && textButton.click(),
       close: sheet.close,
     };
     if (!pages.length) element.append(makeMessage(say('noPages'), file, null));
@@ -486,7 +489,7 @@
 
   const kStages = {Movie: movieStage, Audio: audioStage, Image: pictureStage, Document: documentStage, Web: webStage, Montage: montageStage, DualSource: dualStage};
 
-  // context: {memory, start: {t, page, view, play}, frameButtons(item, elements), note(), focus(), again(), terms(), onPage(index)}
+  // context: {memory, start: {t, page, view, play}, frameButtons(elements), note(), focus(), again(), terms(), onPage(index)}
   Olive.makeStage = function (item, context) {
     const make = item.sources.length ? kStages[item.category] : null;
     return (make || emptyStage)(item, context);
