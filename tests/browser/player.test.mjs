@@ -104,7 +104,7 @@ describe('the keyboard', () => {
     await page.keyboard.press('?');
     assert.equal(await page.locator('.keys kbd').count() > 25, true);
     await page.keyboard.press('Escape');
-    assert.equal(await page.locator('dialog').count(), 0);
+    await until(page, () => !document.querySelector('dialog'));
   }));
 });
 
@@ -217,6 +217,15 @@ describe('the player', () => {
   test('takes the small grade on a small screen', () => shared.visit(course, async (page) => {
     await until(page, () => window.Olive.app.stage.player.leader.element.videoHeight === 360);
   }, {...item(0), viewport: {width: 400, height: 700}}));
+
+  test('ends at the end, every time', () => shared.visit(course, async (page) => {
+    for (let i = 0; i < 8; ++i) {
+      await page.evaluate(() => window.Olive.app.stage.player.seek(11.8));
+      await page.keyboard.press('k');
+      await until(page, () => window.Olive.app.stage.player.hasEnded);
+      near(await time(page), 12, 0.1);
+    }
+  }, item(0)));
 
   test('keeps pitch and speed from item to item', () => shared.visit(course, async (page) => {
     await page.selectOption('select[aria-label="Speed"]', '1.5');
