@@ -129,6 +129,15 @@ describe('narrow and short windows', () => {
           return box.width && (box.right > innerWidth + 1 || box.left < -1) && !node.matches('.skip');
         }).map((node) => node.outerHTML.slice(0, 100)));
         assert.deepEqual(beyond, [], place);
+        const cut = await page.evaluate(() => {
+          const stage = document.querySelector('.stage');
+          const box = stage && stage.getBoundingClientRect();
+          return [...document.querySelectorAll('.pane, .big-play, .web-card, .record')].filter((node) => {
+            const inner = node.getBoundingClientRect();
+            return inner.top < box.top - 1 || inner.bottom > box.bottom + 1;
+          }).map((node) => node.className);
+        });
+        assert.deepEqual(cut, [], `${place} is cut off`);
         if (width === 320 && height === 640) await page.screenshot({path: join(kShots, `${place}-320.png`), fullPage: true});
       }
     }, {viewport: {width, height}}));
