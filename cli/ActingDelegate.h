@@ -38,6 +38,7 @@ class ActingDelegate : public Delegate {
   void perform(const FinalizeRequest& request) override;
   void perform(const BuildRequest& request) override;
   void perform(const ThemesRequest& request) override;
+  void perform(const CheckRequest& request) override;
   void perform(const DoctorRequest& request) override;
   void perform(const HelpRequest& request) override;
   void perform(const VersionRequest& request) override;

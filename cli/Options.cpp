@@ -157,6 +157,8 @@ Command buildRequest(const Arguments& arguments) {
 
 Command themesRequest(const Arguments&) { return ThemesRequest{}; }
 
+Command checkRequest(const Arguments& arguments) { return CheckRequest{arguments.all("DOCUMENT")}; }
+
 Command doctorRequest(const Arguments&) { return DoctorRequest{}; }
 
 Command helpRequest(const Arguments& arguments) {
@@ -341,6 +343,14 @@ const std::vector<CommandDescription>& commands() {
        {},
        false,
        themesRequest},
+      {"check",
+       "verify packages, and change nothing",
+       "Records are readable, every file is there, in the package and of its recorded size, and nothing lies\n"
+       "among the media that no record names. Prints a line a finding: UUID, kind, path, what is wrong.\n",
+       {{"DOCUMENT", "a document; all of the library when none is named", false, true}},
+       {},
+       false,
+       checkRequest},
       {"doctor", "print which decoders, encoders, renderers and themes are there", "", {}, {}, false, doctorRequest},
       {"help",
        "explain the program, or a command",

@@ -114,6 +114,11 @@ struct ThemesRequest {
   bool operator==(const ThemesRequest&) const = default;
 };
 
+struct CheckRequest {
+  std::vector<std::string> documents{};  ///< empty: all of the library
+  bool operator==(const CheckRequest&) const = default;
+};
+
 struct DoctorRequest {
   bool operator==(const DoctorRequest&) const = default;
 };
@@ -131,7 +136,7 @@ struct VersionRequest {
 using Command =
     std::variant<ImportRequest, ListRequest, ShowRequest, InfoRequest, NewCollectionRequest, NewDocumentRequest,
                  SetRequest, AddRequest, MoveRequest, ConvertRequest, RemoveRequest, ExportRequest, FinalizeRequest,
-                 BuildRequest, ThemesRequest, DoctorRequest, HelpRequest, VersionRequest>;
+                 BuildRequest, ThemesRequest, CheckRequest, DoctorRequest, HelpRequest, VersionRequest>;
 
 enum class ProgressStyle { Automatic, Json, None };
 

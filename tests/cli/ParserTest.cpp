@@ -67,6 +67,8 @@ TEST(ParserTest, TheOtherCommandsBecomeRequests) {
             asked({"new", "document", "T", "--collection", "C", "--type", "pdf"}));
   EXPECT_EQ(Command(RemoveRequest{{"A"}, std::nullopt, true}), asked({"remove", "A", "--force"}));
   EXPECT_EQ(Command(RemoveRequest{{"1", "2"}, "D", false}), asked({"remove", "1", "2", "--from", "D"}));
+  EXPECT_EQ(Command(CheckRequest{}), asked({"check"}));
+  EXPECT_EQ(Command(CheckRequest{{"A", "B"}}), asked({"check", "A", "B"}));
   EXPECT_EQ(Command(DoctorRequest{}), asked({"doctor"}));
   EXPECT_EQ(Command(ThemesRequest{}), asked({"themes"}));
   EXPECT_EQ(Command(FinalizeRequest{"D"}), asked({"finalize", "D"}));
