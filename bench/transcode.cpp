@@ -246,8 +246,7 @@ class Bench {
       return;
     }
     // The programs leave the colours as they are; ours are BT.709.
-    const std::string converting =
-        plan.isStandardDefinition ? ",zscale=min=170m:m=709" : "";
+    const std::string converting = plan.isStandardDefinition ? ",zscale=min=170m:m=709" : "";
     std::printf(" %.4f %.4f |", similarity("ours.m4v", source, scaling(plan) + converting),
                 similarity("theirs.m4v", source, scaling(plan)));
     if (rival.isPaid) {
