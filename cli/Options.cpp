@@ -146,6 +146,17 @@ Command exportRequest(const Arguments& arguments) {
   return request;
 }
 
+Command finalizeRequest(const Arguments& arguments) { return FinalizeRequest{*arguments.first("DOCUMENT")}; }
+
+Command buildRequest(const Arguments& arguments) {
+  const std::optional<std::string> output = arguments.first("--output");
+  if (!output) refuse("--output is missing: name the folder to write the package into");
+  return BuildRequest{*arguments.first("MANIFEST"), *output, arguments.has("--zip"), formatsOf(arguments),
+                      arguments.first("--theme")};
+}
+
+Command themesRequest(const Arguments&) { return ThemesRequest{}; }
+
 Command doctorRequest(const Arguments&) { return DoctorRequest{}; }
 
 Command helpRequest(const Arguments& arguments) {
@@ -296,6 +307,40 @@ const std::vector<CommandDescription>& commands() {
         {"--theme", "", "THEME", "set the document's theme first: an identifier or the path of a bundle"}},
        true,
        exportRequest},
+      {"finalize",
+       "make a document ready to be played, in place",
+       "Makes what is missing of previews and posters, applies the theme of an interactive document anew and\n"
+       "writes the files that it reads.\n",
+       {{"DOCUMENT", "the document"}},
+       {},
+       true,
+       finalizeRequest},
+      {"build",
+       "build a finished package from a manifest",
+       "The manifest is a JSON file that names title, theme, poster and items; schema/manifest.schema.json\n"
+       "describes it. Relative names are meant from its folder. With --library the document is kept there, in\n"
+       "the collection that the manifest names; else nothing but the package is left. When anything in the\n"
+       "manifest is wrong, every problem is reported with its place, and nothing is exported. Prints the path\n"
+       "of the package.\n",
+       {{"MANIFEST", "the JSON file"}},
+       {{"--output", "", "DIR", "the folder to write into; made when it is missing"},
+        {"--zip", "", "", "write a zip archive"},
+        {"--format",
+         "",
+         "FORMAT",
+         "Desktop, 720p or 480p (else as the manifest says, else Desktop)",
+         true,
+         {"Desktop", "720p", "480p"}},
+        {"--theme", "", "THEME", "an identifier or the path of a bundle (else as the manifest says, else Olive)"}},
+       true,
+       buildRequest},
+      {"themes",
+       "print the installed themes",
+       "Identifier, name and path of each: those of the user, of the system and of the program.\n",
+       {},
+       {},
+       false,
+       themesRequest},
       {"doctor", "print which decoders, encoders, renderers and themes are there", "", {}, {}, false, doctorRequest},
       {"help",
        "explain the program, or a command",

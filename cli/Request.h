@@ -96,6 +96,24 @@ struct ExportRequest {
   bool operator==(const ExportRequest&) const = default;
 };
 
+struct FinalizeRequest {
+  std::string document;
+  bool operator==(const FinalizeRequest&) const = default;
+};
+
+struct BuildRequest {
+  std::string manifest;
+  std::string output;  ///< a folder
+  bool zip = false;
+  std::vector<std::string> formats{};  ///< empty: the manifest says
+  std::optional<std::string> theme{};
+  bool operator==(const BuildRequest&) const = default;
+};
+
+struct ThemesRequest {
+  bool operator==(const ThemesRequest&) const = default;
+};
+
 struct DoctorRequest {
   bool operator==(const DoctorRequest&) const = default;
 };
@@ -110,9 +128,10 @@ struct VersionRequest {
   bool operator==(const VersionRequest&) const = default;
 };
 
-using Command = std::variant<ImportRequest, ListRequest, ShowRequest, InfoRequest, NewCollectionRequest,
-                             NewDocumentRequest, SetRequest, AddRequest, MoveRequest, ConvertRequest, RemoveRequest,
-                             ExportRequest, DoctorRequest, HelpRequest, VersionRequest>;
+using Command =
+    std::variant<ImportRequest, ListRequest, ShowRequest, InfoRequest, NewCollectionRequest, NewDocumentRequest,
+                 SetRequest, AddRequest, MoveRequest, ConvertRequest, RemoveRequest, ExportRequest, FinalizeRequest,
+                 BuildRequest, ThemesRequest, DoctorRequest, HelpRequest, VersionRequest>;
 
 enum class ProgressStyle { Automatic, Json, None };
 

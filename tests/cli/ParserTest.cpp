@@ -68,6 +68,11 @@ TEST(ParserTest, TheOtherCommandsBecomeRequests) {
   EXPECT_EQ(Command(RemoveRequest{{"A"}, std::nullopt, true}), asked({"remove", "A", "--force"}));
   EXPECT_EQ(Command(RemoveRequest{{"1", "2"}, "D", false}), asked({"remove", "1", "2", "--from", "D"}));
   EXPECT_EQ(Command(DoctorRequest{}), asked({"doctor"}));
+  EXPECT_EQ(Command(ThemesRequest{}), asked({"themes"}));
+  EXPECT_EQ(Command(FinalizeRequest{"D"}), asked({"finalize", "D"}));
+  EXPECT_EQ(Command(BuildRequest{"m.json", "out"}), asked({"build", "m.json", "--output", "out"}));
+  EXPECT_EQ(Command(BuildRequest{"m.json", "out", true, {"720p"}, "olive"}),
+            asked({"build", "--zip", "--format", "720P", "--theme", "olive", "m.json", "--output", "out"}));
   EXPECT_EQ(Command(HelpRequest{"import"}), asked({"help", "import"}));
   EXPECT_EQ(Command(HelpRequest{"import"}), asked({"import", "--help"}));
   EXPECT_EQ(Command(HelpRequest{}), asked({"-h"}));
