@@ -211,15 +211,16 @@ void PreviewDelegate::perform(const AddRequest& request) {
         {{"action", "add"}, {"title", item.title}, {"category", category}, {"sources", sources}, {"to", document.uuid}},
         fmt::format("Would add the {} item {} to {}", category, inQuotes(item.title), where));
   }
+  const bool areExtras = request.kind == Kind::Extras;
+  const ItemEntry owner = target.item ? *target.item : ItemEntry();
   for (const NewSource& companion : plan.companions)
-    PreviewDelegate::plan({{"action", request.kind == Kind::Extras ? "add-extra" : "set-commentary"},
-                           {"title", companion.title},
-                           {"source", companion.url.absoluteString()},
-                           {"to", target.item->uuid}},
-                          fmt::format("Would {} {} {} the item {}", request.kind == Kind::Extras ? "add" : "make",
-                                      inQuotes(companion.title),
-                                      request.kind == Kind::Extras ? "as an extra to" : "the audio commentary of",
-                                      nameOf(target.item->title, target.item->uuid)));
+    PreviewDelegate::plan(
+        {{"action", areExtras ? "add-extra" : "set-commentary"},
+         {"title", companion.title},
+         {"source", companion.url.absoluteString()},
+         {"to", owner.uuid}},
+        fmt::format("Would {} {} {} the item {}", areExtras ? "add" : "make", inQuotes(companion.title),
+                    areExtras ? "as an extra to" : "the audio commentary of", nameOf(owner.title, owner.uuid)));
   throwIfAny(plan.failures, plan.items.size() + plan.companions.size(), kNotAdded);
 }
 

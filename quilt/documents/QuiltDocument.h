@@ -8,6 +8,7 @@
 #include "quilt/platform/base/MainThread.h"
 #include "quilt/platform/base/Property.h"
 #include "quilt/sources/ModelTypes.h"
+#include "quilt/sources/Representations.h"
 #include "quilt/themes/QuiltTheme.h"
 
 namespace quilt {
@@ -31,7 +32,7 @@ inline constexpr const char* kQuiltDocumentPropertiesFilename = "properties.plis
 /// A document saves itself: setting title, description, author, keywords, category, advisoryLabel, jukeboxOrder, theme,
 /// creationDate or lastPublishURL rewrites the properties file at once, on the setting thread, unless the document is
 /// processing. While a long operation or a load runs, isProcessing is true and saving is refused.
-class QuiltDocument : public platform::Object {
+class QuiltDocument : public platform::Object, public ImageBrowserItem, public platform::PasteboardItem {
  public:
   // Construction
   static std::shared_ptr<QuiltDocument> init();
@@ -158,6 +159,33 @@ class QuiltDocument : public platform::Object {
   /// Writes the poster as the quick-preview thumbnail.
   bool glanceUpdate();
 
+  // Pasteboard: the UUID alone, under the drag type
+  static std::string dragTypeIdentifier() { return kQuiltDocumentDragType; }
+  static std::vector<std::string> readableTypesForPasteboard(const platform::Pasteboard& pasteboard);
+  static unsigned readingOptionsForType(const std::string&, const platform::Pasteboard&) {
+    return platform::kPasteboardReadingAsString;
+  }
+  /// Always null: a document is looked up by its UUID, and never made anew from a pasteboard.
+  static std::shared_ptr<QuiltDocument> initWithPasteboardPropertyList(const platform::PropertyList&,
+                                                                       const std::string&) {
+    return nullptr;
+  }
+  std::vector<std::string> writableTypesForPasteboard(const platform::Pasteboard& pasteboard) const override;
+  unsigned writingOptionsForType(const std::string&, const platform::Pasteboard&) const override {
+    return platform::kPasteboardNoOptions;
+  }
+  platform::PropertyList pasteboardPropertyListForType(const std::string&) const override { return uuid(); }
+
+  // Image browser: the poster, by its file when there is one
+  std::string imageUID() override { return uuid(); }
+  std::uint64_t imageVersion() override { return posterImageVersion(); }
+  /// The title, or a localised "Untitled Episode".
+  Text imageTitle() override;
+  /// The day of creation in the language's short form.
+  Text imageSubtitle() override;
+  std::string imageRepresentationType() override;
+  ImageRepresentation imageRepresentation() override;
+
   // Themes
   /// Copies the theme's template into the package after clearing the previous one's files.
   bool applyTheme(const std::shared_ptr<QuiltTheme>& theme, const ProgressionBlock& withProgressionBlock);
@@ -191,6 +219,7 @@ class QuiltDocument : public platform::Object {
   QuiltDocument();
 
  private:
+  bool isShownByFile();
   Path inPackage(std::initializer_list<const char*> components) const;
   /// The title, or the fall-back for a missing or empty one.
   std::string displayTitle() const;

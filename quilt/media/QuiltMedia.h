@@ -6,6 +6,7 @@
 #include "quilt/platform/base/Property.h"
 #include "quilt/sources/ModelTypes.h"
 #include "quilt/sources/QuiltMediaSource.h"
+#include "quilt/sources/Representations.h"
 
 namespace quilt {
 
@@ -14,7 +15,7 @@ class QuiltDocument;
 /// One item of a document: a movie, audio, an image, a document file, a web page, a montage of stills or two sources
 /// shown together. Owned by its document; any thread may call it; sources and extras have a recursive lock each, never
 /// held together.
-class QuiltMedia : public platform::Object {
+class QuiltMedia : public platform::Object, public ImageBrowserItem, public platform::PasteboardItem {
  public:
   // Construction
   static std::shared_ptr<QuiltMedia> init();
@@ -62,6 +63,33 @@ class QuiltMedia : public platform::Object {
   void invalidatePosterImage();
   /// Drops the cached poster and every cache of the children. The file and the version stay.
   void invalidateCaches();
+
+  // Pasteboard: the UUID alone, under the drag type
+  static std::string dragTypeIdentifier() { return kQuiltMediaDragType; }
+  static std::vector<std::string> readableTypesForPasteboard(const platform::Pasteboard& pasteboard);
+  static unsigned readingOptionsForType(const std::string&, const platform::Pasteboard&) {
+    return platform::kPasteboardReadingAsString;
+  }
+  /// Always null: an item is looked up by its UUID, and never made anew from a pasteboard.
+  static std::shared_ptr<QuiltMedia> initWithPasteboardPropertyList(const platform::PropertyList&, const std::string&) {
+    return nullptr;
+  }
+  std::vector<std::string> writableTypesForPasteboard(const platform::Pasteboard& pasteboard) const override;
+  unsigned writingOptionsForType(const std::string&, const platform::Pasteboard&) const override {
+    return platform::kPasteboardNoOptions;
+  }
+  platform::PropertyList pasteboardPropertyListForType(const std::string&) const override { return uuid(); }
+
+  // Image browser: the file, or the poster of an item that is composed of several
+  std::string imageUID() override { return uuid(); }
+  std::uint64_t imageVersion() override { return posterImageVersion(); }
+  std::string imageRepresentationType() override;
+  ImageRepresentation imageRepresentation() override;
+
+  // Quick preview
+  /// The first source's main file; none for an item that is composed of several.
+  std::optional<Url> previewItemURL() const;
+  static Dictionary glanceThumbnailOptions();
 
   // Sources
   std::vector<std::shared_ptr<QuiltMediaSource>> sources() const { return _sources.copy(); }

@@ -10,6 +10,7 @@
 #include "quilt/platform/inspection/CachedInspection.h"
 #include "quilt/platform/inspection/InspectionByKind.h"
 #include "quilt/platform/interfaces/Services.h"
+#include "quilt/platform/office/OfficeDocuments.h"
 #include "quilt/platform/plist/XmlPropertyLists.h"
 #include "quilt/platform/runloop/BuiltInRunLoop.h"
 #include "quilt/platform/text/IcuDateFormatter.h"
@@ -33,6 +34,7 @@
 #include "quilt/platform/vips/VipsInspector.h"
 #endif
 #if QUILT_WITH_MUPDF
+#include "quilt/platform/mupdf/MupdfDocuments.h"
 #include "quilt/platform/mupdf/MupdfInspector.h"
 #endif
 #if QUILT_WITH_ZIP
@@ -71,10 +73,11 @@ class BuildDiagnostics final : public Diagnostics {
     list.push_back(leftOut("Composed posters", "-DQUILT_WITH_CAIRO"));
 #endif
 #if QUILT_WITH_MUPDF
-    list.push_back({"PDF and EPUB inspection", true, MupdfInspector::version(), ""});
+    list.push_back({"PDF and EPUB pages", true, MupdfInspector::version(), ""});
 #else
-    list.push_back(leftOut("PDF and EPUB inspection", "-DQUILT_WITH_MUPDF"));
+    list.push_back(leftOut("PDF and EPUB pages", "-DQUILT_WITH_MUPDF"));
 #endif
+    list.push_back(OfficeDocuments::capability());
 #if QUILT_WITH_ZIP
     list.push_back({"Zip archives", true, ZipArchive::version(), ""});
 #else
@@ -135,6 +138,11 @@ void install() {
   set.movies = std::make_shared<AbsentMovieToolkit>();
   set.audioPreview = std::make_shared<AbsentAudioPreview>();
   set.transcoder = std::make_shared<AbsentTranscoder>();
+#endif
+#if QUILT_WITH_MUPDF
+  set.documents = std::make_shared<OfficeDocuments>(std::make_shared<MupdfDocuments>());
+#else
+  set.documents = std::make_shared<AbsentDocumentToolkit>();
 #endif
 #if QUILT_WITH_ZIP
   set.archive = std::make_shared<ZipArchive>();

@@ -89,9 +89,12 @@ struct QuiltMediaSource::PreviewContent {
   explicit PreviewContent(const QuiltMediaSource& source)
       : category(source.contentCategory()), main(source.mainDerivative()) {
     if (isMovie()) movie = openMovie(*main);
+    // Here rather than on the main thread, which would stand still while an office document is converted.
+    if (isDocument()) platform::FDYPreviewPrepareDocument(file());
   }
 
   [[nodiscard]] bool isMovie() const { return category == kQuiltMediaContentCategoryMovie; }
+  [[nodiscard]] bool isDocument() const { return category == kQuiltMediaContentCategoryDocument; }
 
   [[nodiscard]] Path file() const {
     const auto url = main ? main->url() : std::nullopt;
@@ -104,7 +107,7 @@ struct QuiltMediaSource::PreviewContent {
         category == kQuiltMediaContentCategoryWeb)
       return 1;
     std::size_t pages = 0;
-    if (category == kQuiltMediaContentCategoryDocument)
+    if (isDocument())
       platform::performBlockOnMainThread([&] { pages = platform::FDYPreviewDocumentPagesCount(file()); });
     return pages;
   }
@@ -115,7 +118,7 @@ struct QuiltMediaSource::PreviewContent {
     if (category == kQuiltMediaContentCategoryWeb) return previewOfArtwork("WebPreview", "icns");
     if (category == kQuiltMediaContentCategoryImage)
       return QuiltMediaPreview::initWithImageWrapper(ImageWrapper::imageWithPath(file()));
-    if (category == kQuiltMediaContentCategoryDocument) return previewOfPage(file(), index);
+    if (isDocument()) return previewOfPage(file(), index);
     return nullptr;
   }
 };

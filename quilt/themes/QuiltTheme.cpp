@@ -88,4 +88,10 @@ Path QuiltTheme::indexPath() const {
   return folder.empty() ? folder : folder / kIndexFilename;
 }
 
+ImageRepresentation QuiltTheme::imageRepresentation() {
+  const std::shared_ptr<platform::Bundle> opened = bundle();
+  const Path preview = opened ? opened->pathForResource(kPreviewName, kPreviewType) : Path();
+  return preview.empty() ? ImageRepresentation() : ImageRepresentation(preview);
+}
+
 }  // namespace quilt

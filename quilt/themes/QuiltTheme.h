@@ -4,6 +4,7 @@
 #include "quilt/platform/base/Property.h"
 #include "quilt/platform/interfaces/Bundles.h"
 #include "quilt/sources/ModelTypes.h"
+#include "quilt/sources/Representations.h"
 
 namespace quilt {
 
@@ -11,7 +12,7 @@ inline constexpr const char* kQuiltThemeExtension = "qth";
 
 /// One theme bundle: an HTML template and a preview image. Immutable in practice once made; shared by the documents and
 /// collections that refer to it. Any thread.
-class QuiltTheme : public platform::Object {
+class QuiltTheme : public platform::Object, public ImageBrowserItem {
  public:
   /// Validates the bundle. Null, after one warning, when it is no theme of a supported version.
   static std::shared_ptr<QuiltTheme> initWithPath(const Path& path);
@@ -37,6 +38,12 @@ class QuiltTheme : public platform::Object {
   Path templatePath() const;
   /// The template's entry page, whether it exists or not.
   Path indexPath() const;
+
+  // Image browser: the preview image, looked up anew each time
+  std::string imageUID() override { return identifier().value_or(""); }
+  std::uint64_t imageVersion() override { return 1; }
+  std::string imageRepresentationType() override { return kImageBrowserPathRepresentationType; }
+  ImageRepresentation imageRepresentation() override;
 
  protected:
   QuiltTheme() = default;

@@ -14,8 +14,6 @@ namespace {
 
 using support::debug;
 using support::Lines;
-using ::testing::ElementsAre;
-using ::testing::HasSubstr;
 using ::testing::IsEmpty;
 
 const Value kNone;

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <gmock/gmock.h>
 
+#include <algorithm>
+
 #include "quilt/sources/QuiltMediaSource.h"
 #include "tests/support/PackageFixture.h"
 #include "tests/support/SourceServices.h"
@@ -22,6 +24,7 @@ using support::warning;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 using ::testing::SizeIs;
+using ::testing::UnorderedElementsAre;
 
 class QuiltMediaSourceConvertTest : public support::PackageFixture {
  protected:
@@ -68,6 +71,16 @@ class QuiltMediaSourceConvertTest : public support::PackageFixture {
   static bool isHiddenUuid(const Path& file, const std::string& extension) {
     const std::string name = file.filename();
     return name.size() == 1 + 36 + extension.size() && name.starts_with(".") && name.ends_with(extension);
+  }
+  /// One line has been logged: which grades the output, under its first, hidden name, suits.
+  void expectOnlyTagging(const QuiltMediaSource& source, const std::string& category, const std::string& tags) {
+    const Lines lines = takeLines();
+    ASSERT_THAT(lines, SizeIs(1));
+    const std::string start = "Derivative at URL \"" + Url::fileUrl(source.derivativesFolderPath()).absoluteString();
+    const std::string end = "\" as \"" + category + "\" is compatible with \"" + tags + "\"";
+    EXPECT_EQ(lines[0], debug(lines[0].text));
+    EXPECT_TRUE(lines[0].text.starts_with(start)) << lines[0].text;
+    EXPECT_TRUE(lines[0].text.ends_with(end)) << lines[0].text;
   }
   /// What a failed conversion leaves: one derivative, the flag as it was, nothing but the end report of 0.
   void expectFailed(const QuiltMediaSource& source, bool wasDirty = false) const {
@@ -447,6 +460,66 @@ TEST_F(QuiltMediaSourceConvertTest, ANameThatIsTakenIsNotUsedAgain) {
   ASSERT_THAT(transcoder->calls, SizeIs(1));
   EXPECT_EQ(transcoder->calls[0].destination,
             Url::fileUrl(source->derivativesFolderPath() / ".00000000-0000-4000-8000-000000000003.m4v"));
+}
+
+// ---- With the media library's own transcoder
+
+TEST_F(QuiltMediaSourceConvertTest, ARealMovieBecomesBothGrades) {
+  QUILT_CORPUS_FILE(movie, "h264-aac-1080p-phone.mp4");
+  const auto source = this->source(movie);
+  EXPECT_THAT(source->availableFormats(), ElementsAre("Desktop"));
+  for (const char* format : {"720p", "480p"}) {
+    progress.values.clear();
+    EXPECT_TRUE(source->convertToFormat(format, progress.block()));
+    EXPECT_EQ(progress.values.front(), 0);
+    EXPECT_EQ(progress.values.back(), 100);
+    EXPECT_TRUE(std::ranges::is_sorted(progress.values));
+    EXPECT_GE(progress.values.size(), 6U) << "the transcoder reports, too";
+    expectOnlyTagging(*source, "Movie", format);
+  }
+  ASSERT_EQ(source->derivativeCount(), 3u);
+  const auto high = source->derivativeAtIndex(1);
+  const auto standard = source->derivativeAtIndex(2);
+  EXPECT_THAT(*high->compatibilityTags(), ElementsAre("720p", "720p"));
+  EXPECT_THAT(*standard->compatibilityTags(), ElementsAre("480p", "480p"));
+  EXPECT_THAT(source->availableFormats(), ElementsAre("Desktop", "720p", "480p"));
+  EXPECT_THAT(filesOf(*source), UnorderedElementsAre(high->uuid() + ".m4v", standard->uuid() + ".m4v"));
+  const auto size = [](const QuiltMediaDerivative& derivative) {
+    const auto facts = platform::services().inspector->inspect(derivative.url()->relativePath());
+    return facts ? std::pair(facts->width, facts->height) : std::pair(0.0, 0.0);
+  };
+  EXPECT_EQ(size(*high), std::pair(1280.0, 720.0));
+  EXPECT_EQ(size(*standard), std::pair(640.0, 360.0));
+}
+
+TEST_F(QuiltMediaSourceConvertTest, ARealConversionStopsWhenTheBlockSaysSo) {
+  QUILT_CORPUS_FILE(movie, "h264-aac-1080p-phone.mp4");
+  const auto source = this->source(movie);
+  progress.cancelAt = 10;
+  EXPECT_FALSE(source->convertToFormat("480p", progress.block()));
+  EXPECT_EQ(takeLines(), Lines{critical("Failed to convert video at URL \"" + mainUrl(*source) +
+                                        "\" to HD: \"The conversion was stopped.\"")});
+  EXPECT_THAT(filesOf(*source), IsEmpty());
+  expectFailed(*source);
+}
+
+TEST_F(QuiltMediaSourceConvertTest, ARealMovieThatIsGoneFails) {
+  const Path movie = support::copyOf(largeMovie());
+  const auto source = this->source(movie);
+  std::filesystem::remove(movie);
+  EXPECT_FALSE(source->convertToFormat("720p", progress.block()));
+  EXPECT_EQ(takeLines(), Lines{critical("Failed to convert video at URL \"" + mainUrl(*source) +
+                                        "\" to HD: \"There is no such file.\"")});
+  expectFailed(*source);
+}
+
+TEST_F(QuiltMediaSourceConvertTest, ARealSoundIsConverted) {
+  const auto source = this->source(support::makeMedia(support::mp3Sound()));
+  EXPECT_TRUE(source->convertToFormat("extra", progress.block()));
+  expectOnlyTagging(*source, "Audio", "Desktop,720p,480p");
+  ASSERT_EQ(source->derivativeCount(), 2u);
+  EXPECT_THAT(filesOf(*source), ElementsAre(source->derivativeAtIndex(1)->uuid() + ".m4a"));
+  EXPECT_EQ(source->derivativeAtIndex(1)->compatibilityTags()->back(), "extra");
 }
 
 TEST_F(QuiltMediaSourceConvertTest, WhatWasMadeIsRecordedByName) {

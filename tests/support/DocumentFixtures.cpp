@@ -28,6 +28,38 @@ std::vector<std::string> onePage(const std::string& pageEntries) {
           "<< /Type /Page /Parent 2 0 R " + pageEntries + " >>"};
 }
 
+std::string streamObject(const std::string& content, const std::string& entries) {
+  return "<< /Length " + std::to_string(content.size()) + " " + entries + " >>\nstream\n" + content + "\nendstream";
+}
+
+std::vector<std::string> drawnPage(const std::string& pageEntries, const std::string& content) {
+  std::vector<std::string> objects = onePage(
+      pageEntries +
+      " /Contents 4 0 R /Resources << /Font << /F1 << /Type /Font /Subtype /Type1 /BaseFont /Helvetica >> >> >>");
+  objects.push_back(streamObject(content));
+  return objects;
+}
+
+std::string textAt(int x, int y, const std::string& text, int size) {
+  return "BT /F1 " + std::to_string(size) + " Tf " + std::to_string(x) + " " + std::to_string(y) + " Td (" + text +
+         ") Tj ET\n";
+}
+
+std::string makePages(std::size_t count) {
+  std::vector<std::string> objects{"<< /Type /Catalog /Pages 2 0 R >>", ""};
+  std::string kids;
+  for (std::size_t i = 1; i <= count; ++i) {
+    const std::size_t page = objects.size() + 1;
+    kids += std::to_string(page) + " 0 R ";
+    objects.push_back(
+        "<< /Type /Page /Parent 2 0 R /MediaBox [0 0 200 100] /Contents " + std::to_string(page + 1) +
+        " 0 R /Resources << /Font << /F1 << /Type /Font /Subtype /Type1 /BaseFont /Helvetica >> >> >> >>");
+    objects.push_back(streamObject(textAt(20, 50, "Page " + std::to_string(i))));
+  }
+  objects[1] = "<< /Type /Pages /Count " + std::to_string(count) + " /Kids [" + kids + "] >>";
+  return makePdf(objects);
+}
+
 void makeZip(const std::filesystem::path& file, const std::vector<std::pair<std::string, std::string>>& entries) {
   zip_t* archive = zip_open(file.c_str(), ZIP_CREATE | ZIP_TRUNCATE, nullptr);
   if (!archive) throw std::runtime_error("no archive");
@@ -38,16 +70,41 @@ void makeZip(const std::filesystem::path& file, const std::vector<std::pair<std:
   if (zip_close(archive) != 0) throw std::runtime_error("no archive");
 }
 
+namespace {
+
+const std::pair<std::string, std::string> kContainer{
+    "META-INF/container.xml",
+    "<?xml version='1.0'?><container version='1.0' xmlns='urn:oasis:names:tc:opendocument:xmlns:container'>"
+    "<rootfiles><rootfile full-path='OEBPS/content.opf' media-type='application/oebps-package+xml'/>"
+    "</rootfiles></container>"};
+
+std::string package(const std::string& version, const std::string& metadata, const std::string& content) {
+  return "<?xml version='1.0'?><package xmlns='http://www.idpf.org/2007/opf' version='" + version +
+         "'><metadata xmlns:dc='http://purl.org/dc/elements/1.1/'>" + metadata + "</metadata>" + content + "</package>";
+}
+
+}  // namespace
+
 void makeEpub(const std::filesystem::path& file, const std::string& metadata, const std::string& version) {
-  makeZip(file,
-          {{"mimetype", "application/epub+zip"},
-           {"META-INF/container.xml",
-            "<?xml version='1.0'?><container version='1.0' xmlns='urn:oasis:names:tc:opendocument:xmlns:container'>"
-            "<rootfiles><rootfile full-path='OEBPS/content.opf' media-type='application/oebps-package+xml'/>"
-            "</rootfiles></container>"},
-           {"OEBPS/content.opf", "<?xml version='1.0'?><package xmlns='http://www.idpf.org/2007/opf' version='" +
-                                     version + "'><metadata xmlns:dc='http://purl.org/dc/elements/1.1/'>" + metadata +
-                                     "</metadata><manifest/><spine/></package>"}});
+  makeZip(file, {{"mimetype", "application/epub+zip"},
+                 kContainer,
+                 {"OEBPS/content.opf", package(version, metadata, "<manifest/><spine/>")}});
+}
+
+void makeBook(const std::filesystem::path& file, const std::vector<std::string>& chapters) {
+  std::string manifest, spine;
+  std::vector<std::pair<std::string, std::string>> entries{{"mimetype", "application/epub+zip"}, kContainer};
+  for (std::size_t i = 0; i < chapters.size(); ++i) {
+    const std::string name = "c" + std::to_string(i);
+    manifest += "<item id='" + name + "' href='" + name + ".xhtml' media-type='application/xhtml+xml'/>";
+    spine += "<itemref idref='" + name + "'/>";
+    entries.emplace_back("OEBPS/" + name + ".xhtml", "<html xmlns='http://www.w3.org/1999/xhtml'><head><title>" + name +
+                                                         "</title></head><body>" + chapters[i] + "</body></html>");
+  }
+  entries.emplace_back(
+      "OEBPS/content.opf",
+      package("3.0", "<dc:title>Book</dc:title>", "<manifest>" + manifest + "</manifest><spine>" + spine + "</spine>"));
+  makeZip(file, entries);
 }
 
 }  // namespace quilt::support

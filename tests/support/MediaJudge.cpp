@@ -54,7 +54,10 @@ JudgedStream judgedStream(const json& object) {
   stream.frames = static_cast<int>(number(object, "nb_frames"));
   stream.sampleRate = static_cast<int>(number(object, "sample_rate"));
   stream.channels = static_cast<int>(number(object, "channels"));
-  if (object.contains("disposition")) stream.isDefault = number(object["disposition"], "default") != 0;
+  if (object.contains("disposition")) {
+    stream.isDefault = number(object["disposition"], "default") != 0;
+    if (number(object["disposition"], "attached_pic") != 0) stream.type = "cover";
+  }
   if (object.contains("tags")) {
     stream.language = text(object["tags"], "language");
     stream.isTurned = object["tags"].contains("rotate");

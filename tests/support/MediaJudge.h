@@ -13,7 +13,7 @@ namespace quilt::support {
 
 /// What the `ffprobe` program, an independent judge, says of a stream; empty and 0 where it says nothing.
 struct JudgedStream {
-  std::string type;  ///< "video", "audio", "data", …
+  std::string type;  ///< "video", "cover", "audio", "subtitle", "data", …
   std::string codec;
   std::string profile;
   double start = 0;     ///< seconds

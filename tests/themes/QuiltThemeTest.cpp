@@ -253,5 +253,25 @@ TEST_F(QuiltThemeTest, AThemeWithoutATemplateLoadsAndNamesNoPage) {
   EXPECT_THAT(takeLines(), IsEmpty());
 }
 
+// ---- Image browser
+
+TEST_F(QuiltThemeTest, IsShownByItsPreviewUnderItsIdentifierAndNeverAnew) {
+  makeTheme();
+  const auto theme = QuiltTheme::initWithPath(bundle());
+  ASSERT_TRUE(theme);
+  EXPECT_EQ(theme->imageUID(), "org.quilt.theme.plain");
+  EXPECT_EQ(theme->imageVersion(), 1u);
+  EXPECT_EQ(theme->imageRepresentationType(), kImageBrowserPathRepresentationType);
+  EXPECT_EQ(theme->imageRepresentation(), ImageRepresentation(bundle() / "Resources/Preview.png"));
+}
+
+TEST_F(QuiltThemeTest, ItsPreviewIsLookedUpEachTime) {
+  makeTheme();
+  const auto theme = QuiltTheme::initWithPath(bundle());
+  ASSERT_TRUE(theme);
+  std::filesystem::remove(bundle() / "Resources/Preview.png");
+  EXPECT_EQ(theme->imageRepresentation(), ImageRepresentation());
+}
+
 }  // namespace
 }  // namespace quilt

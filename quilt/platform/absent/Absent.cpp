@@ -29,6 +29,10 @@ Result<std::unique_ptr<Movie>> AbsentMovieToolkit::openMovie(const std::filesyst
   return _absence.error(path);
 }
 
+Result<std::shared_ptr<PagedDocument>> AbsentDocumentToolkit::openDocument(const std::filesystem::path& path) const {
+  return _absence.error(path);
+}
+
 Result<MediaFacts> AbsentInspector::inspect(const std::filesystem::path& path) const { return _absence.error(path); }
 
 Result<void> AbsentAudioPreview::extractAudioSamplesFromAssetURL(const Url& assetURL, const Url& /*toSampleURL*/,

@@ -4,6 +4,7 @@
 #include <mutex>
 #include <string>
 
+#include "quilt/platform/interfaces/DocumentToolkit.h"
 #include "quilt/platform/interfaces/Drawing.h"
 #include "quilt/platform/interfaces/FDYArchive.h"
 #include "quilt/platform/interfaces/FDYAudioPreview.h"
@@ -53,6 +54,14 @@ class AbsentMovieToolkit final : public MovieToolkit {
 
  private:
   Absence _absence{"Opening of movies"};
+};
+
+class AbsentDocumentToolkit final : public DocumentToolkit {
+ public:
+  Result<std::shared_ptr<PagedDocument>> openDocument(const std::filesystem::path& path) const override;
+
+ private:
+  Absence _absence{"Showing of document pages"};
 };
 
 class AbsentInspector final : public MediaInspector {

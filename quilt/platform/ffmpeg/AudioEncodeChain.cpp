@@ -7,6 +7,7 @@
 #include "quilt/platform/ffmpeg/Failure.h"
 #include "quilt/platform/ffmpeg/FilterChain.h"
 #include "quilt/platform/ffmpeg/SoundFilters.h"
+#include "quilt/platform/ffmpeg/SoundFrames.h"
 #include "quilt/platform/ffmpeg/StreamChain.h"
 
 namespace quilt::platform::ffmpeg {
@@ -51,8 +52,12 @@ class AudioEncodeChain final : public StreamChain {
         _stream(stream) {}
 
   Result<void> take(AVPacket& packet) override {
-    avcodec_send_packet(_decoder.get(), &packet);  // a damaged packet is a moment of silence
-    return receiveSound();
+    SoundFrames frames(_source, packet);
+    while (const AVPacket* frame = frames.next()) {
+      avcodec_send_packet(_decoder.get(), frame);  // a damaged one is a moment of silence
+      if (Result<void> received = receiveSound(); !received) return received;
+    }
+    return {};
   }
 
   Result<void> finish() override {

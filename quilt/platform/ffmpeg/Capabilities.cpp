@@ -36,6 +36,11 @@ constexpr std::array kNeeds{
     Need{"AAC encoder", Role::Encoder, "aac", kFullBuild},
     Need{"HDR to SDR: zscale filter", Role::Filter, "zscale", kToneMapping},
     Need{"HDR to SDR: tonemap filter", Role::Filter, "tonemap", kToneMapping},
+    Need{"Subtitles: timed text encoder", Role::Encoder, "mov_text", kFullBuild},
+    Need{"Deinterlacing: bwdif filter", Role::Filter, "bwdif", kFullBuild},
+    Need{"Deinterlacing: idet filter", Role::Filter, "idet", kFullBuild},
+    Need{"Downmix: pan filter", Role::Filter, "pan", kFullBuild},
+    Need{"Downmix: alimiter filter", Role::Filter, "alimiter", kFullBuild},
 };
 
 bool isPresent(const Need& need) {

@@ -19,6 +19,11 @@ class CopyChain final : public StreamChain {
       : _source(source), _timeBase(source.time_base), _output(output), _stream(stream) {}
 
   Result<void> take(AVPacket& packet) override {
+    if ((packet.flags & AV_PKT_FLAG_CORRUPT) != 0) return {};  // of a file that breaks off
+    if (changesSetUp(packet)) {
+      _isUnfit = true;
+      return Error{ErrorKind::Unsupported, "The stream changes in the middle of the file.", {}};
+    }
     if (packet.dts != AV_NOPTS_VALUE || _hasDelivered) {
       if (Result<void> released = release(packet.dts); !released) return released;
       return pass(packet);
@@ -30,8 +35,17 @@ class CopyChain final : public StreamChain {
   }
   Result<void> finish() override { return release(AV_NOPTS_VALUE); }
   [[nodiscard]] bool hasDelivered() const override { return _hasDelivered; }
+  [[nodiscard]] bool isUnfit() const override { return _isUnfit; }
 
  private:
+  [[nodiscard]] bool changesSetUp(const AVPacket& packet) const {
+    std::size_t size = 0;
+    const std::uint8_t* bytes = av_packet_get_side_data(&packet, AV_PKT_DATA_NEW_EXTRADATA, &size);
+    const AVCodecParameters& parameters = *_source.codecpar;
+    return bytes != nullptr && (size != static_cast<std::size_t>(std::max(0, parameters.extradata_size)) ||
+                                !std::equal(bytes, bytes + size, parameters.extradata));
+  }
+
   // The first packets of some files say only when they are shown. They are decoded, one after the other, before the
   // first that says more; or as long before the first is shown as keeps all of them in time.
   Result<void> release(std::int64_t next) {
@@ -82,6 +96,7 @@ class CopyChain final : public StreamChain {
   const AVStream& _stream;
   std::vector<Packet> _held;
   bool _hasDelivered = false;
+  bool _isUnfit = false;
   std::int64_t _last = 0;
   std::int64_t _samples = AV_NOPTS_VALUE;  // of the library's rounding
 };

@@ -18,6 +18,8 @@ Error failure(int code, const std::filesystem::path& file) {
     case AVERROR(ENOSPC):
     case AVERROR(EDQUOT):
       return {ErrorKind::NoSpace, "The disk is full.", file};
+    case AVERROR(EFBIG):
+      return {ErrorKind::NoSpace, "The file is larger than the disk allows.", file};
     case AVERROR(EIO):
       return {ErrorKind::InputOutput, "The file could not be read or written.", file};
     case AVERROR(EMFILE):

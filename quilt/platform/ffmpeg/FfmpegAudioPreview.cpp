@@ -12,6 +12,7 @@
 #include "quilt/platform/ffmpeg/Input.h"
 #include "quilt/platform/ffmpeg/Limits.h"
 #include "quilt/platform/ffmpeg/SamplePoints.h"
+#include "quilt/platform/ffmpeg/SoundFrames.h"
 #include "quilt/platform/ffmpeg/Streams.h"
 #include "quilt/platform/ffmpeg/TemporaryOutput.h"
 
@@ -170,8 +171,11 @@ Result<void> decodeAll(Input& input, const AVStream& stream, AVCodecContext& dec
   };
   while (input.allow(kStalledSeconds), input.goesOn() && av_read_frame(input.context(), packet.get()) >= 0) {
     if (packet->stream_index == stream.index) {
-      avcodec_send_packet(&decoder, packet.get());
-      if (Result<void> received = receive(); !received) return received;
+      SoundFrames frames(stream, *packet);
+      while (const AVPacket* each = frames.next()) {
+        avcodec_send_packet(&decoder, each);
+        if (Result<void> received = receive(); !received) return received;
+      }
     }
     av_packet_unref(packet.get());
   }

@@ -27,6 +27,7 @@ using namespace ffmpeg;
 namespace {
 
 constexpr double kStalledSeconds = 30;  // for one packet
+constexpr AVRational kCoverTimeBase{1, 1000};
 
 // What is known of a file before it is read through.
 struct Facts {
@@ -60,24 +61,42 @@ Result<Facts> gatherFacts(const std::filesystem::path& file, bool hasPicture) {
   return facts;
 }
 
+// What is to be made.
+struct Target {
+  OutputKind kind;
+  PictureSize box;
+  std::filesystem::path file;
+};
+
 class Transcode {
  public:
-  Transcode(Input input, Facts facts, TranscodeProgress& progress)
-      : _input(std::move(input)), _facts(std::move(facts)), _progress(progress) {}
+  Transcode(Input input, const Facts& facts, Copying copying, TranscodeProgress& progress)
+      : _input(std::move(input)), _facts(facts), _copying(copying), _progress(progress) {}
 
-  Result<void> run(OutputKind kind, PictureSize box, const std::filesystem::path& destination) {
-    Result<std::unique_ptr<MovieOutput>> output = MovieOutput::create(destination, kind, _facts.duration, _progress);
+  Result<void> run(const Target& target) {
+    Result<std::unique_ptr<MovieOutput>> output =
+        MovieOutput::create(target.file, target.kind, _facts.duration, _progress);
     if (!output) return output.error();
-    if (kind == OutputKind::Movie) {
-      if (Result<void> added = addVideo(box, **output); !added) return added;
+    if (target.kind == OutputKind::Movie) {
+      if (Result<void> added = addVideo(target.box, **output); !added) return added;
     }
     if (Result<void> added = addAudio(**output); !added) return added;
     if (_chains.empty()) return Error{ErrorKind::Unsupported, "The file holds no sound.", _input.path()};
+    if (target.kind == OutputKind::Movie) addSubtitles(**output);
     describe(**output);
     if (Result<void> chapters = (*output)->setChapters(_facts.chapters); !chapters) return chapters;
+    const AVStream* cover = addCover(**output);
     if (Result<void> begun = (*output)->begin(); !begun) return begun;
+    if (cover != nullptr) {
+      if (Result<void> written = writeCover(*cover, **output); !written) return written;
+    }
     if (Result<void> carried = carryPackets(); !carried) return carried;
     return (*output)->finish();
+  }
+
+  /// Whether another attempt without copies may succeed.
+  [[nodiscard]] bool isUnfitForCopying() const {
+    return std::ranges::any_of(_chains, [](const auto& entry) { return entry.second->isUnfit(); });
   }
 
  private:
@@ -88,7 +107,12 @@ class Transcode {
     traits.isInterlaced =
         traits.isInterlaced || _facts.fields == Fields::TopFirst || _facts.fields == Fields::BottomFirst;
     if (traits.stored.width <= 0 || traits.stored.height <= 0) return failure(AVERROR_INVALIDDATA, _input.path());
-    const VideoPlan plan = planVideo(traits, box);
+    VideoPlan plan = planVideo(traits, box, _copying);
+    constexpr double leastApart = 0.5;  // seconds; whole pictures take room
+    for (const Chapter& chapter : _facts.chapters) {
+      if (!plan.chapterStarts.empty() && chapter.start - plan.chapterStarts.back() < leastApart) continue;
+      plan.chapterStarts.push_back(chapter.start);
+    }
     const Company company = mainAudio(_input) == nullptr ? Company::Alone : Company::WithSound;
     return add(*stream, plan.isCopied ? makeCopyChain(*stream, output)
                                       : makeVideoEncodeChain(_input, *stream, plan, _facts.fields, company, output));
@@ -97,9 +121,19 @@ class Transcode {
   Result<void> addAudio(MovieOutput& output) {
     AVStream* stream = mainAudio(_input);
     if (stream == nullptr) return {};
-    const AudioPlan plan = planAudio(audioTraits(_input, *stream));
+    const AudioPlan plan = planAudio(audioTraits(_input, *stream), _copying);
     return add(*stream,
                plan.isCopied ? makeCopyChain(*stream, output) : makeAudioEncodeChain(_input, *stream, plan, output));
+  }
+
+  void addSubtitles(MovieOutput& output) {
+    constexpr int most = 32;
+    int count = 0;
+    for (unsigned i = 0; i < _input.context()->nb_streams && count < most; ++i) {
+      const AVStream& stream = *_input.context()->streams[i];
+      if (stream.codecpar->codec_type != AVMEDIA_TYPE_SUBTITLE || !isTextSubtitle(stream)) continue;
+      if (add(stream, makeSubtitleChain(_input, stream, output))) ++count;  // the movie goes without, too
+    }
   }
 
   Result<void> add(const AVStream& stream, Result<std::unique_ptr<StreamChain>> chain) {
@@ -110,11 +144,31 @@ class Transcode {
 
   // What a reader of the derivative may want to know; nothing of where and with what it was recorded.
   void describe(MovieOutput& output) {
-    constexpr std::array names{"title",     "artist",  "album_artist", "album",       "composer", "date",    "genre",
-                               "copyright", "comment", "track",        "description", "show",     "synopsis"};
+    constexpr std::array names{"title", "artist",   "album_artist",  "album",        "composer",
+                               "date",  "genre",    "copyright",     "comment",      "track",
+                               "disc",  "grouping", "lyrics",        "description",  "synopsis",
+                               "show",  "network",  "season_number", "episode_sort", "episode_id"};
     for (const char* name : names) {
       if (const std::optional<std::string> value = tag(_input, {name})) output.setTag(name, *value);
     }
+  }
+
+  // The stream for the file's cover; null when there is none, or of a kind that the output cannot hold.
+  const AVStream* addCover(MovieOutput& output) {
+    const AVStream* cover = attachedPicture(_input);
+    if (cover == nullptr || static_cast<std::size_t>(cover->attached_pic.size) > kMaximumPictureFileBytes)
+      return nullptr;
+    const AVCodecID codec = cover->codecpar->codec_id;
+    if (codec != AV_CODEC_ID_MJPEG && codec != AV_CODEC_ID_PNG && codec != AV_CODEC_ID_BMP) return nullptr;
+    const Result<AVStream*> stream = output.addStream(*cover, *cover->codecpar, kCoverTimeBase);
+    return stream ? *stream : nullptr;
+  }
+
+  Result<void> writeCover(const AVStream& stream, MovieOutput& output) {
+    const Packet packet(av_packet_clone(&attachedPicture(_input)->attached_pic));
+    if (!packet) return failure(AVERROR(ENOMEM), _input.path());
+    packet->pts = packet->dts = 0;
+    return output.write(*packet, stream, kCoverTimeBase);
   }
 
   Result<void> carryPackets() {
@@ -158,10 +212,27 @@ class Transcode {
   }
 
   Input _input;
-  Facts _facts;
+  const Facts& _facts;
+  Copying _copying;
   TranscodeProgress& _progress;
   std::map<int, std::unique_ptr<StreamChain>> _chains;  // by index of the source stream
 };
+
+struct Attempt {
+  Result<void> result;
+  bool isUnfitForCopying = false;
+};
+
+Attempt attempt(const std::filesystem::path& file, const Facts& facts, const Target& target, Copying copying,
+                TranscodeProgress& progress) {
+  Result<Input> input = Input::open(file, kInspectionSeconds);
+  if (!input) return {input.error()};
+  if (Result<void> completed = input->findStreamInfo(); !completed) return {completed};
+  if (!progress.goOn()) return {TranscodeProgress::stopped(file)};
+  Transcode transcode(*std::move(input), facts, copying, progress);
+  Result<void> result = transcode.run(target);
+  return {std::move(result), transcode.isUnfitForCopying()};
+}
 
 Result<void> transcode(const Url& source, const Url& destination, OutputKind kind, PictureSize box,
                        const TranscoderProgressBlock& block) {
@@ -169,22 +240,23 @@ Result<void> transcode(const Url& source, const Url& destination, OutputKind kin
     if (!url->isFileUrl()) return Error{ErrorKind::Unsupported, "Only local files are converted.", {}};
   }
   const std::filesystem::path file = source.relativePath();
+  const Target target{kind, box, destination.relativePath()};
+  std::error_code ignored;
+  if (std::filesystem::equivalent(file, target.file, ignored)) {
+    return Error{ErrorKind::AlreadyExists, "A file is not replaced by its own conversion.", file};
+  }
   TranscodeProgress progress(block);
   progress.begin();
-  Result<Facts> facts = gatherFacts(file, kind == OutputKind::Movie);
+  const Result<Facts> facts = gatherFacts(file, kind == OutputKind::Movie);
   if (!facts) return facts.error();
-  Result<Input> input = Input::open(file, kInspectionSeconds);
-  if (!input) return input.error();
-  if (Result<void> completed = input->findStreamInfo(); !completed) return completed;
-  if (!progress.goOn()) return TranscodeProgress::stopped(file);
-  const Result<void> done =
-      Transcode(*std::move(input), *std::move(facts), progress).run(kind, box, destination.relativePath());
-  if (done) {
+  Attempt done = attempt(file, *facts, target, Copying::WherePossible, progress);
+  if (!done.result && done.isUnfitForCopying) done = attempt(file, *facts, target, Copying::Never, progress);
+  if (done.result) {
     progress.complete();
   } else if (progress.isStopped()) {
     return TranscodeProgress::stopped(file);
   }
-  return done;
+  return done.result;
 }
 
 }  // namespace

@@ -20,11 +20,14 @@ class StreamChain {
   virtual Result<void> take(AVPacket& packet) = 0;
   /// Delivers what is still on its way.
   virtual Result<void> finish() = 0;
-  /// Whether anything came out.
+  /// Whether anything came out, where something must.
   [[nodiscard]] virtual bool hasDelivered() const = 0;
+  /// Whether `take` failed because the stream is not, as it had seemed, one that can be passed on as it is.
+  [[nodiscard]] virtual bool isUnfit() const { return false; }
 };
 
-/// Passes packets on as they are; repairs decoding times that do not rise.
+/// Passes packets on as they are; repairs decoding times that do not rise. Unfit once the decoder's set-up changes,
+/// for which the output has no place.
 Result<std::unique_ptr<StreamChain>> makeCopyChain(const AVStream& source, MovieOutput& output);
 
 /// H.264 High with the plan's size; `fields` as found out before.
@@ -36,5 +39,10 @@ Result<std::unique_ptr<StreamChain>> makeVideoEncodeChain(const Input& input, AV
 /// AAC-LC, without gaps: sound that starts late or pauses is filled with silence.
 Result<std::unique_ptr<StreamChain>> makeAudioEncodeChain(const Input& input, const AVStream& source,
                                                           const AudioPlan& plan, MovieOutput& output);
+
+/// Whether subtitles are text. Others are pictures, which the output has no place for.
+bool isTextSubtitle(const AVStream& stream);
+/// Timed text. What is no cue is left out.
+Result<std::unique_ptr<StreamChain>> makeSubtitleChain(const Input& input, const AVStream& source, MovieOutput& output);
 
 }  // namespace quilt::platform::ffmpeg

@@ -110,8 +110,10 @@ VideoTraits videoTraits(const Input& input, AVStream& stream) {
   return traits;
 }
 
-VideoPlan planVideo(const VideoTraits& traits, PictureSize box) {
-  if (isCopyable(traits, box)) return {.isCopied = true, .size = traits.stored, .timeBase = traits.timeBase};
+VideoPlan planVideo(const VideoTraits& traits, PictureSize box, Copying copying) {
+  if (copying == Copying::WherePossible && isCopyable(traits, box)) {
+    return {.isCopied = true, .size = traits.stored, .timeBase = traits.timeBase};
+  }
   const PictureSize shown = turned(withSquarePixels(traits.stored, traits.pixelShape), traits.orientation);
   return {.isCopied = false, .size = fittedSize(shown, box), .timeBase = fineTimeBase(traits.timeBase)};
 }
@@ -127,7 +129,7 @@ AudioTraits audioTraits(const Input& input, AVStream& stream) {
           .startsAfter = startsAfter(input, stream)};
 }
 
-AudioPlan planAudio(const AudioTraits& traits) {
+AudioPlan planAudio(const AudioTraits& traits, Copying copying) {
   constexpr int ofDiscs = 44'100;
   constexpr int ofVideo = 48'000;
   constexpr std::int64_t monoBitRate = 96'000;
@@ -137,9 +139,9 @@ AudioPlan planAudio(const AudioTraits& traits) {
   plan.sampleRate = isKept ? traits.sampleRate : traits.sampleRate % (ofDiscs / 4) == 0 ? ofDiscs : ofVideo;
   plan.channels = std::clamp(traits.channels, 1, 2);
   plan.bitRate = plan.channels == 1 ? monoBitRate : stereoBitRate;
-  plan.isCopied = traits.codec == AV_CODEC_ID_AAC && traits.profile == FF_PROFILE_AAC_LOW && isKept &&
-                  traits.channels == plan.channels && traits.hasHeader && traits.isTimedWell &&
-                  traits.startsAfter <= kLatestCopiedStart;
+  plan.isCopied = copying == Copying::WherePossible && traits.codec == AV_CODEC_ID_AAC &&
+                  traits.profile == FF_PROFILE_AAC_LOW && isKept && traits.channels == plan.channels &&
+                  traits.hasHeader && traits.isTimedWell && traits.startsAfter <= kLatestCopiedStart;
   return plan;
 }
 

@@ -3,6 +3,7 @@
 
 #include <cstdint>
 #include <string>
+#include <vector>
 
 #include "quilt/platform/ffmpeg/Handles.h"
 #include "quilt/platform/ffmpeg/Input.h"
@@ -16,6 +17,8 @@ inline constexpr PictureSize kHighDefinition{1280, 720};
 inline constexpr PictureSize kStandardDefinition{640, 480};
 
 inline constexpr int kMostFramesPerSecond = 60;
+
+enum class Copying { WherePossible, Never };
 
 /// The picture as it will be: the shown size fitted into `box`, never enlarged, both sides even and at least 2.
 PictureSize fittedSize(PictureSize shown, PictureSize box);
@@ -45,10 +48,13 @@ struct VideoPlan {
   bool isCopied = false;
   PictureSize size;           ///< of the pictures that come out
   AVRational timeBase{1, 1};  ///< of their times
+  /// When chapters start, in seconds, in order. Encoded pictures are whole there, so that players that jump show them
+  /// at once.
+  std::vector<double> chapterStarts{};
 };
 
 /// Copies H.264 that any player shows as it is and that fits `box`; everything else is encoded.
-VideoPlan planVideo(const VideoTraits& traits, PictureSize box);
+VideoPlan planVideo(const VideoTraits& traits, PictureSize box, Copying copying = Copying::WherePossible);
 
 /// Ticks in which a stream's times, and MP4's customary ones, can be told without rounding, where that is possible.
 AVRational fineTimeBase(AVRational source);
@@ -74,6 +80,6 @@ struct AudioPlan {
 };
 
 /// Copies AAC-LC of one or two channels at 44.1 or 48 kHz; everything else is encoded.
-AudioPlan planAudio(const AudioTraits& traits);
+AudioPlan planAudio(const AudioTraits& traits, Copying copying = Copying::WherePossible);
 
 }  // namespace quilt::platform::ffmpeg

@@ -127,7 +127,7 @@ class VideoEncodeChain final : public StreamChain {
   Result<void> pullPictures() {
     while (_filters->pull(*_filtered) >= 0) {
       _filtered->pts = av_rescale_q(_filtered->pts, _filters->timeBase(), _encoder->time_base);
-      _filtered->pict_type = AV_PICTURE_TYPE_NONE;  // the encoder decides
+      _filtered->pict_type = startsChapter(_filtered->pts) ? AV_PICTURE_TYPE_I : AV_PICTURE_TYPE_NONE;
       _filtered->sample_aspect_ratio = {1, 1};
       _filtered->interlaced_frame = 0;
       // What the picture went through says nothing of it any more.
@@ -137,6 +137,15 @@ class VideoEncodeChain final : public StreamChain {
       if (!encoded) return encoded;
     }
     return {};
+  }
+
+  bool startsChapter(std::int64_t time) {
+    const double soon = seconds(time + _clock.usualDuration() / 2, _plan.timeBase);
+    bool starts = false;
+    for (; _nextChapter < _plan.chapterStarts.size() && _plan.chapterStarts[_nextChapter] <= soon; ++_nextChapter) {
+      starts = true;
+    }
+    return starts;
   }
 
   Result<void> encode(const AVFrame* picture) {
@@ -173,6 +182,7 @@ class VideoEncodeChain final : public StreamChain {
   Packet _packet{av_packet_alloc()};
   std::int64_t _lastTime = -1;
   std::int64_t _lastDuration = 0;
+  std::size_t _nextChapter = 0;
   bool _hasDelivered = false;
 };
 

@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <string>
 
+#include "quilt/platform/glance/PageImage.h"
 #include "quilt/platform/interfaces/Services.h"
 
 namespace quilt::platform {
@@ -47,7 +48,16 @@ std::shared_ptr<ImageWrapper> pictureOfSound(const std::filesystem::path& path) 
   return artwork ? artwork : drawing("AudioPreview", "png");
 }
 
-std::shared_ptr<ImageWrapper> pictureOf(const Url& url) {
+bool isDocument(const std::filesystem::path& path) {
+  const std::optional<std::string> type = FDYTypePreferredIdentifier(path);
+  return type && types::isPagedDocument(*services().types, *type);
+}
+
+}  // namespace
+
+GlanceServices::GlanceServices() : _documents(std::make_shared<OpenDocuments>()) {}
+
+std::shared_ptr<ImageWrapper> GlanceServices::pictureOf(const Url& url) const {
   if (!url.isFileUrl()) {
     const std::string& text = url.absoluteString();
     const bool isWeb = text.starts_with("http:") || text.starts_with("https:");
@@ -60,20 +70,46 @@ std::shared_ptr<ImageWrapper> pictureOf(const Url& url) {
   if (isOf(types::kImage)) return ImageWrapper::imageWithPath(path);
   if (isOf(types::kMovie)) return pictureOfMovie(path);
   if (isOf(types::kAudio)) return pictureOfSound(path);
+  if (types::isPagedDocument(*services().types, *type)) return pictureOfPage(path, 0);
   return nullptr;
 }
-
-}  // namespace
 
 std::shared_ptr<ImageWrapper> GlanceServices::thumbnailImageForURL(const Url& url) const {
   const std::shared_ptr<ImageWrapper> picture = pictureOf(url);
   return picture ? picture->convertToSD() : nullptr;
 }
 
-std::size_t GlanceServices::documentPagesCount(const std::filesystem::path&) const { return 0; }
+std::shared_ptr<ImageWrapper> GlanceServices::pictureOfPage(const std::filesystem::path& path,
+                                                            std::size_t index) const {
+  const Result<OpenDocuments::Found> found = _documents->open(path);
+  if (!found) return nullptr;
+  const Result<Size> points = found->document->sizeOfPage(index);
+  if (points) return std::make_shared<PageImage>(PageImage::Page{_documents, path, found->identity, index}, *points);
+  if (points.error().kind != ErrorKind::NotFound) _documents->warn(path, found->identity, points.error());
+  return nullptr;
+}
 
-std::optional<DocumentPage> GlanceServices::documentPageAtIndex(const std::filesystem::path&, std::size_t) const {
-  return std::nullopt;
+void GlanceServices::prepareDocument(const std::filesystem::path& path) const {
+  if (isDocument(path)) (void)_documents->open(path);
+}
+
+std::size_t GlanceServices::documentPagesCount(const std::filesystem::path& path) const {
+  if (!isDocument(path)) return 0;
+  const Result<std::size_t> count = _documents->pageCount(path);
+  return count ? *count : 0;
+}
+
+std::optional<DocumentPage> GlanceServices::documentPageAtIndex(const std::filesystem::path& path,
+                                                                std::size_t index) const {
+  if (!isDocument(path)) return std::nullopt;
+  const std::shared_ptr<ImageWrapper> image = pictureOfPage(path, index);
+  if (!image) return std::nullopt;
+  const Result<OpenDocuments::Found> found = _documents->open(path);
+  if (!found) return std::nullopt;
+  // A page whose text cannot be read is shown without it.
+  const Result<std::string> text = found->document->textOfPage(index);
+  if (!text) _documents->warn(path, found->identity, text.error());
+  return DocumentPage{image, text ? *text : std::string()};
 }
 
 }  // namespace quilt::platform

@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "quilt/platform/inspection/InspectionByKind.h"
 
-#include <algorithm>
 #include <array>
 #include <optional>
 #include <string>
@@ -15,14 +14,10 @@ namespace {
 
 constexpr std::array kMovieKinds{types::kMovie, types::kVideo, types::kAudio, types::kAudiovisual};
 constexpr std::array kImageKinds{types::kImage};
-constexpr std::array kPagedKinds{types::kPDF, types::kEPUB, types::kEPUBContainer};
-constexpr std::array kOfficeKinds{types::kTextDocument,     types::kFlatTextDocument, types::kWordDoc,
-                                  types::kWordML,           types::kWordOpenXML,      types::kPresentation,
-                                  types::kFlatPresentation, types::kPowerPointPpt,    types::kPowerPointOpenXML};
 
 template <class Kinds>
 bool isOneOf(const std::string& identifier, const Kinds& kinds) {
-  return std::ranges::any_of(kinds, [&](const char* kind) { return services().types->conformsTo(identifier, kind); });
+  return types::isOneOf(*services().types, identifier, kinds);
 }
 
 }  // namespace
@@ -40,8 +35,8 @@ Result<MediaFacts> InspectionByKind::inspect(const std::filesystem::path& path) 
   }
   if (isOneOf(*identifier, kMovieKinds)) return _movies->inspect(path);
   if (isOneOf(*identifier, kImageKinds)) return _images->inspect(path);
-  if (isOneOf(*identifier, kPagedKinds)) return _documents->inspect(path);
-  if (isOneOf(*identifier, kOfficeKinds)) {
+  if (isOneOf(*identifier, types::kPagedDocuments)) return _documents->inspect(path);
+  if (isOneOf(*identifier, types::kOfficeDocuments)) {
     if (!services().files->fileExistsAtPath(path)) return Error{ErrorKind::NotFound, "There is no such file.", path};
     MediaFacts facts;
     facts.mimeType = services().types->mimeType(*identifier);

@@ -24,6 +24,9 @@ class Glance {
 
   /// A picture that stands for the file, or null.
   [[nodiscard]] virtual std::shared_ptr<ImageWrapper> thumbnailImageForURL(const Url& url) const = 0;
+  /// Does beforehand what may take long: a document whose pages are asked for on the main thread is prepared on the
+  /// thread that wants them. Asking without it answers the same, later.
+  virtual void prepareDocument(const std::filesystem::path& path) const { (void)path; }
   /// 0 for what is no document, cannot be opened or has no pages.
   [[nodiscard]] virtual std::size_t documentPagesCount(const std::filesystem::path& path) const = 0;
   /// None past the last page.
@@ -33,6 +36,7 @@ class Glance {
 
 /// The installed service's operations.
 std::shared_ptr<ImageWrapper> FDYThumbnailImageForURL(const Url& url);
+void FDYPreviewPrepareDocument(const std::filesystem::path& path);
 std::size_t FDYPreviewDocumentPagesCount(const std::filesystem::path& path);
 std::optional<DocumentPage> FDYPreviewDocumentPageAtIndex(const std::filesystem::path& path, std::size_t index);
 

@@ -41,6 +41,8 @@ std::shared_ptr<ImageWrapper> FDYThumbnailImageForURL(const Url& url) {
   return services().glance->thumbnailImageForURL(url);
 }
 
+void FDYPreviewPrepareDocument(const std::filesystem::path& path) { services().glance->prepareDocument(path); }
+
 std::size_t FDYPreviewDocumentPagesCount(const std::filesystem::path& path) {
   return services().glance->documentPagesCount(path);
 }

@@ -8,6 +8,7 @@
 #include "quilt/platform/interfaces/Clock.h"
 #include "quilt/platform/interfaces/DateFormatter.h"
 #include "quilt/platform/interfaces/Diagnostics.h"
+#include "quilt/platform/interfaces/DocumentToolkit.h"
 #include "quilt/platform/interfaces/Drawing.h"
 #include "quilt/platform/interfaces/FDYArchive.h"
 #include "quilt/platform/interfaces/FDYAudioPreview.h"
@@ -47,6 +48,7 @@ struct Services {
   std::shared_ptr<Diagnostics> diagnostics;
   std::shared_ptr<JsonWriter> json;
   std::shared_ptr<DateFormatter> dates;
+  std::shared_ptr<DocumentToolkit> documents;
 };
 
 /// The process's set. Written by installServices and ScopedService only.

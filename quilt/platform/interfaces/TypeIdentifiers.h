@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <array>
 #include <filesystem>
 #include <optional>
 #include <string>
@@ -78,6 +79,28 @@ class TypeIdentifiers {
   /// The preferred MIME type of an identifier, or none.
   [[nodiscard]] virtual std::optional<std::string> mimeType(std::string_view identifier) const = 0;
 };
+
+namespace types {
+/// Documents that have pages, or get them from a layout.
+inline constexpr std::array kPagedDocuments{kPDF, kEPUB, kEPUBContainer};
+/// Documents that an office program turns into pages.
+inline constexpr std::array kOfficeDocuments{kTextDocument,     kFlatTextDocument, kWordDoc,
+                                             kWordML,           kWordOpenXML,      kPresentation,
+                                             kFlatPresentation, kPowerPointPpt,    kPowerPointOpenXML};
+
+/// Whether the type conforms to one of the kinds.
+template <class Kinds>
+bool isOneOf(const TypeIdentifiers& types, std::string_view identifier, const Kinds& kinds) {
+  for (const char* kind : kinds)
+    if (types.conformsTo(identifier, kind)) return true;
+  return false;
+}
+
+/// Whether files of the type are shown page by page.
+inline bool isPagedDocument(const TypeIdentifiers& types, std::string_view identifier) {
+  return isOneOf(types, identifier, kPagedDocuments) || isOneOf(types, identifier, kOfficeDocuments);
+}
+}  // namespace types
 
 /// The installed service's preferredIdentifier.
 std::optional<std::string> FDYTypePreferredIdentifier(const std::filesystem::path& path);

@@ -3,6 +3,7 @@
 
 #include <cstdlib>
 #include <exception>
+#include <utility>
 
 namespace quilt::platform::mupdf {
 
@@ -19,13 +20,23 @@ std::size_t& sizeOf(void* start) { return *static_cast<std::size_t*>(start); }
 
 }  // namespace
 
+// MuPDF asks for memory wherever it works, so that is where its time is watched.
+bool MupdfContext::Budget::isOver() {
+  constexpr unsigned kCallsBetweenLooks = 64;
+  if (!isLate && ++count % kCallsBetweenLooks == 0 && std::chrono::steady_clock::now() > deadline) {
+    isLate = true;
+    cookie.abort = 1;
+  }
+  return isLate;
+}
+
 void* MupdfContext::allocate(void* user, std::size_t size) { return reallocate(user, nullptr, size); }
 
 void* MupdfContext::reallocate(void* user, void* old, std::size_t size) {
   Budget& budget = *static_cast<Budget*>(user);
   void* start = old ? static_cast<char*>(old) - kPrefix : nullptr;
   const std::size_t before = start ? sizeOf(start) : 0;
-  if (size > kMaximumMemory || budget.used - before + size > kMaximumMemory) return nullptr;
+  if (budget.isOver() || size > kMaximumMemory || budget.used - before + size > kMaximumMemory) return nullptr;
   start = std::realloc(start, size + kPrefix);
   if (!start) return nullptr;
   sizeOf(start) = size;
@@ -60,6 +71,8 @@ Result<void> MupdfContext::run(std::string_view sentence, const std::filesystem:
   const char* words = nullptr;
   fz_var(isOutOfMemory);
   fz_var(words);
+  _budget.deadline = std::chrono::steady_clock::now() + kMaximumTime;
+  _budget.cookie = {};
   fz_try(_context) {
     // An exception must not pass MuPDF's own frames.
     try {
@@ -69,6 +82,8 @@ Result<void> MupdfContext::run(std::string_view sentence, const std::filesystem:
     }
   }
   fz_catch(_context) { words = fz_caught_message(_context); }
+  _budget.deadline = kNever;
+  if (std::exchange(_budget.isLate, false)) return error("it takes too long");
   if (isOutOfMemory) return error("no memory");
   if (words) return error(words);
   return {};

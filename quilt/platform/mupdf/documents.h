@@ -10,6 +10,11 @@
 
 namespace quilt::platform::mupdf {
 
+enum class DocumentKind { PDF, EPUB };
+
+/// What a file is by its first bytes, or by its name for a PDF whose start is lost. A packed file counts as EPUB.
+Result<DocumentKind> kindOfDocument(const std::filesystem::path& path);
+
 Result<MediaFacts> inspectPDF(const std::filesystem::path& path);
 Result<MediaFacts> inspectEPUB(const std::filesystem::path& path);
 

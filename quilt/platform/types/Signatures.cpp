@@ -81,6 +81,22 @@ const char* typeOfChunks(std::string_view start) {
   return nullptr;
 }
 
+// The name of the first file of a zip archive, as far as it can be seen.
+std::string_view firstPackedName(std::string_view start) {
+  constexpr std::size_t lengthAt = 26, nameAt = 30;
+  if (start.size() < nameAt) return {};
+  const auto low = static_cast<unsigned char>(start[lengthAt]), high = static_cast<unsigned char>(start[lengthAt + 1]);
+  return start.substr(nameAt, low + std::size_t{high} * 256);
+}
+
+// Office documents say what they are in the names of their parts, of which some lie at the start.
+const char* typeOfPackage(std::string_view start) {
+  if (!start.starts_with("PK\x03\x04")) return nullptr;
+  if (start.find("word/document.xml") != std::string_view::npos) return kWordOpenXML;
+  if (start.find("ppt/presentation.xml") != std::string_view::npos) return kPowerPointOpenXML;
+  return nullptr;
+}
+
 bool isBmp(std::string_view start) {
   // Two letters alone would claim texts; the header's length behind them is one of few.
   if (!holds(start, 0, "BM") || start.size() < 18) return false;
@@ -94,6 +110,7 @@ bool isBmp(std::string_view start) {
 const char* typeOfContent(std::string_view start) {
   if (const char* boxes = typeOfBoxes(start)) return boxes;
   if (const char* chunks = typeOfChunks(start)) return chunks;
+  if (const char* package = typeOfPackage(start)) return package;
   for (const Signature& signature : kSignatures)
     if (holds(start, signature.offset, signature.bytes)) return signature.identifier;
   if (isBmp(start)) return kBMP;
@@ -102,6 +119,18 @@ const char* typeOfContent(std::string_view start) {
       (start[2] & '\xF0') != '\xF0')
     return kMP3;
   return nullptr;
+}
+
+bool mayBePackedDocument(std::string_view start) {
+  const std::string_view name = firstPackedName(start);
+  if (name.empty()) return true;
+  for (const std::string_view known :
+       {"mimetype"sv, "[Content_Types].xml"sv, "_rels/"sv, "docProps/"sv, "customXml/"sv, "word/"sv, "ppt/"sv,
+        "META-INF/"sv, "Configurations"sv, "Thumbnails/"sv, "Pictures/"sv, "content.xml"sv, "styles.xml"sv,
+        "meta.xml"sv, "settings.xml"sv, "layout-cache"sv}) {
+    if (name.starts_with(known)) return true;
+  }
+  return false;
 }
 
 bool isPlainText(std::string_view start) {

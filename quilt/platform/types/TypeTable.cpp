@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <cctype>
+#include <initializer_list>
 #include <unordered_map>
 
 #include "quilt/platform/base/Paths.h"
@@ -44,11 +45,48 @@ bool rowConformsTo(const TypeRow* row, std::string_view other) {
                      [other](const char* parent) { return rowConformsTo(rowNamed(parent), other); });
 }
 
-/// The families whose confusion does harm: what one decoder is handed must be of its family.
+constexpr const char* kDocumentFamily = "org.quilt.document";
+constexpr const char* kArchiveFamily = "public.archive";
+
+/// The families whose confusion does harm: what one decoder is handed must be of its family. One of five pointers.
 const char* familyOf(const TypeRow* row) {
-  for (const char* family : {types::kAudiovisual, types::kImage, "org.quilt.document", types::kText, "public.archive"})
+  for (const char* family : {types::kAudiovisual, types::kImage, kDocumentFamily, types::kText, kArchiveFamily})
     if (rowConformsTo(row, family)) return family;
   return nullptr;
+}
+
+bool isOneOf(const TypeRow* row, std::initializer_list<const char*> identifiers) {
+  return std::ranges::any_of(identifiers, [row](const char* one) { return row->identifier == std::string_view(one); });
+}
+
+bool isPaged(const TypeRow* row) { return isOneOf(row, {types::kPDF, types::kEPUBContainer}); }
+
+bool isPacked(const TypeRow* row) {
+  return isOneOf(row, {types::kWordOpenXML, types::kPowerPointOpenXML, types::kTextDocument, types::kPresentation});
+}
+
+/// Whether a file of plain text cannot be what its extension says. Some documents are written as text.
+bool isTextInDisguise(const TypeRow* named, std::string_view start) {
+  if (rowConformsTo(named, types::kText) || rowConformsTo(named, types::kSVG)) return false;
+  if (!rowConformsTo(named, kDocumentFamily)) return true;
+  if (isOneOf(named, {types::kPDF})) {  // one that lost its first line has objects still
+    return start.find("%PDF-") == std::string_view::npos && start.find(" obj") == std::string_view::npos;
+  }
+  return isPaged(named) || isPacked(named) || isOneOf(named, {types::kPowerPointPpt});
+}
+
+/// Whether a file whose content is of the one type may be taken for the other, which its extension says.
+bool mayPassAs(const TypeRow* named, const TypeRow* shown, std::string_view start) {
+  const char* namedFamily = familyOf(named);
+  const char* shownFamily = familyOf(shown);
+  if (!namedFamily || !shownFamily) return false;
+  if (namedFamily == kArchiveFamily) return shownFamily == kArchiveFamily;
+  if (namedFamily == kDocumentFamily && shownFamily == kArchiveFamily) {
+    return isOneOf(named, {types::kEPUBContainer}) || (isPacked(named) && mayBePackedDocument(start));
+  }
+  // Pages and office documents are opened by different programs.
+  if (namedFamily == kDocumentFamily && (isPaged(named) || isPaged(shown))) return named == shown;
+  return namedFamily == shownFamily;
 }
 
 }  // namespace
@@ -84,17 +122,9 @@ std::optional<std::string> TypeTable::preferredIdentifier(const std::filesystem:
   }
   if (!content) {
     // Damaged files have no signature either, and keep their extension's type; a text is no movie, whatever its name.
-    const bool isTextInDisguise = isPlainText(*start) && familyOf(named) != std::string_view(types::kText) &&
-                                  !rowConformsTo(named, "org.quilt.document") && !rowConformsTo(named, types::kSVG);
-    return isTextInDisguise ? types::kText : named->identifier;
+    return isPlainText(*start) && isTextInDisguise(named, *start) ? types::kText : named->identifier;
   }
-  const TypeRow* shown = rowNamed(content);
-  const char* namedFamily = familyOf(named);
-  const char* shownFamily = familyOf(shown);
-  const bool isContainerOfDocument =
-      shownFamily == std::string_view("public.archive") && namedFamily == std::string_view("org.quilt.document");
-  const bool sameFamily = namedFamily && shownFamily && std::string_view(namedFamily) == shownFamily;
-  return sameFamily || isContainerOfDocument ? named->identifier : content;
+  return mayPassAs(named, rowNamed(content), *start) ? named->identifier : content;
 }
 
 }  // namespace quilt::platform

@@ -86,7 +86,7 @@ class BitmapSource final : public PixelSource {
         return vips_copy(in, out, "interpretation", VIPS_INTERPRETATION_sRGB, nullptr);
       });
     }
-    if (image) image = scaled(image, fitted);
+    if (image && fitted != size()) image = scaled(image, fitted);
     if (!image) return failure(ErrorKind::Damaged, "The image cannot be scaled", {});
     return image;
   }

@@ -51,6 +51,12 @@ TEST(AbsentTest, Movies) {
   expectHonest("Opening of movies", "/a.mp4", {open, open});
 }
 
+TEST(AbsentTest, Documents) {
+  const AbsentDocumentToolkit documents;
+  const auto open = [&] { return errorOf(documents.openDocument("/a.pdf")); };
+  expectHonest("Showing of document pages", "/a.pdf", {open, open});
+}
+
 TEST(AbsentTest, Inspection) {
   const AbsentInspector inspector("Inspection of images");
   const auto inspect = [&] { return errorOf(inspector.inspect("/a.png")); };

@@ -208,6 +208,13 @@ TEST_F(FfmpegAudioPreviewTest, ChannelsWithoutPlacesCountAlike) {
   EXPECT_EQ(bytes.substr(24), std::string(4, '\x04'));  // 11264 / 11 / 256
 }
 
+TEST_F(FfmpegAudioPreviewTest, PacketsOfManySpeechFramesAreTakenWhole) {
+  QUILT_CORPUS_FILE(speech, "h263-amr-176x144-15s.3gp");
+  const std::string bytes = samplesOf(speech);
+  constexpr double points = 15.0 * 8000 / 256;
+  EXPECT_NEAR(field(bytes, 16), points, points / 20);
+}
+
 TEST_F(FfmpegAudioPreviewTest, ALongFileIsWrittenWhole) {
   const Samples samples = sine(48'000 * 60, 20000);
   EXPECT_TRUE(samplesOf(makeWav(samples, 2)) == expectedFile(samples, 2, 48000));

@@ -132,6 +132,18 @@ TEST_F(TranscoderCorpusTest, SoundOfEveryFormatWorks) {
   }
 }
 
+TEST_F(TranscoderCorpusTest, PacketsOfManySpeechFramesAreHeardWhole) {
+  QUILT_CORPUS_FILE(file, "h263-amr-176x144-15s.3gp");
+  ASSERT_TRUE(makeAudio(file));
+  const std::vector<float> sound = support::soundOf(output());
+  const int rate = judge(output()).audio().sampleRate;
+  int silent = 0;
+  for (int tenth = 10; tenth < 100; ++tenth) {
+    silent += support::loudness(sound, 1, 0, rate, tenth * 0.1, tenth * 0.1 + 0.1) < 1e-5 ? 1 : 0;
+  }
+  EXPECT_LT(silent, 5);
+}
+
 TEST_F(TranscoderCorpusTest, DamagedRealFilesDoNoHarm) {
   for (const char* name :
        {"bad-m4a-infinite-loop.m4a", "bad-m4a-truncated.m4a", "bad-mov-poc-ghsa.mov", "bad-mp3-excessive-alloc.mp3",

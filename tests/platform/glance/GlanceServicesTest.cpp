@@ -158,10 +158,5 @@ TEST_F(GlanceServicesTest, AnythingElseHasNone) {
   EXPECT_EQ(thumbnail("a.audio"), "drawing of sound in SD");
 }
 
-TEST_F(GlanceServicesTest, DocumentsHaveNoPagesYet) {
-  EXPECT_EQ(GlanceServices().documentPagesCount("/a.pdf"), 0U);
-  EXPECT_FALSE(GlanceServices().documentPageAtIndex("/a.pdf", 0));
-}
-
 }  // namespace
 }  // namespace quilt::platform

@@ -21,6 +21,14 @@ const std::string kMovieStart = "\0\0\0\x18"s + "ftypisom" + std::string(20, '\0
 const std::string kZipStart = "PK\x03\x04" + std::string(30, '\0');
 const std::string kNoise = "\x01\x02\x03\x04"s;
 
+/// The start of a zip archive whose first file has the name, of which `length` bytes may be the name and the rest be
+/// its content.
+std::string packed(const std::string& name, std::size_t length = 0) {
+  std::string header = "PK\x03\x04" + std::string(26, '\0');
+  header[26] = static_cast<char>(length ? length : name.size());
+  return header + name;
+}
+
 class TypeTableTest : public ::testing::Test {
  protected:
   /// The type of a file with the name and the content.
@@ -88,6 +96,55 @@ TEST_F(TypeTableTest, ContentOfAnotherFamilyDecides) {
 TEST_F(TypeTableTest, AZipNamedAsADocumentIsThatDocument) {
   EXPECT_EQ(kWordOpenXML, typeOf("a.docx", kZipStart));
   EXPECT_EQ(kEPUBContainer, typeOf("a.epub", kZipStart));
+}
+
+TEST_F(TypeTableTest, AnyOtherZipIsAnArchiveWhateverItsName) {
+  const std::string archive = packed("holiday/1.jpg");
+  for (const char* name : {"a.docx", "a.pptx", "a.odt", "a.pdf", "a.doc", "a.mp4", "a"})
+    EXPECT_EQ("public.zip-archive", typeOf(name, archive)) << name;
+  for (const char* first : {"[Content_Types].xml", "_rels/.rels", "docProps/core.xml", "customXml/item1.xml"})
+    EXPECT_EQ(kPowerPointOpenXML, typeOf("a.pptx", packed(first))) << first;
+  EXPECT_EQ(kTextDocument, typeOf("a.odt", packed("mimetype")));
+  EXPECT_EQ(kEPUBContainer, typeOf("a.epub", packed("OPS/chapter.xhtml"))) << "its reader tells";
+}
+
+TEST_F(TypeTableTest, PagedDocumentsAreToldByTheirContent) {
+  const std::string book = packed("mimetypeapplication/epub+zip", 8);
+  EXPECT_EQ(kPDF, typeOf("a.docx", "%PDF-1.7"));
+  EXPECT_EQ(kPDF, typeOf("a.epub", "%PDF-1.7"));
+  EXPECT_EQ(kEPUBContainer, typeOf("a.pdf", book));
+  EXPECT_EQ(kEPUBContainer, typeOf("a.odt", book));
+  EXPECT_EQ(kWordOpenXML, typeOf("a.pdf", packed("word/document.xml")));
+  EXPECT_EQ(kWordDoc, typeOf("a.pdf", "\xD0\xCF\x11\xE0\xA1\xB1\x1A\xE1"));
+}
+
+TEST_F(TypeTableTest, OfficeProgramsTellTheirOwnDocumentsApart) {
+  EXPECT_EQ(kWordOpenXML, typeOf("a.docx", "\xD0\xCF\x11\xE0\xA1\xB1\x1A\xE1")) << "as one with a password is stored";
+  EXPECT_EQ(kWordDoc, typeOf("a.doc", packed("word/document.xml")));
+  EXPECT_EQ(kWordDoc, typeOf("a.doc", "<html>a page that calls itself a document</html>"));
+  EXPECT_EQ(kWordDoc, typeOf("a.doc", "{\\rtf1 words}"));
+}
+
+TEST_F(TypeTableTest, SpreadsheetsAreNoTextDocuments) {
+  for (const char* name : {"a.xls", "a.xlsx", "a.ods"}) {
+    const std::string type =
+        typeOf(name, name == std::string("a.xls") ? "\xD0\xCF\x11\xE0\xA1\xB1\x1A\xE1" : kZipStart);
+    for (const char* other : kOfficeDocuments) EXPECT_FALSE(table.conformsTo(type, other)) << name;
+  }
+}
+
+TEST_F(TypeTableTest, PackedDocumentsWithoutAnExtensionAreKnownByTheirParts) {
+  EXPECT_EQ(kWordOpenXML, typeOf("a", packed("[Content_Types].xml") + packed("word/document.xml")));
+  EXPECT_EQ(kPowerPointOpenXML, typeOf("a", packed("[Content_Types].xml") + packed("ppt/presentation.xml")));
+  EXPECT_EQ(kWordOpenXML, typeOf("a.mp4", packed("word/document.xml")));
+}
+
+TEST_F(TypeTableTest, ATextNamedAsADocumentThatIsNeverTextIsAText) {
+  for (const char* name : {"a.pdf", "a.epub", "a.docx", "a.pptx", "a.odt", "a.odp", "a.ppt"})
+    EXPECT_EQ(kText, typeOf(name, "just a text")) << name;
+  EXPECT_EQ(kPDF, typeOf("a.pdf", "1 0 obj\n<< >>\nendobj\n")) << "it lost its first line";
+  EXPECT_EQ(kPDF, typeOf("a.pdf", "a line before\n%PDF-1.4\n"));
+  EXPECT_EQ(kWordDoc, typeOf("a.doc", "just a text")) << "which many programs write so";
 }
 
 TEST_F(TypeTableTest, ATextNamedAsAMovieIsAText) {

@@ -1,0 +1,223 @@
+// SPDX-License-Identifier: Apache-2.0
+// Pages of documents beside what else one would use, in one run: `pages FOLDER_OF_MEDIA`. Needs mutool, and cjpeg and
+// pdftoppm where they are to be compared. Ratios are ours / theirs; below 1 is faster. Each figure is the best of
+// several runs.
+#include <fcntl.h>
+#include <spawn.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <chrono>
+#include <cstdio>
+#include <cstdlib>
+#include <filesystem>
+#include <functional>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "quilt/platform/install.h"
+#include "quilt/platform/interfaces/Services.h"
+#include "quilt/platform/mupdf/MupdfDocuments.h"
+
+namespace {
+
+namespace fs = std::filesystem;
+using namespace quilt::platform;
+
+double bestMilliseconds(int runs, const std::function<void()>& job) {
+  double best = 1e12;
+  for (int i = 0; i < runs; ++i) {
+    const auto start = std::chrono::steady_clock::now();
+    job();
+    best = std::min(best, std::chrono::duration<double, std::milli>(std::chrono::steady_clock::now() - start).count());
+  }
+  return best;
+}
+
+// Runs a program, or two joined by a pipe; answers whether all of it succeeded.
+class Pipeline {
+ public:
+  bool run(std::vector<std::vector<std::string>> commands) {
+    int input = -1;
+    std::vector<pid_t> children;
+    for (std::size_t i = 0; i < commands.size(); ++i) {
+      int ends[2] = {-1, -1};
+      if (i + 1 < commands.size() && pipe2(ends, O_CLOEXEC) != 0) return false;
+      children.push_back(start(commands[i], input, ends[1]));
+      for (const int descriptor : {input, ends[1]}) {
+        if (descriptor >= 0) close(descriptor);
+      }
+      input = ends[0];
+    }
+    bool isGood = true;
+    for (const pid_t child : children) {
+      int status = -1;
+      isGood = child > 0 && waitpid(child, &status, 0) == child && status == 0 && isGood;
+    }
+    return isGood;
+  }
+
+ private:
+  static pid_t start(std::vector<std::string>& words, int input, int output) {
+    std::vector<char*> pointers;
+    for (std::string& word : words) pointers.push_back(word.data());
+    pointers.push_back(nullptr);
+    posix_spawn_file_actions_t actions;
+    posix_spawn_file_actions_init(&actions);
+    if (input >= 0) posix_spawn_file_actions_adddup2(&actions, input, STDIN_FILENO);
+    if (output >= 0) {
+      posix_spawn_file_actions_adddup2(&actions, output, STDOUT_FILENO);
+    } else {
+      posix_spawn_file_actions_addopen(&actions, STDOUT_FILENO, "/dev/null", O_WRONLY, 0);
+    }
+    posix_spawn_file_actions_addopen(&actions, STDERR_FILENO, "/dev/null", O_WRONLY, 0);
+    pid_t child = 0;
+    const int failed = posix_spawnp(&child, pointers[0], &actions, nullptr, pointers.data(), environ);
+    posix_spawn_file_actions_destroy(&actions);
+    return failed ? -1 : child;
+  }
+};
+
+double programMilliseconds(int runs, const std::vector<std::vector<std::string>>& commands) {
+  if (!Pipeline().run(commands)) return 0;
+  return bestMilliseconds(runs, [&] { Pipeline().run(commands); });
+}
+
+void printRatio(double ours, double theirs) {
+  if (theirs > 0) {
+    std::printf(" %9.2f %6.2f", theirs, ours / theirs);
+  } else {
+    std::printf(" %9s %6s", "none", "");
+  }
+}
+
+std::shared_ptr<PagedDocument> open(const fs::path& file) {
+  const auto opened = MupdfDocuments().openDocument(file);
+  return opened ? *opened : nullptr;
+}
+
+void writePages(const fs::path& file, const fs::path& output, std::size_t first, std::size_t count,
+                std::size_t step = 1) {
+  const auto document = open(file);
+  for (std::size_t i = first; document && i < count; i += step) {
+    const Result<Size> points = document->sizeOfPage(i);
+    if (!points) return;
+    const Size fitted = FDYFitSizeToSize(*points, kHighDefinition);
+    const auto whole = [](double side) { return static_cast<double>(static_cast<int>(side + 0.5)); };
+    Result<Bitmap> bitmap = document->drawPage(i, {whole(fitted.width), whole(fitted.height)});
+    if (!bitmap) return;
+    const auto image = services().images->imageWithBitmap(*std::move(bitmap));
+    if (!image || !(*image)->saveAsJPGAtPath(output / (std::to_string(i) + ".jpg"))) std::printf("not saved: ");
+  }
+}
+
+// One at a time, and on two threads that share the pages out between them.
+void comparePictures(const fs::path& folder, const fs::path& output) {
+  std::printf("%-28s %6s %9s %9s %9s %6s %9s %6s\n", "pages as JPEG (ms a page)", "pages", "ours", "2 threads",
+              "mutool+", "ratio", "pdftoppm", "ratio");
+  for (const auto& [name, count] : {std::pair{"pdf-policy-193p.pdf", 60},
+                                    {"pdf-book-117p.pdf", 60},
+                                    {"pdf-landscape-18p.pdf", 18},
+                                    {"pdf-in-cc0.pdf", 10}}) {
+    const fs::path file = folder / name;
+    if (!fs::exists(file)) continue;
+    const auto pages = static_cast<std::size_t>(count);
+    const double ours = bestMilliseconds(3, [&] { writePages(file, output, 0, pages); });
+    const double onTwo = bestMilliseconds(3, [&] {
+      std::thread other([&] { writePages(file, output, 1, pages, 2); });
+      writePages(file, output, 0, pages, 2);
+      other.join();
+    });
+    const std::string jpeg = (output / "page.jpg").string();
+    double mutool = 0;
+    for (int page = 1; page <= count; ++page) {
+      const double one = programMilliseconds(
+          2, {{"mutool", "draw", "-q", "-w", "1280", "-h", "720", "-F", "ppm", "-o", "-", file, std::to_string(page)},
+              {"cjpeg", "-quality", "85", "-outfile", jpeg}});
+      if (one == 0) {
+        mutool = 0;
+        break;
+      }
+      mutool += one;
+    }
+    // All pages drawn in one run, which saves most of the starts: the fairer peer.
+    const std::string last = std::to_string(count);
+    double batch = programMilliseconds(3, {{"mutool", "draw", "-q", "-w", "1280", "-h", "720", "-F", "ppm", "-o",
+                                            (output / "p%d.ppm").string(), file, "1-" + last}});
+    for (int page = 1; batch > 0 && page <= count; ++page) {
+      const std::string drawn = (output / ("p" + std::to_string(page) + ".ppm")).string();
+      const double one = programMilliseconds(1, {{"cjpeg", "-quality", "85", "-outfile", jpeg, drawn}});
+      batch = one > 0 ? batch + one : 0;
+    }
+    const double poppler = programMilliseconds(
+        3, {{"pdftoppm", "-jpeg", "-l", last, "-scale-to", "720", file, (output / "poppler").string()}});
+    std::printf("%-28s %6d %9.2f %9.2f", name, count, ours / count, onTwo / count);
+    printRatio(ours / count, batch / count);
+    printRatio(ours / count, poppler / count);
+    std::printf("   one start a page:");
+    printRatio(ours / count, mutool / count);
+    std::printf("\n");
+  }
+}
+
+void compareText(const fs::path& folder, const fs::path& output) {
+  std::printf("\n%-28s %6s %9s %9s %6s\n", "text (ms a page)", "pages", "ours", "mutool", "ratio");
+  for (const char* name : {"pdf-policy-193p.pdf", "pdf-book-117p.pdf", "pdf-landscape-18p.pdf"}) {
+    const fs::path file = folder / name;
+    if (!fs::exists(file)) continue;
+    std::size_t count = 0;
+    const double ours = bestMilliseconds(5, [&] {
+      const auto document = open(file);
+      count = document ? document->pageCount().hasValue() ? *document->pageCount() : 0 : 0;
+      for (std::size_t i = 0; i < count; ++i) static_cast<void>(document->textOfPage(i));
+    });
+    const double mutool =
+        programMilliseconds(5, {{"mutool", "draw", "-q", "-F", "text", "-o", (output / "text.txt").string(), file}});
+    const auto pages = static_cast<double>(count);
+    std::printf("%-28s %6zu %9.2f", name, count, ours / pages);
+    printRatio(ours / pages, mutool / pages);
+    std::printf("\n");
+  }
+}
+
+void compareBooks(const fs::path& folder, const fs::path& output) {
+  std::printf("\n%-28s %9s %9s %9s %9s %6s\n", "first 20 pages of a book (ms)", "count", "first", "20 JPEG", "mutool",
+              "ratio");
+  for (const char* name : {"epub3-moby-dick.epub", "epub3-debian-policy.epub", "epub2-leaves-of-grass.epub"}) {
+    const fs::path file = folder / name;
+    if (!fs::exists(file)) continue;
+    const double count = bestMilliseconds(3, [&] {
+      if (const auto document = open(file)) static_cast<void>(document->pageCount());
+    });
+    const double first = bestMilliseconds(5, [&] { writePages(file, output, 0, 1); });
+    const double ours = bestMilliseconds(5, [&] { writePages(file, output, 0, 20); });
+    const double mutool = programMilliseconds(5, {{"mutool", "draw", "-q", "-w", "1280", "-h", "720", "-F", "pnm", "-o",
+                                                   (output / "e%d.pnm").string(), file, "1-20"}});
+    std::printf("%-28s %9.2f %9.2f %9.2f", name, count, first, ours);
+    printRatio(ours, mutool);
+    std::printf("\n");
+  }
+}
+
+}  // namespace
+
+int main(int argumentCount, char** arguments) {
+  if (argumentCount != 2) {
+    std::fprintf(stderr, "usage: %s FOLDER_OF_MEDIA\n", arguments[0]);
+    return 2;
+  }
+  install();
+  // In memory where there is such a folder: pages are saved so that they survive a power cut, which the other programs
+  // do not do, and the disk is not what is compared.
+  const fs::path memory = "/dev/shm";
+  std::string pattern = ((fs::exists(memory) ? memory : fs::temp_directory_path()) / "quilt-bench-XXXXXX").string();
+  if (mkdtemp(pattern.data()) == nullptr) return 1;
+  const fs::path output = pattern;
+  comparePictures(arguments[1], output);
+  compareText(arguments[1], output);
+  compareBooks(arguments[1], output);
+  fs::remove_all(output);
+  return 0;
+}

@@ -1,0 +1,148 @@
+// SPDX-License-Identifier: Apache-2.0
+// Reads appData into what the views need. Values of the wrong kind count as missing, unknown keys are passed over, and
+// only files inside the package and addresses that may be followed come out.
+'use strict';
+
+(function (Olive) {
+  const kNoTimecode = 3.4028234663852886e38;
+  const kStillSeconds = 5;
+  const kGrades = ['Desktop', '720p', '480p'];
+  const kCategories = ['Movie', 'Audio', 'Image', 'Document', 'Web', 'Montage', 'DualSource'];
+
+  const text = (value) => (typeof value === 'string' ? value : '');
+  const number = (value) => (typeof value === 'number' && Number.isFinite(value) ? value : 0);
+  const list = (value) => (Array.isArray(value) ? value.filter((entry) => entry && typeof entry === 'object') : []);
+  const time = (value) => (typeof value === 'number' && value >= 0 && value < kNoTimecode ? value : null);
+  const date = (value) => (text(value) && !Number.isNaN(Date.parse(value)) ? new Date(value) : null);
+
+  // The address of a file of the package, each path component encoded; '' for a path that leaves it.
+  function packageAddress(path) {
+    const parts = text(path).split('/');
+    if (!parts[0] || parts.some((part) => part === '..')) return '';
+    return parts.map(encodeURIComponent).join('/');
+  }
+
+  function readFile(record) {
+    return {
+      address: packageAddress(record.RelativePath),
+      link: record.RelativePath ? null : Olive.safeAddress(text(record.URL)),
+      name: text(record.Filename),
+      mime: text(record.MimeType),
+      grades: kGrades.filter((grade) => Array.isArray(record.CompatibilityTags) && record.CompatibilityTags.includes(grade)),
+      width: number(record.Width),
+      height: number(record.Height),
+      duration: number(record.Duration),
+      megaBytes: number(record.TotalSizeInMegaBytes),
+    };
+  }
+
+  function readPreview(record) {
+    return {
+      title: text(record.Title),
+      text: text(record.Content),
+      start: time(record.Timecode),
+      picture: packageAddress(record.RelativePath),
+      width: number(record.Width),
+      height: number(record.Height),
+      index: number(record.Index),
+    };
+  }
+
+  function readSource(record) {
+    const title = text(record.Title), description = text(record.Description);
+    return {
+      id: text(record.UUID),
+      category: text(record.ContentCategory),
+      title,
+      description: description === title ? '' : description,
+      start: time(record.Timecode),
+      files: list(record.Derivatives).map(readFile),
+      previews: list(record.Previews).map(readPreview).sort((a, b) => a.index - b.index),
+      hasSound: !!record.AudioSamples,
+    };
+  }
+
+  const longest = (source) => Math.max(0, ...source.files.map((file) => file.duration));
+
+  // The stills of a montage on its time line; those without a timecode share what time there is.
+  function stillsOf(item) {
+    const told = item.commentary ? longest(item.commentary) : 0;
+    const each = told && !item.sources.some((source) => source.start !== null) ? told / item.sources.length : kStillSeconds;
+    let next = 0;
+    return item.sources.map((source, i) => {
+      const start = source.start === null ? next : source.start;
+      next = start + each;
+      return {
+        title: source.title || Olive.say('still', {n: i + 1}),
+        start,
+        picture: source.previews.length ? source.previews[0].picture : '',
+        source,
+      };
+    }).sort((a, b) => a.start - b.start);
+  }
+
+  // Where the item can be entered: chapters of its first source that has some, or the stills of a montage.
+  function chaptersOf(item) {
+    if (item.category === 'Montage') return stillsOf(item);
+    if (item.category !== 'Movie' && item.category !== 'DualSource') return [];
+    const source = item.sources.find((each) => each.category === 'Movie' && each.previews.some((preview) => preview.start !== null));
+    if (!source) return [];
+    return source.previews.filter((preview) => preview.start !== null).map((preview, i) => ({
+      title: preview.title || Olive.say('chapter', {n: i + 1}),
+      start: preview.start + (item.category === 'DualSource' ? source.start || 0 : 0),
+      picture: preview.picture,
+    })).sort((a, b) => a.start - b.start);
+  }
+
+  function readItem(record, index) {
+    const sources = list(record.Sources).map(readSource);
+    const category = kCategories.includes(record.ContentCategory) ? record.ContentCategory : sources.length ? sources[0].category : '';
+    const first = sources[0] && sources[0].files[0];
+    const item = {
+      id: text(record.UUID) || 'item-' + index,
+      index,
+      category,
+      title: text(record.Title) || (sources[0] && sources[0].title) || Olive.say('untitled', {n: index + 1}),
+      description: text(record.Description),
+      poster: number(record.PosterImageWidth) > 0 ? packageAddress(record.PosterImagePath) : '',
+      sources,
+      extras: list(record.Extras).map(readSource),
+      commentary: record.AudioCommentarySource && typeof record.AudioCommentarySource === 'object' ? readSource(record.AudioCommentarySource) : null,
+      link: category === 'Web' && first ? first.link : null,
+      pages: category === 'Document' && sources[0] ? sources[0].previews : [],
+    };
+    item.chapters = chaptersOf(item);
+    item.duration = durationOf(item);
+    return item;
+  }
+
+  function durationOf(item) {
+    if (item.category === 'DualSource') return Math.max(0, ...item.sources.map((source) => longest(source) + (source.start || 0)));
+    if (item.category === 'Montage') {
+      const last = item.chapters[item.chapters.length - 1];
+      return (item.commentary && longest(item.commentary)) || (last ? last.start + kStillSeconds : 0);
+    }
+    return item.sources[0] && ['Movie', 'Audio'].includes(item.category) ? longest(item.sources[0]) : 0;
+  }
+
+  Olive.readPackage = function (data) {
+    const owner = data.CollectionOwner && typeof data.CollectionOwner === 'object' ? data.CollectionOwner : {};
+    return {
+      id: text(data.UUID) || 'package',
+      title: text(data.Title),
+      description: text(data.Description),
+      author: text(data.Author),
+      keywords: text(data.Keywords),
+      category: text(data.Category),
+      advisory: text(data.AdvisoryLabel),
+      modified: date(data.ModifiedDate),
+      collection: text(owner.Title),
+      // The artwork is written whenever the package has a poster, also when that is a placeholder without a file.
+      poster: text(data.PosterImagePath) ? 'JukeboxArtwork' : '',
+      items: list(data.Media).map(readItem),
+    };
+  };
+
+  // What a browser can draw in an <img>.
+  Olive.isPicture = (file) => /^image\/(jpeg|png|gif|bmp|x-ms-bmp|webp|avif|svg\+xml)$/.test(file.mime) || /\.(jpe?g|png|gif|bmp|webp|avif)$/i.test(file.name);
+})(window.Olive);
