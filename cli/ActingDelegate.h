@@ -35,6 +35,7 @@ class ActingDelegate : public Delegate {
   void perform(const ConvertRequest& request) override;
   void perform(const RemoveRequest& request) override;
   void perform(const ExportRequest& request) override;
+  void perform(const ServeRequest& request) override;
   void perform(const DoctorRequest& request) override;
   void perform(const HelpRequest& request) override;
   void perform(const VersionRequest& request) override;
@@ -61,6 +62,7 @@ class PreviewDelegate final : public ActingDelegate {
   void perform(const ConvertRequest& request) override;
   void perform(const RemoveRequest& request) override;
   void perform(const ExportRequest& request) override;
+  void perform(const ServeRequest& request) override;
 
  private:
   void plan(Json step, const std::string& line);

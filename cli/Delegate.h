@@ -22,6 +22,7 @@ class Delegate {
   virtual void perform(const ConvertRequest& request) = 0;
   virtual void perform(const RemoveRequest& request) = 0;
   virtual void perform(const ExportRequest& request) = 0;
+  virtual void perform(const ServeRequest& request) = 0;
   virtual void perform(const DoctorRequest& request) = 0;
   virtual void perform(const HelpRequest& request) = 0;
   virtual void perform(const VersionRequest& request) = 0;
@@ -46,6 +47,7 @@ class RecordingDelegate final : public Delegate {
   void perform(const ConvertRequest& request) override { commands.emplace_back(request); }
   void perform(const RemoveRequest& request) override { commands.emplace_back(request); }
   void perform(const ExportRequest& request) override { commands.emplace_back(request); }
+  void perform(const ServeRequest& request) override { commands.emplace_back(request); }
   void perform(const DoctorRequest& request) override { commands.emplace_back(request); }
   void perform(const HelpRequest& request) override { commands.emplace_back(request); }
   void perform(const VersionRequest& request) override { commands.emplace_back(request); }

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <cstdint>
 #include <optional>
 #include <string>
 #include <utility>
@@ -96,6 +97,13 @@ struct ExportRequest {
   bool operator==(const ExportRequest&) const = default;
 };
 
+struct ServeRequest {
+  std::string document;
+  std::uint16_t port = 0;  ///< 0: any that is free
+  bool open = false;       ///< in the user's browser
+  bool operator==(const ServeRequest&) const = default;
+};
+
 struct DoctorRequest {
   bool operator==(const DoctorRequest&) const = default;
 };
@@ -112,7 +120,7 @@ struct VersionRequest {
 
 using Command = std::variant<ImportRequest, ListRequest, ShowRequest, InfoRequest, NewCollectionRequest,
                              NewDocumentRequest, SetRequest, AddRequest, MoveRequest, ConvertRequest, RemoveRequest,
-                             ExportRequest, DoctorRequest, HelpRequest, VersionRequest>;
+                             ExportRequest, ServeRequest, DoctorRequest, HelpRequest, VersionRequest>;
 
 enum class ProgressStyle { Automatic, Json, None };
 

@@ -67,6 +67,8 @@ TEST(ParserTest, TheOtherCommandsBecomeRequests) {
             asked({"new", "document", "T", "--collection", "C", "--type", "pdf"}));
   EXPECT_EQ(Command(RemoveRequest{{"A"}, std::nullopt, true}), asked({"remove", "A", "--force"}));
   EXPECT_EQ(Command(RemoveRequest{{"1", "2"}, "D", false}), asked({"remove", "1", "2", "--from", "D"}));
+  EXPECT_EQ(Command(ServeRequest{"D", 0, false}), asked({"serve", "D"}));
+  EXPECT_EQ(Command(ServeRequest{"D", 4711, true}), asked({"serve", "D", "--open", "--port", "4711"}));
   EXPECT_EQ(Command(DoctorRequest{}), asked({"doctor"}));
   EXPECT_EQ(Command(HelpRequest{"import"}), asked({"help", "import"}));
   EXPECT_EQ(Command(HelpRequest{"import"}), asked({"import", "--help"}));

@@ -13,7 +13,7 @@
 namespace quilt::support {
 
 HttpClient::HttpClient(std::uint16_t port) : _socket(socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
-  const timeval patience{2, 0};
+  const timeval patience{10, 0};
   setsockopt(_socket, SOL_SOCKET, SO_RCVTIMEO, &patience, sizeof patience);
   setsockopt(_socket, SOL_SOCKET, SO_SNDTIMEO, &patience, sizeof patience);
   sockaddr_in address{};

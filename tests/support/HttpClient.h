@@ -13,7 +13,7 @@ namespace quilt::support {
 
 /// One answer of a server, as it came over the wire.
 struct HttpAnswer {
-  int status = 0;                             ///< 0: the connection ended, or nothing came in time
+  int status = 0;                             ///< 0: the connection ended, or nothing came within ten seconds
   std::map<std::string, std::string> fields;  ///< names in lower case
   std::string body;
 
@@ -37,7 +37,7 @@ class HttpClient {
   HttpAnswer read(bool hasBody = true);
   /// What comes of a stream until it holds the text; what came so far when it does not come in time.
   std::string readUntil(std::string_view text);
-  /// Whether the server ends the connection within two seconds.
+  /// Whether the server ends the connection; false when it does not within ten seconds.
   bool isEnded();
 
  private:

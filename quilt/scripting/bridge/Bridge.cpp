@@ -49,7 +49,10 @@ class Bridge::Implementation {
   Implementation(const Implementation&) = delete;
   Implementation& operator=(const Implementation&) = delete;
   // First lets those go who wait for the main thread, which may be this one.
-  ~Implementation() { _mainThread.end(); }
+  ~Implementation() {
+    _mainThread.end();
+    _sessions.closeAll();
+  }
 
   [[nodiscard]] std::uint16_t port() const { return _server->port(); }
   [[nodiscard]] std::string address() const {

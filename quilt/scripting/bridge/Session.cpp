@@ -96,6 +96,15 @@ void Sessions::close(std::string_view identity) {
   closed->close();
 }
 
+void Sessions::closeAll() {
+  std::map<std::string, std::shared_ptr<Session>, std::less<>> closed;
+  {
+    const std::lock_guard guard(_mutex);
+    closed.swap(_sessions);
+  }
+  for (const auto& [identity, session] : closed) session->close();
+}
+
 void Sessions::expire() {
   std::vector<std::string> idle;
   {

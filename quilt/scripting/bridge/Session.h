@@ -94,6 +94,7 @@ class Sessions {
   /// Null when there is none. Counts as a use.
   std::shared_ptr<Session> find(std::string_view identity) const;
   void close(std::string_view identity);
+  void closeAll();
   /// Closes those that were left alone for too long.
   void expire();
   [[nodiscard]] std::size_t count() const;
