@@ -39,6 +39,7 @@ class ActingDelegate : public Delegate {
   void perform(const BuildRequest& request) override;
   void perform(const ThemesRequest& request) override;
   void perform(const CheckRequest& request) override;
+  void perform(const ServeRequest& request) override;
   void perform(const DoctorRequest& request) override;
   void perform(const HelpRequest& request) override;
   void perform(const VersionRequest& request) override;
@@ -67,6 +68,7 @@ class PreviewDelegate final : public ActingDelegate {
   void perform(const ExportRequest& request) override;
   void perform(const FinalizeRequest& request) override;
   void perform(const BuildRequest& request) override;
+  void perform(const ServeRequest& request) override;
 
  private:
   void plan(Json step, const std::string& line);

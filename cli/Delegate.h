@@ -26,6 +26,7 @@ class Delegate {
   virtual void perform(const BuildRequest& request) = 0;
   virtual void perform(const ThemesRequest& request) = 0;
   virtual void perform(const CheckRequest& request) = 0;
+  virtual void perform(const ServeRequest& request) = 0;
   virtual void perform(const DoctorRequest& request) = 0;
   virtual void perform(const HelpRequest& request) = 0;
   virtual void perform(const VersionRequest& request) = 0;
@@ -54,6 +55,7 @@ class RecordingDelegate final : public Delegate {
   void perform(const BuildRequest& request) override { commands.emplace_back(request); }
   void perform(const ThemesRequest& request) override { commands.emplace_back(request); }
   void perform(const CheckRequest& request) override { commands.emplace_back(request); }
+  void perform(const ServeRequest& request) override { commands.emplace_back(request); }
   void perform(const DoctorRequest& request) override { commands.emplace_back(request); }
   void perform(const HelpRequest& request) override { commands.emplace_back(request); }
   void perform(const VersionRequest& request) override { commands.emplace_back(request); }

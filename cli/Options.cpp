@@ -159,6 +159,16 @@ Command themesRequest(const Arguments&) { return ThemesRequest{}; }
 
 Command checkRequest(const Arguments& arguments) { return CheckRequest{arguments.all("DOCUMENT")}; }
 
+Command serveRequest(const Arguments& arguments) {
+  ServeRequest request{*arguments.first("DOCUMENT"), 0, arguments.has("--open")};
+  if (const std::optional<std::string> port = arguments.first("--port")) {
+    const auto [end, error] = std::from_chars(port->data(), port->data() + port->size(), request.port);
+    if (error != std::errc() || end != port->data() + port->size() || request.port == 0)
+      refuse("--port is a number from 1 to 65535, not " + inQuotes(*port));
+  }
+  return request;
+}
+
 Command doctorRequest(const Arguments&) { return DoctorRequest{}; }
 
 Command helpRequest(const Arguments& arguments) {
@@ -351,6 +361,16 @@ const std::vector<CommandDescription>& commands() {
        {},
        false,
        checkRequest},
+      {"serve",
+       "show a document in the browser, live, until stopped",
+       "Finalizes what is stale, prints the address of the themed package on this machine, and serves it with\n"
+       "the live document behind: what is edited in the page is saved. The address holds a secret; whoever has\n"
+       "it can read and edit the document while the program runs. Ctrl-C stops it.\n",
+       {{"DOCUMENT", "the document; Interactive, with a theme"}},
+       {{"--port", "", "N", "the port to serve at (else any that is free)"},
+        {"--open", "", "", "open the address in the user's browser"}},
+       true,
+       serveRequest},
       {"doctor", "print which decoders, encoders, renderers and themes are there", "", {}, {}, false, doctorRequest},
       {"help",
        "explain the program, or a command",

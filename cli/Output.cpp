@@ -33,6 +33,11 @@ void Output::object(Json object, const std::string& lines) {
   }
 }
 
+void Output::publish() {
+  if (_json) printDocument(std::nullopt);
+  _isPublished = true;
+}
+
 std::string Output::shown(const std::filesystem::path& path) const {
   return _isTerminal ? escaped(path.native()) : path.native();
 }
@@ -58,7 +63,7 @@ void Output::printDocument(const std::optional<Failure>& failure) {
 }
 
 ExitCode Output::finish(const std::optional<Failure>& failure) {
-  if (_json) printDocument(failure);
+  if (_json && !_isPublished) printDocument(failure);
   if (failure) {
     for (const Failure& cause : failure->causes) _messages.error(cause.message);
     _messages.error(failure->message);

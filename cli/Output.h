@@ -26,6 +26,9 @@ class Output {
   /// The one result.
   void object(Json object, const std::string& lines);
 
+  /// Prints the result now, for a command that goes on: what follows is told by messages and the exit code alone.
+  void publish();
+
   /// A path as a result: escaped on a terminal, else as it is, so that a program can use it.
   [[nodiscard]] std::string shown(const std::filesystem::path& path) const;
   /// `text` in bold or dim where styles are shown.
@@ -47,6 +50,7 @@ class Output {
   bool _color;
   Messages& _messages;
   Json _result;
+  bool _isPublished = false;
   int _writeError = 0;  // errno of the first write that failed
 };
 

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <cstdint>
 #include <optional>
 #include <string>
 #include <utility>
@@ -119,6 +120,13 @@ struct CheckRequest {
   bool operator==(const CheckRequest&) const = default;
 };
 
+struct ServeRequest {
+  std::string document;
+  std::uint16_t port = 0;  ///< 0: any that is free
+  bool open = false;       ///< in the user's browser
+  bool operator==(const ServeRequest&) const = default;
+};
+
 struct DoctorRequest {
   bool operator==(const DoctorRequest&) const = default;
 };
@@ -136,7 +144,7 @@ struct VersionRequest {
 using Command =
     std::variant<ImportRequest, ListRequest, ShowRequest, InfoRequest, NewCollectionRequest, NewDocumentRequest,
                  SetRequest, AddRequest, MoveRequest, ConvertRequest, RemoveRequest, ExportRequest, FinalizeRequest,
-                 BuildRequest, ThemesRequest, CheckRequest, DoctorRequest, HelpRequest, VersionRequest>;
+                 BuildRequest, ThemesRequest, CheckRequest, ServeRequest, DoctorRequest, HelpRequest, VersionRequest>;
 
 enum class ProgressStyle { Automatic, Json, None };
 

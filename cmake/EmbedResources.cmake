@@ -1,11 +1,12 @@
 # SPDX-License-Identifier: Apache-2.0
-# Compiles the artwork and the string tables of a folder into a library, so that nothing is looked up at run time.
+# Compiles the artwork, the string tables and the scripts of a folder into a library, so that nothing is looked up at run time.
 # quilt/resources/EmbeddedFiles.h declares what comes out.
 
 function(quilt_embed_resources target folder)
   file(GLOB_RECURSE files CONFIGURE_DEPENDS RELATIVE ${PROJECT_SOURCE_DIR}/${folder}
        ${PROJECT_SOURCE_DIR}/${folder}/artwork/*.png ${PROJECT_SOURCE_DIR}/${folder}/artwork/*.icns
-       ${PROJECT_SOURCE_DIR}/${folder}/artwork/*.tif ${PROJECT_SOURCE_DIR}/${folder}/strings/*.strings)
+       ${PROJECT_SOURCE_DIR}/${folder}/artwork/*.tif ${PROJECT_SOURCE_DIR}/${folder}/strings/*.strings
+       ${PROJECT_SOURCE_DIR}/${folder}/scripting/*.js)
   list(SORT files)
   set(output ${PROJECT_BINARY_DIR}/generated/${target}.S)
   set(content "  .section .rodata\n")

@@ -69,6 +69,8 @@ TEST(ParserTest, TheOtherCommandsBecomeRequests) {
   EXPECT_EQ(Command(RemoveRequest{{"1", "2"}, "D", false}), asked({"remove", "1", "2", "--from", "D"}));
   EXPECT_EQ(Command(CheckRequest{}), asked({"check"}));
   EXPECT_EQ(Command(CheckRequest{{"A", "B"}}), asked({"check", "A", "B"}));
+  EXPECT_EQ(Command(ServeRequest{"D", 0, false}), asked({"serve", "D"}));
+  EXPECT_EQ(Command(ServeRequest{"D", 4711, true}), asked({"serve", "D", "--open", "--port", "4711"}));
   EXPECT_EQ(Command(DoctorRequest{}), asked({"doctor"}));
   EXPECT_EQ(Command(ThemesRequest{}), asked({"themes"}));
   EXPECT_EQ(Command(FinalizeRequest{"D"}), asked({"finalize", "D"}));

@@ -88,6 +88,8 @@ bool RunningProgram::hasEnded() {
   return _ended;
 }
 
+std::string RunningProgram::outputSoFar() const { return contentOf(_folder / "out"); }
+
 std::string RunningProgram::errorsSoFar() const { return contentOf(_folder / "err"); }
 
 Ended RunningProgram::wait() {

@@ -40,6 +40,8 @@ class RunningProgram {
   /// Waits for its end; fails the test and kills it after a minute.
   Ended wait();
   [[nodiscard]] bool hasEnded();
+  /// What it has printed to stdout so far.
+  [[nodiscard]] std::string outputSoFar() const;
   /// What it has printed to stderr so far.
   [[nodiscard]] std::string errorsSoFar() const;
 

@@ -1,0 +1,31 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <unistd.h>
+
+#include <utility>
+
+namespace quilt::scripting::http {
+
+/// An open file or socket, closed at the end.
+class Descriptor {
+ public:
+  Descriptor() = default;
+  explicit Descriptor(int number) : _number(number) {}
+  Descriptor(Descriptor&& other) noexcept : _number(std::exchange(other._number, -1)) {}
+  Descriptor& operator=(Descriptor&& other) noexcept {
+    std::swap(_number, other._number);
+    return *this;
+  }
+  ~Descriptor() {
+    if (_number >= 0) ::close(_number);
+  }
+
+  [[nodiscard]] int number() const { return _number; }
+  explicit operator bool() const { return _number >= 0; }
+
+ private:
+  int _number = -1;
+};
+
+}  // namespace quilt::scripting::http

@@ -1,0 +1,65 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <chrono>
+#include <cstdint>
+#include <memory>
+
+#include "quilt/platform/base/Result.h"
+#include "quilt/scripting/bridge/http/RequestHead.h"
+#include "quilt/scripting/bridge/http/Response.h"
+
+namespace quilt::scripting::http {
+
+struct Request {
+  RequestHead head;
+  std::string body;
+};
+
+/// What no client can exceed. Times are absolute: dripping bytes gains nothing.
+struct Limits {
+  std::size_t connections = 64;
+  std::size_t headBytes = std::size_t{16} << 10;
+  std::size_t bodyBytes = std::size_t{1} << 20;
+  std::size_t requestsPerConnection = 1000;
+  std::chrono::milliseconds idle{5000};  ///< until the first byte of a request
+  std::chrono::milliseconds head{5000};  ///< from the first byte to the end of the head
+  std::chrono::milliseconds body{10000};
+  std::chrono::milliseconds stall{30000};  ///< how long a client may read nothing of what it is sent
+  std::chrono::milliseconds streamBeat{250};
+};
+
+/// A small HTTP/1.1 server on 127.0.0.1 for few and local clients: a thread a connection, everything bounded.
+///
+/// The door sees each head before the body is read; what it answers is sent and ends the connection. The handler
+/// answers the rest. Both run on the connections' threads, several at once, and must not outlive their owner, who stops
+/// the server first. The tick runs about twice a second on a thread of the server.
+class Server {
+ public:
+  using Door = std::function<std::optional<Response>(const RequestHead&)>;
+  using Handler = std::function<Response(const Request&)>;
+
+  struct Rooms {
+    Door door;
+    Handler handler;
+    std::function<void()> tick;
+  };
+
+  /// Binds the port, 0 for any that is free, and serves once open() is called.
+  static platform::Result<std::unique_ptr<Server>> bind(std::uint16_t port, const Limits& limits);
+  Server(const Server&) = delete;
+  Server& operator=(const Server&) = delete;
+  /// Ends every connection and waits for the threads.
+  ~Server();
+
+  [[nodiscard]] std::uint16_t port() const;
+  /// Once.
+  void open(Rooms rooms);
+
+ private:
+  class Implementation;
+  explicit Server(std::unique_ptr<Implementation> implementation);
+  std::unique_ptr<Implementation> _implementation;
+};
+
+}  // namespace quilt::scripting::http
