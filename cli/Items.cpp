@@ -160,12 +160,13 @@ double weightOf(const NewItem& item) {
   return weight;
 }
 
-std::shared_ptr<QuiltMedia> addItem(QuiltDocument& document, const NewItem& item, const ProgressionBlock& block) {
+std::shared_ptr<QuiltMedia> addItem(QuiltDocument& document, const NewItem& item, const ProgressionBlock& block,
+                                    SaveTime time) {
   const auto media = makeItem(item);
   if (!media) return nullptr;
   Transaction transaction(document);
   document.addMedia(media);
-  if (media->flattenWithProgressionBlock(block) && transaction.save()) return media;
+  if (media->flattenWithProgressionBlock(block) && (time == SaveTime::Later || transaction.save())) return media;
   document.removeMedia(media);
   return nullptr;
 }

@@ -177,11 +177,14 @@ void addItems(QuiltDocument& document, const Plan& plan, const Context& context)
       const NewItem& item = plan.items[added];
       context.log.beginOperation();
       const double weight = weightOf(item);
-      const bool done = addItem(document, item, [&](double percentage) {
-                          const double share = (before + weight * percentage / 100) / total;
-                          context.progress.report("Adding " + item.title, kLooked + share * (kCopied - kLooked));
-                          return !Interrupt::isRequested();
-                        }) != nullptr;
+      const bool done = addItem(
+                            document, item,
+                            [&](double percentage) {
+                              const double share = (before + weight * percentage / 100) / total;
+                              context.progress.report("Adding " + item.title, kLooked + share * (kCopied - kLooked));
+                              return !Interrupt::isRequested();
+                            },
+                            SaveTime::Later) != nullptr;
       if (!done) return;
       if (!context.settings.quiet) context.log.showWarnings();
       before += weight;
@@ -192,6 +195,9 @@ void addItems(QuiltDocument& document, const Plan& plan, const Context& context)
     throw manifestFailure(
         plan.manifest.path, plan.manifest.media[added].place,
         explain("Cannot add " + inQuotes(plan.items[added].title), context.log, document.path(), document.path()));
+  if (!document.update())
+    throw explain("The document " + nameOf(plan.manifest) + " cannot be saved", context.log, document.path(),
+                  document.path());
   context.log.beginOperation();
 }
 
