@@ -2,6 +2,7 @@
 #include <gmock/gmock.h>
 
 #include <array>
+#include <cstdlib>
 
 #include "quilt/documents/QuiltDocument.h"
 #include "tests/support/DocumentFixture.h"
@@ -196,6 +197,60 @@ TEST_F(QuiltMediaCompositionsTest, ACompositionIsSavedAndReadBack) {
   item->invalidateCaches();
   expectNear(at(12, 500), kRed, "from the file", 12);
   EXPECT_EQ(item->posterImageVersion(), 2u);
+}
+
+// ---- Stored references
+
+/// The poster beside a picture of it that someone has looked at. QUILT_WRITE_REFERENCES=1 stores what is drawn now, to
+/// be looked at before it is committed.
+class QuiltMediaCompositionReferencesTest : public QuiltMediaCompositionsTest {
+ protected:
+  void expectLike(const std::string& name) const {
+    const Path reference = Path(QUILT_SOURCE_FOLDER) / "tests/media/references" / (name + ".png");
+    const auto drawn = item->posterImage();
+    ASSERT_NE(drawn, nullptr);
+    if (std::getenv("QUILT_WRITE_REFERENCES")) {
+      ASSERT_TRUE(drawn->saveAsPNGAtURL(platform::Url::fileUrl(reference)));
+    }
+    const auto stored = ImageWrapper::imageWithPath(reference);
+    ASSERT_NE(stored, nullptr) << reference;
+    const auto seen = drawn->bitmap();
+    const auto expected = stored->bitmap();
+    ASSERT_TRUE(seen && expected);
+    ASSERT_EQ(seen->width, expected->width);
+    ASSERT_EQ(seen->height, expected->height);
+    double total = 0;
+    int most = 0;
+    for (std::size_t i = 0; i < seen->pixels.size(); ++i) {
+      const int difference = std::abs(seen->pixels[i] - expected->pixels[i]);
+      total += difference;
+      most = std::max(most, difference);
+    }
+    // Roundings of another version of the drawing library, and no more.
+    EXPECT_LT(total / static_cast<double>(seen->pixels.size()), 0.5) << "mean difference";
+    EXPECT_LE(most, 24) << "largest difference";
+  }
+};
+
+TEST_F(QuiltMediaCompositionReferencesTest, AMontageOfFourLooksAsItDid) {
+  addPicture(640, 360, kRed, kBlue);
+  addPicture(300, 600, kGreen, kWhite);
+  addPicture(400, 400, kYellow, kGreen);
+  addPicture(800, 200, kBlue, kYellow);
+  montage();
+  expectLike("montage-of-four");
+}
+
+TEST_F(QuiltMediaCompositionReferencesTest, AnEmptyMontageLooksAsItDid) {
+  montage();
+  expectLike("montage-of-none");
+}
+
+TEST_F(QuiltMediaCompositionReferencesTest, TwoSourcesLookAsTheyDid) {
+  addPicture(400, 300, kRed, kYellow);
+  addPicture(1920, 1080, kWhite, kBlue);
+  dualSource();
+  expectLike("dual-source");
 }
 
 }  // namespace
