@@ -176,7 +176,7 @@ class Bench {
   static Plan planFor(const fs::path& source, const Grade& grade) {
     Plan plan;
     Result<Input> input = Input::open(source, 15);
-    if (!input) return plan;
+    if (!input || !input->findStreamInfo()) return plan;
     const Result<Outline> found = outline(*input);
     if (!found || found->video == nullptr) return plan;
     plan.video = planVideo(videoTraits(*input, *found->video), grade.box);
@@ -246,8 +246,7 @@ class Bench {
       return;
     }
     // The programs leave the colours as they are; ours are BT.709.
-    const std::string converting =
-        plan.isStandardDefinition ? ",scale=in_color_matrix=bt601:out_color_matrix=bt709" : "";
+    const std::string converting = plan.isStandardDefinition ? ",zscale=min=170m:m=709" : "";
     std::printf(" %.4f %.4f |", similarity("ours.m4v", source, scaling(plan) + converting),
                 similarity("theirs.m4v", source, scaling(plan)));
     if (rival.isPaid) {

@@ -35,6 +35,10 @@ class ActingDelegate : public Delegate {
   void perform(const ConvertRequest& request) override;
   void perform(const RemoveRequest& request) override;
   void perform(const ExportRequest& request) override;
+  void perform(const FinalizeRequest& request) override;
+  void perform(const BuildRequest& request) override;
+  void perform(const ThemesRequest& request) override;
+  void perform(const CheckRequest& request) override;
   void perform(const ServeRequest& request) override;
   void perform(const DoctorRequest& request) override;
   void perform(const HelpRequest& request) override;
@@ -62,6 +66,8 @@ class PreviewDelegate final : public ActingDelegate {
   void perform(const ConvertRequest& request) override;
   void perform(const RemoveRequest& request) override;
   void perform(const ExportRequest& request) override;
+  void perform(const FinalizeRequest& request) override;
+  void perform(const BuildRequest& request) override;
   void perform(const ServeRequest& request) override;
 
  private:

@@ -22,6 +22,10 @@ class Delegate {
   virtual void perform(const ConvertRequest& request) = 0;
   virtual void perform(const RemoveRequest& request) = 0;
   virtual void perform(const ExportRequest& request) = 0;
+  virtual void perform(const FinalizeRequest& request) = 0;
+  virtual void perform(const BuildRequest& request) = 0;
+  virtual void perform(const ThemesRequest& request) = 0;
+  virtual void perform(const CheckRequest& request) = 0;
   virtual void perform(const ServeRequest& request) = 0;
   virtual void perform(const DoctorRequest& request) = 0;
   virtual void perform(const HelpRequest& request) = 0;
@@ -47,6 +51,10 @@ class RecordingDelegate final : public Delegate {
   void perform(const ConvertRequest& request) override { commands.emplace_back(request); }
   void perform(const RemoveRequest& request) override { commands.emplace_back(request); }
   void perform(const ExportRequest& request) override { commands.emplace_back(request); }
+  void perform(const FinalizeRequest& request) override { commands.emplace_back(request); }
+  void perform(const BuildRequest& request) override { commands.emplace_back(request); }
+  void perform(const ThemesRequest& request) override { commands.emplace_back(request); }
+  void perform(const CheckRequest& request) override { commands.emplace_back(request); }
   void perform(const ServeRequest& request) override { commands.emplace_back(request); }
   void perform(const DoctorRequest& request) override { commands.emplace_back(request); }
   void perform(const HelpRequest& request) override { commands.emplace_back(request); }

@@ -2,6 +2,7 @@
 #include "cli/Items.h"
 
 #include <fmt/format.h>
+#include <strings.h>
 
 #include <algorithm>
 
@@ -20,7 +21,9 @@ using platform::Url;
 
 NewSource lookAtPage(const std::string& typed) {
   const auto url = Url::parse(typed);
-  if (!url) throw Failure(ExitCode::Invalid, "Cannot use " + inQuotes(typed) + ": It is no web address");
+  // Whatever else has this form ("javascript://…") is nothing that a reader should follow.
+  const bool isWeb = strncasecmp(typed.c_str(), "http://", 7) == 0 || strncasecmp(typed.c_str(), "https://", 8) == 0;
+  if (!url || !isWeb) throw Failure(ExitCode::Invalid, "Cannot use " + inQuotes(typed) + ": It is no web address");
   return {*url, typed, kQuiltMediaContentCategoryWeb};
 }
 
@@ -157,12 +160,13 @@ double weightOf(const NewItem& item) {
   return weight;
 }
 
-std::shared_ptr<QuiltMedia> addItem(QuiltDocument& document, const NewItem& item, const ProgressionBlock& block) {
+std::shared_ptr<QuiltMedia> addItem(QuiltDocument& document, const NewItem& item, const ProgressionBlock& block,
+                                    SaveTime time) {
   const auto media = makeItem(item);
   if (!media) return nullptr;
   Transaction transaction(document);
   document.addMedia(media);
-  if (media->flattenWithProgressionBlock(block) && transaction.save()) return media;
+  if (media->flattenWithProgressionBlock(block) && (time == SaveTime::Later || transaction.save())) return media;
   document.removeMedia(media);
   return nullptr;
 }

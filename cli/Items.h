@@ -48,9 +48,13 @@ void checkCommentary(const NewSource& commentary);
 double weightOf(const NewSource& source);
 double weightOf(const NewItem& item);
 
+/// Whether an addition saves the document, or leaves that to its caller, who adds many.
+enum class SaveTime { Now, Later };
+
 /// Adds the item to the end of the document, with its files copied into the package, and saves. Null when it could not
 /// be done or the block answered false: the document is then as it was. On a worker; the block gets 0 to 100.
-std::shared_ptr<QuiltMedia> addItem(QuiltDocument& document, const NewItem& item, const ProgressionBlock& block);
+std::shared_ptr<QuiltMedia> addItem(QuiltDocument& document, const NewItem& item, const ProgressionBlock& block,
+                                    SaveTime time = SaveTime::Now);
 
 /// Adds an extra to an item, its file copied into the package, and saves. As addItem.
 std::shared_ptr<QuiltMediaExtra> addExtra(QuiltDocument& document, QuiltMedia& item, const NewSource& extra,

@@ -146,6 +146,19 @@ Command exportRequest(const Arguments& arguments) {
   return request;
 }
 
+Command finalizeRequest(const Arguments& arguments) { return FinalizeRequest{*arguments.first("DOCUMENT")}; }
+
+Command buildRequest(const Arguments& arguments) {
+  const std::optional<std::string> output = arguments.first("--output");
+  if (!output) refuse("--output is missing: name the folder to write the package into");
+  return BuildRequest{*arguments.first("MANIFEST"), *output, arguments.has("--zip"), formatsOf(arguments),
+                      arguments.first("--theme")};
+}
+
+Command themesRequest(const Arguments&) { return ThemesRequest{}; }
+
+Command checkRequest(const Arguments& arguments) { return CheckRequest{arguments.all("DOCUMENT")}; }
+
 Command serveRequest(const Arguments& arguments) {
   ServeRequest request{*arguments.first("DOCUMENT"), 0, arguments.has("--open")};
   if (const std::optional<std::string> port = arguments.first("--port")) {
@@ -306,6 +319,48 @@ const std::vector<CommandDescription>& commands() {
         {"--theme", "", "THEME", "set the document's theme first: an identifier or the path of a bundle"}},
        true,
        exportRequest},
+      {"finalize",
+       "make a document ready to be played, in place",
+       "Makes what is missing of previews and posters, applies the theme of an interactive document anew and\n"
+       "writes the files that it reads.\n",
+       {{"DOCUMENT", "the document"}},
+       {},
+       true,
+       finalizeRequest},
+      {"build",
+       "build a finished package from a manifest",
+       "The manifest is a JSON file that names title, theme, poster and items; schema/manifest.schema.json\n"
+       "describes it. Relative names are meant from its folder. With --library the document is kept there, in\n"
+       "the collection that the manifest names; else nothing but the package is left. When anything in the\n"
+       "manifest is wrong, every problem is reported with its place, and nothing is exported. Prints the path\n"
+       "of the package.\n",
+       {{"MANIFEST", "the JSON file"}},
+       {{"--output", "", "DIR", "the folder to write into; made when it is missing"},
+        {"--zip", "", "", "write a zip archive"},
+        {"--format",
+         "",
+         "FORMAT",
+         "Desktop, 720p or 480p (else as the manifest says, else Desktop)",
+         true,
+         {"Desktop", "720p", "480p"}},
+        {"--theme", "", "THEME", "an identifier or the path of a bundle (else as the manifest says, else Olive)"}},
+       true,
+       buildRequest},
+      {"themes",
+       "print the installed themes",
+       "Identifier, name and path of each: those of the user, of the system and of the program.\n",
+       {},
+       {},
+       false,
+       themesRequest},
+      {"check",
+       "verify packages, and change nothing",
+       "Records are readable, every file is there, in the package and of its recorded size, and nothing lies\n"
+       "among the media that no record names. Prints a line a finding: UUID, kind, path, what is wrong.\n",
+       {{"DOCUMENT", "a document; all of the library when none is named", false, true}},
+       {},
+       false,
+       checkRequest},
       {"serve",
        "show a document in the browser, live, until stopped",
        "Finalizes what is stale, prints the address of the themed package on this machine, and serves it with\n"

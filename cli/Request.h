@@ -97,6 +97,29 @@ struct ExportRequest {
   bool operator==(const ExportRequest&) const = default;
 };
 
+struct FinalizeRequest {
+  std::string document;
+  bool operator==(const FinalizeRequest&) const = default;
+};
+
+struct BuildRequest {
+  std::string manifest;
+  std::string output;  ///< a folder
+  bool zip = false;
+  std::vector<std::string> formats{};  ///< empty: the manifest says
+  std::optional<std::string> theme{};
+  bool operator==(const BuildRequest&) const = default;
+};
+
+struct ThemesRequest {
+  bool operator==(const ThemesRequest&) const = default;
+};
+
+struct CheckRequest {
+  std::vector<std::string> documents{};  ///< empty: all of the library
+  bool operator==(const CheckRequest&) const = default;
+};
+
 struct ServeRequest {
   std::string document;
   std::uint16_t port = 0;  ///< 0: any that is free
@@ -118,9 +141,10 @@ struct VersionRequest {
   bool operator==(const VersionRequest&) const = default;
 };
 
-using Command = std::variant<ImportRequest, ListRequest, ShowRequest, InfoRequest, NewCollectionRequest,
-                             NewDocumentRequest, SetRequest, AddRequest, MoveRequest, ConvertRequest, RemoveRequest,
-                             ExportRequest, ServeRequest, DoctorRequest, HelpRequest, VersionRequest>;
+using Command =
+    std::variant<ImportRequest, ListRequest, ShowRequest, InfoRequest, NewCollectionRequest, NewDocumentRequest,
+                 SetRequest, AddRequest, MoveRequest, ConvertRequest, RemoveRequest, ExportRequest, FinalizeRequest,
+                 BuildRequest, ThemesRequest, CheckRequest, ServeRequest, DoctorRequest, HelpRequest, VersionRequest>;
 
 enum class ProgressStyle { Automatic, Json, None };
 

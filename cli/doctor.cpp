@@ -5,7 +5,7 @@
 
 #include "cli/ActingDelegate.h"
 #include "cli/Text.h"
-#include "cli/Themes.h"
+#include "cli/ThemeLookup.h"
 #include "quilt/platform/interfaces/Services.h"
 
 namespace quilt::cli {

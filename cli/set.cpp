@@ -8,7 +8,7 @@
 #include "cli/LibrarySession.h"
 #include "cli/Saving.h"
 #include "cli/Text.h"
-#include "cli/Themes.h"
+#include "cli/ThemeLookup.h"
 #include "quilt/platform/interfaces/Services.h"
 
 namespace quilt::cli {

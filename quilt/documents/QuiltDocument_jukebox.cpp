@@ -12,10 +12,13 @@ using platform::services;
 namespace {
 
 std::int64_t yearOf(Date date) {
-  const std::string text = services().dates->format(date, "y");
-  std::int64_t year = 0;
-  std::from_chars(text.data(), text.data() + text.size(), year);
-  return year;
+  const platform::DateFormatter& dates = *services().dates;
+  // The second one reads in every language: some write the first with digits of their own.
+  for (const std::string& text : {dates.format(date, "y"), dates.description(date)}) {
+    std::int64_t year = 0;
+    if (std::from_chars(text.data(), text.data() + text.size(), year).ec == std::errc()) return year;
+  }
+  return 0;
 }
 
 }  // namespace

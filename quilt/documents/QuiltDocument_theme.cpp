@@ -22,6 +22,27 @@ bool isKept(const std::string& name) {
   return std::find(std::begin(kKeptEntries), std::end(kKeptEntries), name) != std::end(kKeptEntries);
 }
 
+/// The first link in an entry of the template, or on the way to it from the bundle; empty when there is none. A copy of
+/// it would lead out of the package.
+Path firstLink(const Path& entry, const Path& bundle) {
+  std::vector<Path> pending{entry};
+  while (!pending.empty()) {
+    const Path item = std::move(pending.back());
+    pending.pop_back();
+    if (!services().files->isConfined(item, bundle)) return item;
+    if (services().files->kindOfItemAtPath(item) != platform::FileKind::Folder) continue;
+    if (const auto names = services().files->contentsOfDirectoryAtPath(item))
+      for (const std::string& name : *names) pending.push_back(item / name);
+  }
+  return {};
+}
+
+platform::Result<void> copyEntry(const Path& source, const Path& destination, const Path& bundle) {
+  if (const Path link = firstLink(source, bundle); !link.empty())
+    return platform::Error{platform::ErrorKind::Unsafe, "A theme may not hold symbolic links.", link};
+  return services().files->copyItem(source, destination);
+}
+
 }  // namespace
 
 bool QuiltDocument::removeTheme() {
@@ -33,14 +54,15 @@ bool QuiltDocument::removeTheme() {
   for (const std::string& name : *names) {
     if (isKept(name)) continue;
     const Path entry = platform::standardizedPath(path() / name);
-    if (const auto removed = services().files->removeItem(entry, path()); !removed)
+    const auto removed = services().files->removeItem(entry, path());
+    if (!removed && removed.error().kind != platform::ErrorKind::NotFound)
       FDYLogger::logWarning("Failed to remove current theme element \"@\": \"%@\"", entry, removed.error());
   }
   return true;
 }
 
 bool QuiltDocument::applyTheme(const std::shared_ptr<QuiltTheme>& theme, const ProgressionBlock& withProgressionBlock) {
-  const Text name = theme->localizedName();
+  const Text name = theme ? theme->localizedName() : std::nullopt;
   const auto fail = [&](const Text& error) {
     FDYLogger::logCritical("Failed to apply theme \"%@\" on document at path \"%@\": \"%@\"", name, path(), error);
     removeTheme();
@@ -48,7 +70,7 @@ bool QuiltDocument::applyTheme(const std::shared_ptr<QuiltTheme>& theme, const P
   };
 
   if (!removeTheme()) return fail(std::nullopt);
-  const Path folder = theme->templatePath();
+  const Path folder = theme ? theme->templatePath() : Path();
   const auto entries = services().files->contentsOfDirectoryAtPath(folder);
   if (!entries) {
     FDYLogger::logDebug("Failed to get content of theme at path \"%@\": \"%@\"", folder, entries.error());
@@ -60,7 +82,7 @@ bool QuiltDocument::applyTheme(const std::shared_ptr<QuiltTheme>& theme, const P
       FDYLogger::logCritical("Theme \"%@\" appliance on document at path \"%@\" has been cancelled", name, path());
       return false;
     }
-    const auto copied = services().files->copyItem(folder / entry, path() / entry);
+    const auto copied = copyEntry(folder / entry, path() / entry, theme->path());
     if (!copied) {
       FDYLogger::logDebug("Failed to copy \"%@\" to \"%@\": \"%@\"", folder / entry, path() / entry, copied.error());
       return fail(copied.error().text);

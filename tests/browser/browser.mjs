@@ -20,7 +20,7 @@ export async function openPage(browser, options = {}) {
   page.on('console', (message) => { if (['error', 'warning'].includes(message.type())) complaints.push(message.text()); });
   page.on('pageerror', (error) => complaints.push(String(error)));
   page.on('request', (request) => { if (!/^(file|data|about|blob):/.test(request.url())) requests.push(request.url()); });
-  page.setDefaultTimeout(10000);
+  page.setDefaultTimeout(20000);  // machines that do much else at once
   return {context, page, complaints, requests};
 }
 

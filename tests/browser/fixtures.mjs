@@ -2,7 +2,7 @@
 // The packages that the tests open.
 import {rmSync} from 'node:fs';
 import {join} from 'node:path';
-import {makePackage, Media} from './packages.mjs';
+import {makePackage, Media, openPackage} from './packages.mjs';
 
 const kPageTexts = [
   'Fields in spring\n\nThe olive grows slowly. A young tree needs four years before it carries its first fruit, and forty before it carries well.',
@@ -70,72 +70,93 @@ export class Fixtures {
 
   path(name) { return join(this.folder, 'packages', name); }
 
-  course() { return makePackage(this.path('course'), course(this.media)); }
+  /// Makes the package, or opens the one that the first step of the run has made: test files run side by side.
+  made(name, contents) {
+    return process.env.QUILT_BROWSER_READY ? openPackage(this.path(name)) : makePackage(this.path(name), contents());
+  }
+
+  all() {
+    for (const name of ['course', 'single', 'portrait', 'lecture', 'many', 'broken', 'hostile']) this[name]();
+  }
+
+  course() { return this.made('course', () => course(this.media)); }
 
   /// A movie alone.
   single() {
-    const film = this.media.movie('grove-480p.mp4', {seconds: 12, size: '640x360'});
-    return makePackage(this.path('single'), {title: 'One film', media: [
-      {category: 'Movie', title: 'The only one', sources: [{category: 'Movie', hasSound: true, files: [{path: film, width: 640, height: 360, duration: 12}]}]}]});
+    return this.made('single', () => {
+      const film = this.media.movie('grove-480p.mp4', {seconds: 12, size: '640x360'});
+      return {title: 'One film', media: [
+        {category: 'Movie', title: 'The only one', sources: [{category: 'Movie', hasSound: true, files: [{path: film, width: 640, height: 360, duration: 12}]}]}]};
+    });
   }
 
   /// A film that stands upright.
   portrait() {
-    const film = this.media.movie('upright.mp4', {seconds: 4, size: '360x640'});
-    return makePackage(this.path('portrait'), {title: 'Upright', media: [
-      {category: 'Movie', title: 'Upright', sources: [{category: 'Movie', hasSound: true, files: [{path: film, width: 360, height: 640, duration: 4}]}]}]});
+    return this.made('portrait', () => {
+      const film = this.media.movie('upright.mp4', {seconds: 4, size: '360x640'});
+      return {title: 'Upright', media: [
+        {category: 'Movie', title: 'Upright', sources: [{category: 'Movie', hasSound: true, files: [{path: film, width: 360, height: 640, duration: 4}]}]}]};
+    });
   }
 
   /// Two long sources for the measurement of their distance.
   lecture() {
-    const speaker = this.media.movie('speaker-long.mp4', {seconds: 90, colour: '0x39454d', size: '320x180'});
-    const slides = this.media.movie('slides-long.mp4', {seconds: 80, colour: '0x5b4a2a', size: '320x180', silent: true});
-    return makePackage(this.path('lecture'), {title: 'Lecture', media: [{category: 'DualSource', title: 'Lecture', sources: [
-      {category: 'Movie', hasSound: true, files: [{path: speaker, width: 320, height: 180, duration: 90}]},
-      {category: 'Movie', timecode: 2, files: [{path: slides, width: 320, height: 180, duration: 80}]}]}]});
+    return this.made('lecture', () => {
+      const speaker = this.media.movie('speaker-long.mp4', {seconds: 90, colour: '0x39454d', size: '320x180'});
+      const slides = this.media.movie('slides-long.mp4', {seconds: 80, colour: '0x5b4a2a', size: '320x180', silent: true});
+      return {title: 'Lecture', media: [{category: 'DualSource', title: 'Lecture', sources: [
+        {category: 'Movie', hasSound: true, files: [{path: speaker, width: 320, height: 180, duration: 90}]},
+        {category: 'Movie', timecode: 2, files: [{path: slides, width: 320, height: 180, duration: 80}]}]}]};
+    });
   }
 
-  many(count = 500) {
-    const still = this.media.made('still-0.jpg', ['-i', this.media.picture('valley.png'), '-q:v', '4']);
-    const film = this.media.movie('short.mp4', {seconds: 2, size: '320x180'});
-    const media = [];
-    for (let i = 0; i < count; ++i) {
-      media.push({category: 'Movie', title: `Lesson ${i + 1}: ${['pruning', 'grafting', 'watering', 'harvest', 'pressing'][i % 5]}`, poster: still,
-                  description: i === 321 ? 'Hier steht das Wort Überraschung.' : 'A short description of this lesson.',
-                  sources: [{category: 'Movie', hasSound: true, files: [{path: film, width: 320, height: 180, duration: 2}]}]});
-    }
-    return makePackage(this.path('many'), {title: 'Five hundred lessons', media});
+  many() {
+    return this.made('many', () => {
+      const still = this.media.made('still-0.jpg', ['-i', this.media.picture('valley.png'), '-q:v', '4']);
+      const film = this.media.movie('short.mp4', {seconds: 2, size: '320x180'});
+      const media = [];
+      for (let i = 0; i < 500; ++i) {
+        media.push({category: 'Movie', title: `Lesson ${i + 1}: ${['pruning', 'grafting', 'watering', 'harvest', 'pressing'][i % 5]}`, poster: still,
+                    description: i === 321 ? 'Hier steht das Wort Überraschung.' : 'A short description of this lesson.',
+                    sources: [{category: 'Movie', hasSound: true, files: [{path: film, width: 320, height: 180, duration: 2}]}]});
+      }
+      return {title: 'Five hundred lessons', media};
+    });
   }
 
   /// Ten movies of which the fourth is damaged, and one whose best grade is.
   broken() {
-    const film = this.media.movie('short.mp4', {seconds: 2, size: '320x180'});
-    const damaged = this.media.text('damaged.mp4', 'This is no film.');
-    const still = this.media.made('still-1.jpg', ['-i', this.media.picture('dusk.png', {from: '0xf2c9a0', to: '0x5b3a3a', sun: '0xfff0d0', seed: 5}), '-q:v', '4']);
-    const file = (path, tags) => ({path, tags, width: 320, height: 180, duration: 2});
-    return makePackage(this.path('broken'), {title: 'One is broken', media: Array.from({length: 10}, (_, i) => ({
-      category: 'Movie', title: `Film ${i + 1}`, poster: still, sources: [{category: 'Movie', hasSound: true, files:
-        i === 3 ? [file(damaged)] : i === 6 ? [file(damaged, ['Desktop']), file(film, ['480p'])] : [file(film)]}]}))});
+    return this.made('broken', () => {
+      const film = this.media.movie('short.mp4', {seconds: 2, size: '320x180'});
+      const damaged = this.media.text('damaged.mp4', 'This is no film.');
+      const still = this.media.made('still-1.jpg', ['-i', this.media.picture('dusk.png', {from: '0xf2c9a0', to: '0x5b3a3a', sun: '0xfff0d0', seed: 5}), '-q:v', '4']);
+      const file = (path, tags) => ({path, tags, width: 320, height: 180, duration: 2});
+      return {title: 'One is broken', media: Array.from({length: 10}, (_, i) => ({
+        category: 'Movie', title: `Film ${i + 1}`, poster: still, sources: [{category: 'Movie', hasSound: true, files:
+          i === 3 ? [file(damaged)] : i === 6 ? [file(damaged, ['Desktop']), file(film, ['480p'])] : [file(film)]}]}))};
+    });
   }
 
   /// Titles, texts and names as an attacker would choose them.
   hostile() {
-    const film = this.media.movie('short.mp4', {seconds: 2, size: '320x180'});
-    const still = this.media.made('still-0.jpg', ['-i', this.media.picture('valley.png'), '-q:v', '4']);
-    const evil = '<img src=x onerror="window.hacked=1"></script><script>window.hacked=2</script>\u2028"\'`${window.hacked=3}';
-    return makePackage(this.path('hostile'), {title: evil, description: evil + ' javascript:window.hacked=4 https://example.org/"onclick="window.hacked=5', author: evil, media: [
-      {category: 'Movie', id: 'a b&c=<d>', title: evil, description: evil, sources: [{category: 'Movie', title: evil, hasSound: true,
-        files: [{path: film, name: 'é 媒体 #1 100%.mp4', width: 320, height: 180, duration: 2}],
-        previews: [{path: still, title: evil, timecode: 0}, {path: still, title: 'x'.repeat(5000), timecode: 1}]}]},
-      {category: 'Web', title: 'Script link', sources: [{category: 'Web', files: [{url: 'javascript:window.hacked=6'}]}]},
-      {category: 'Document', title: 'W'.repeat(400), sources: [{category: 'Document', files: [{path: still}], previews: [{path: still, title: evil, text: evil}]}]},
-      {category: '__proto__', title: 'Unknown', sources: [{files: []}]},
-      {title: 'Nothing'},
-      {category: 'Movie', title: 'No sources at all', sources: []},
-    ]});
+    return this.made('hostile', () => {
+      const film = this.media.movie('short.mp4', {seconds: 2, size: '320x180'});
+      const still = this.media.made('still-0.jpg', ['-i', this.media.picture('valley.png'), '-q:v', '4']);
+      const evil = '<img src=x onerror="window.hacked=1"></script><script>window.hacked=2</script>\u2028"\'`${window.hacked=3}';
+      return {title: evil, description: evil + ' javascript:window.hacked=4 https://example.org/"onclick="window.hacked=5', author: evil, media: [
+        {category: 'Movie', id: 'a b&c=<d>', title: evil, description: evil, sources: [{category: 'Movie', title: evil, hasSound: true,
+          files: [{path: film, name: 'é 媒体 #1 100%.mp4', width: 320, height: 180, duration: 2}],
+          previews: [{path: still, title: evil, timecode: 0}, {path: still, title: 'x'.repeat(5000), timecode: 1}]}]},
+        {category: 'Web', title: 'Script link', sources: [{category: 'Web', files: [{url: 'javascript:window.hacked=6'}]}]},
+        {category: 'Document', title: 'W'.repeat(400), sources: [{category: 'Document', files: [{path: still}], previews: [{path: still, title: evil, text: evil}]}]},
+        {category: '__proto__', title: 'Unknown', sources: [{files: []}]},
+        {title: 'Nothing'},
+        {category: 'Movie', title: 'No sources at all', sources: []},
+      ]};
+    });
   }
 
-  /// The course without some of its files.
+  /// The course without some of its files; a package for one test.
   incomplete(name, ...missing) {
     const made = makePackage(this.path(name), course(this.media));
     for (const file of missing) rmSync(join(made.folder, file), {recursive: true});

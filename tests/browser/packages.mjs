@@ -3,7 +3,7 @@
 // folders. Media are drawn by the ffmpeg program, once per build folder.
 import {execFileSync} from 'node:child_process';
 import {createHash} from 'node:crypto';
-import {copyFileSync, cpSync, existsSync, mkdirSync, renameSync, rmSync, statSync, writeFileSync} from 'node:fs';
+import {copyFileSync, cpSync, existsSync, mkdirSync, readFileSync, renameSync, rmSync, statSync, writeFileSync} from 'node:fs';
 import {basename, dirname, extname, join, relative} from 'node:path';
 import {fileURLToPath} from 'node:url';
 
@@ -156,7 +156,14 @@ export function makePackage(folder, {title, description, author, media, poster, 
   };
   mkdirSync(join(folder, 'controllers'), {recursive: true});
   writeFileSync(join(folder, 'controllers/data.js'), `var appData = ${scriptJson(data)};`);
-  return {folder, data, items: items.map((item) => item.UUID)};
+  return openPackage(folder);
+}
+
+/// A package that was made before.
+export function openPackage(folder) {
+  const script = readFileSync(join(folder, 'controllers/data.js'), 'utf8');
+  const data = JSON.parse(script.slice('var appData = '.length, -1));
+  return {folder, data, items: (data.Media || []).map((item) => item.UUID)};
 }
 
 /// JSON that may stand inside a script, as the data script has it.

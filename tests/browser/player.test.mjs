@@ -79,6 +79,9 @@ describe('the keyboard', () => {
     assert.equal(await page.inputValue('.page-number'), '2');
     await page.keyboard.press('PageUp');
     assert.equal(await page.inputValue('.page-number'), '1');
+    assert.equal(await page.locator('.controls').isVisible(), false);
+    await page.mouse.move(600, 400);
+    assert.equal(await page.locator('.controls').isVisible(), true);
     const blank = () => page.evaluate(() => document.documentElement.classList.contains('blank'));
     await page.keyboard.press('b');
     assert.equal(await blank(), true);
@@ -101,7 +104,7 @@ describe('the keyboard', () => {
     await page.keyboard.press('?');
     assert.equal(await page.locator('.keys kbd').count() > 25, true);
     await page.keyboard.press('Escape');
-    assert.equal(await page.locator('dialog').count(), 0);
+    await until(page, () => !document.querySelector('dialog'));
   }));
 });
 
@@ -132,7 +135,7 @@ describe('links and memory', () => {
   test('the link at this time is copied', () => shared.visit(course, async (page, {context}) => {
     await page.evaluate(() => { navigator.clipboard.writeText = async (text) => { window.copied = text; }; });
     await page.evaluate(() => window.Olive.app.stage.player.seek(6.5));
-    await page.keyboard.press('c');
+    await page.keyboard.press('u');
     await until(page, () => window.copied);
     assert.equal(await page.evaluate(() => window.copied), fileUrl(course.folder, `#item=${course.items[0]}&t=6.5`));
     assert.ok(context);
@@ -214,6 +217,15 @@ describe('the player', () => {
   test('takes the small grade on a small screen', () => shared.visit(course, async (page) => {
     await until(page, () => window.Olive.app.stage.player.leader.element.videoHeight === 360);
   }, {...item(0), viewport: {width: 400, height: 700}}));
+
+  test('ends at the end, every time', () => shared.visit(course, async (page) => {
+    for (let i = 0; i < 8; ++i) {
+      await page.evaluate(() => window.Olive.app.stage.player.seek(11.8));
+      await page.keyboard.press('k');
+      await until(page, () => window.Olive.app.stage.player.hasEnded);
+      near(await time(page), 12, 0.1);
+    }
+  }, item(0)));
 
   test('keeps pitch and speed from item to item', () => shared.visit(course, async (page) => {
     await page.selectOption('select[aria-label="Speed"]', '1.5');

@@ -39,7 +39,7 @@ export const playerState = (page) => page.evaluate(() => {
 });
 
 /// Waits in the page; asks again and again because the page's policy forbids what Playwright's own waiting does.
-export async function until(page, condition, argument, limit = 10000) {
+export async function until(page, condition, argument, limit = 20000) {
   const end = Date.now() + limit;
   while (!await page.evaluate(condition, argument)) {
     if (Date.now() > end) throw new Error('never came true: ' + condition);

@@ -62,6 +62,17 @@ describe('a reader is told what is wrong', () => {
   });
 });
 
+test('a picture whose voice is missing is shown all the same', () => {
+  const course = fixtures.course();
+  const made = fixtures.incomplete('no-voice', course.data.Media[8].AudioCommentarySource.Derivatives[0].RelativePath);
+  return shared.visit(made, async (page) => {
+    await page.waitForSelector('.message');
+    await until(page, () => document.querySelector('.sheet img').naturalWidth > 0);
+    await page.keyboard.press('k');
+    assert.equal((await playerState(page)).isPlaying, false);
+  }, {...expected, hash: '#item=' + made.items[8]});
+});
+
 describe('one broken film among ten', () => {
   const broken = fixtures.broken();
 

@@ -67,9 +67,16 @@ TEST(ParserTest, TheOtherCommandsBecomeRequests) {
             asked({"new", "document", "T", "--collection", "C", "--type", "pdf"}));
   EXPECT_EQ(Command(RemoveRequest{{"A"}, std::nullopt, true}), asked({"remove", "A", "--force"}));
   EXPECT_EQ(Command(RemoveRequest{{"1", "2"}, "D", false}), asked({"remove", "1", "2", "--from", "D"}));
+  EXPECT_EQ(Command(CheckRequest{}), asked({"check"}));
+  EXPECT_EQ(Command(CheckRequest{{"A", "B"}}), asked({"check", "A", "B"}));
   EXPECT_EQ(Command(ServeRequest{"D", 0, false}), asked({"serve", "D"}));
   EXPECT_EQ(Command(ServeRequest{"D", 4711, true}), asked({"serve", "D", "--open", "--port", "4711"}));
   EXPECT_EQ(Command(DoctorRequest{}), asked({"doctor"}));
+  EXPECT_EQ(Command(ThemesRequest{}), asked({"themes"}));
+  EXPECT_EQ(Command(FinalizeRequest{"D"}), asked({"finalize", "D"}));
+  EXPECT_EQ(Command(BuildRequest{"m.json", "out"}), asked({"build", "m.json", "--output", "out"}));
+  EXPECT_EQ(Command(BuildRequest{"m.json", "out", true, {"720p"}, "olive"}),
+            asked({"build", "--zip", "--format", "720P", "--theme", "olive", "m.json", "--output", "out"}));
   EXPECT_EQ(Command(HelpRequest{"import"}), asked({"help", "import"}));
   EXPECT_EQ(Command(HelpRequest{"import"}), asked({"import", "--help"}));
   EXPECT_EQ(Command(HelpRequest{}), asked({"-h"}));

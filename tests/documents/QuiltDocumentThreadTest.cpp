@@ -32,6 +32,7 @@ class QuiltDocumentThreadTest : public support::DocumentFixture {
     while (running > 0) {
       MainThread::runQueuedBlocks();
       meanwhile();
+      std::this_thread::yield();  // the jobs may have to share a core with this loop
     }
     for (std::thread& thread : threads) thread.join();
   }

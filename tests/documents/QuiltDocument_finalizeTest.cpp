@@ -184,6 +184,35 @@ TEST_F(QuiltDocumentFinalizeTest, TheScriptHoldsTheRecordWithoutTheThemesPath) {
   EXPECT_THAT(data, Not(HasSubstr("</script>")));
 }
 
+TEST_F(QuiltDocumentFinalizeTest, TheScriptIsThisToTheByte) {
+  const auto document = interactive();
+  document->setIsProcessing(true);
+  document->setUuid("DOCUMENT");
+  document->setTitle("</script><!-- \"x\" \\ \xE2\x80\xA8\xE2\x80\xA9 \xC3\xBC\n");
+  document->setAuthor("javascript:alert(1)");
+  document->setJukeboxOrder(7);
+  document->setCreationDate(dateOf("2010-05-01T12:00:00Z"));
+  document->setModifiedDate(dateOf("2026-03-05T14:07:09Z"));
+  document->setIsProcessing(false);
+  const auto item = QuiltMedia::init();
+  item->setUuid("ITEM");
+  item->setTitle("Read on");
+  add(*document, item);
+  const auto collection = QuiltCollection::init();
+  collection->setUuid("COLLECTION");
+  collection->setTitle("All");
+  document->setCollectionOwner(collection);
+  ASSERT_TRUE(document->finalizeWithProgressionBlock({}));
+  EXPECT_EQ(readFile(document->dataControllerPath()),
+            R"(var appData = {"Version":"1.0","UUID":"DOCUMENT",)"
+            R"~("Title":"\u003c/script>\u003c!-- \"x\" \\ \u2028\u2029 ü\n","Author":"javascript:alert(1)",)~"
+            R"("jukeboxOrder":7,"CreationDate":"2010-05-01T12:00:00Z","ModifiedDate":"2026-03-05T14:07:09Z",)"
+            R"("Type":"Interactive","Media":[{"UUID":"ITEM","Title":"Read on","IsFlattened":false,)"
+            R"("TotalSizeInMegaBytes":0,"PosterImagePath":"media/ITEM/poster.jpg","PosterImageWidth":0,)"
+            R"("PosterImageHeight":0}],"DocumentDuration":0,"IsFlattened":false,)"
+            R"("PosterImagePath":"poster.png","CollectionOwner":{"UUID":"COLLECTION","Title":"All"}};)");
+}
+
 TEST_F(QuiltDocumentFinalizeTest, APlaceholderPosterBecomesTheArtwork) {
   const auto document = interactive();
   ASSERT_FALSE(std::filesystem::exists(document->posterImagePath()));

@@ -352,7 +352,9 @@ TEST_F(PreviewAccessorTest, AnswersTheSizeAndPlaceOfItsImage) {
 
 // ---- Exposure
 
-TEST(ExposureTest, EachClassHasItsAccessorsAndNoOthers) {
+using ExposureTest = support::ModelFixture;
+
+TEST_F(ExposureTest, EachClassHasItsAccessorsAndNoOthers) {
   std::map<std::string_view, std::size_t> counts;
   for (const ExposedClass& type : exposedClasses()) counts[type.name] = type.accessors.size();
   EXPECT_EQ(counts, (std::map<std::string_view, std::size_t>{{"QuiltCollection", 7},
@@ -363,7 +365,7 @@ TEST(ExposureTest, EachClassHasItsAccessorsAndNoOthers) {
                                                              {"QuiltMediaPreview", 7}}));
 }
 
-TEST(ExposureTest, OtherMethodsAreExcluded) {
+TEST_F(ExposureTest, OtherMethodsAreExcluded) {
   const auto document = QuiltDocument::init();
   for (const char* name : {"update", "title", "setTitle:", "dictionary", "cvSetTitle", "cvtitle",
                            "cvTitle:", "cvCopyright", "cvSourcesCount", "cv", ""})
@@ -372,13 +374,13 @@ TEST(ExposureTest, OtherMethodsAreExcluded) {
   EXPECT_FALSE(isExcludedFromScripts(*document, "cvSetTitle:"));
 }
 
-TEST(ExposureTest, AnExtraAnswersAsASource) {
+TEST_F(ExposureTest, AnExtraAnswersAsASource) {
   const auto extra = QuiltMediaExtra::init();
   ASSERT_NE(exposedClassOf(*extra), nullptr);
   EXPECT_EQ(exposedClassOf(*extra)->name, "QuiltMediaSource");
 }
 
-TEST(ExposureTest, OtherObjectsHaveNothing) {
+TEST_F(ExposureTest, OtherObjectsHaveNothing) {
   platform::Object object;
   EXPECT_EQ(exposedClassOf(object), nullptr);
   EXPECT_TRUE(isExcludedFromScripts(object, "cvUUID"));

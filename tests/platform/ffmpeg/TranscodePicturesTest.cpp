@@ -16,6 +16,7 @@ namespace {
 namespace fs = std::filesystem;
 using support::judge;
 using support::JudgedPicture;
+using support::JudgedStream;
 using support::makeMedia;
 using support::MediaSpec;
 using support::pictureOf;
@@ -194,6 +195,25 @@ TEST_F(TranscodePicturesTest, DeepAndFinePicturesBecomeEightBitsWithCoarserColou
     SCOPED_TRACE(format);
     expectColour(colourAfter("scale=out_color_matrix=bt601:out_range=limited", 64, {}, "libx264", format), colour, 4);
   }
+}
+
+TEST_F(TranscodePicturesTest, TheStreamAloneTellsItsColours) {
+  const fs::path stream = support::runFfmpeg(
+      {"-i", hd(clip()).string(), "-map", "0:v", "-c", "copy", "-bsf:v", "h264_mp4toannexb"}, "h264");
+  const JudgedStream video = judge(stream).video();
+  EXPECT_EQ(video.range, "tv");
+  EXPECT_EQ(video.matrix, "bt709");
+  EXPECT_EQ(video.primaries, "bt709");
+  EXPECT_EQ(video.transfer, "bt709");
+}
+
+TEST_F(TranscodePicturesTest, ACopyKeepsWhatIsToldOfColours) {
+  MediaSpec spec = support::silentMovie();
+  spec.options = {"-colorspace", "bt709", "-color_primaries", "bt709", "-color_trc", "bt709", "-color_range", "tv"};
+  const fs::path source = makeMedia(spec);
+  const fs::path copy = hd(source);
+  EXPECT_EQ(support::packetChecksums(copy, "v"), support::packetChecksums(source, "v"));
+  expectPlainColours(copy);
 }
 
 TEST_F(TranscodePicturesTest, OtherPrimariesAreConverted) {

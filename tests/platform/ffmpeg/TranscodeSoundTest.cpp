@@ -71,19 +71,22 @@ TEST_F(TranscodeSoundTest, MixingDownDoesNotClip) {
   EXPECT_GT(support::loudness(sound, 2, 0, 48000, 0.2, 0.8), 0.6) << "turned down, not cut off";
 }
 
-TEST_F(TranscodeSoundTest, UnknownChannelsCountAsUsual) {
-  const std::vector<std::string> fronts{kTone, "0", "0", "0", "0", "0"};
-  const fs::path unknown = support::runFfmpeg(
-      {"-f", "s16le", "-ar", "48000", "-ac", "6", "-i",
-       support::makeWav(std::vector<std::int16_t>(48000 * 6, 8000), 6).string(), "-c:a", "pcm_s16le"},
-      "caf");
-  EXPECT_EQ(judge(audio(unknown)).audio().channels, 2);
-  std::vector<std::string> nine(9, "0.1*sin(2*PI*440*t)");
-  const fs::path many = support::runFfmpeg(
-      {"-f", "lavfi", "-i", "aevalsrc=" + std::string("0.1|0.1|0.1|0.1|0.1|0.1|0.1|0.1|0.1:d=0.5:s=48000"), "-c:a",
-       "pcm_s16le"},
-      "wav");
-  EXPECT_EQ(judge(audio(many)).audio().channels, 2);
+TEST_F(TranscodeSoundTest, ChannelsWithoutPlacesCountAsUsual) {
+  std::vector<std::int16_t> samples;
+  for (int i = 0; i < 48000; ++i) {
+    for (int channel = 0; channel < 6; ++channel) {  // the third is the centre
+      samples.push_back(channel == 2 ? static_cast<std::int16_t>(16384 * std::sin(i * 0.0576)) : std::int16_t{0});
+    }
+  }
+  expectLoudness(sides(support::makeWav(samples, 6)), 0.707, 0.707);
+}
+
+TEST_F(TranscodeSoundTest, MoreChannelsThanAnyLayoutHasAreHeardOnBothSides) {
+  std::string nine = kTone;
+  for (int i = 1; i < 9; ++i) nine += std::string("|") + kTone;
+  const fs::path many =
+      support::runFfmpeg({"-f", "lavfi", "-i", "aevalsrc=" + nine + ":d=1:s=48000", "-c:a", "pcm_f32le"}, "wav");
+  expectLoudness(sides(many), 1, 1);
 }
 
 TEST_F(TranscodeSoundTest, RatesOfDiscsAndVideoAreKeptAndOthersAreNot) {

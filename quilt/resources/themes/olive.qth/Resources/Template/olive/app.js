@@ -11,6 +11,7 @@
     const memory = Olive.openMemory(typeof data.UUID === 'string' ? data.UUID : 'package');
     let pack, find, printAll, stage = null, current = null, frame = null, query = '', terms = [], lastNote = 0, view;
 
+    const screen = Olive.makeFrameControl(() => (stage ? {stage, frame} : {stage: null, frame: null}));
     const isLonely = () => pack.items.length === 1;
     const neighbour = (step) => (current ? pack.items[current.index + step] : null);
 
@@ -62,52 +63,11 @@
     function showHome() {
       close();
       document.title = pack.title || say('untitledPackage');
-      const total = pack.items.reduce((sum, item) => sum + item.duration, 0);
-      const last = pack.items.find((item) => memory.place(item).time > 5 && !memory.place(item).done);
-      const start = last || pack.items[0];
-      const place = start ? memory.place(start) : {};
-      const cards = make('ul', {class: 'cards'}, pack.items.map((item) => Olive.makeCard(item, memory)));
       view.className = 'home';
-      view.replaceChildren(
-        make('section', {class: 'hero'},
-          pack.poster && Olive.picture(pack.poster, {class: 'hero-picture', loading: 'eager'}),
-          make('div', {class: 'hero-text'},
-            pack.collection && make('p', {class: 'eyebrow', dir: 'auto', text: pack.collection}),
-            make('h1', {dir: 'auto', text: pack.title || say('untitledPackage')}),
-            pack.author && make('p', {class: 'author', dir: 'auto', text: pack.author}),
-            make('div', {class: 'lead'}, Olive.paragraphs(pack.description)),
-            make('p', {class: 'facts'}, [
-              say('itemCount', {n: pack.items.length}), total ? Olive.clock(total) : '', pack.modified ? Olive.day(pack.modified) : '', pack.category, pack.advisory,
-            ].filter(Boolean).map((fact) => make('span', null, make('bdi', {text: fact})))),
-            start && make('a', {class: 'primary', href: Olive.address.to({item: start.id})}, Olive.icon('play'),
-                          last ? say('continueWith', {title: last.title, time: Olive.clock(place.time)}) : say('start')))),
-        pack.items.length ? make('section', {class: 'contents', 'aria-labelledby': 'contents-title'},
-          make('div', {class: 'contents-head'}, make('h2', {id: 'contents-title', text: say('contents')}), makeFilter(cards)), cards)
-                          : make('p', {class: 'empty', text: say('emptyPackage')}));
-    }
-
-    // Buttons that show one category only.
-    function makeFilter(cards) {
-      const kinds = [...new Set(pack.items.map((item) => item.category).filter(Boolean))];
-      if (kinds.length < 2 || pack.items.length < 6) return null;
-      const buttons = ['', ...kinds].map((kind) => make('button', {type: 'button', class: 'chip', 'aria-pressed': kind === '', text: kind ? Olive.kindOf({category: kind}) : say('all'),
-        onclick: (event) => {
-          buttons.forEach((button) => button.setAttribute('aria-pressed', button === event.currentTarget));
-          for (const card of cards.children) card.hidden = kind !== '' && card.dataset.category !== kind;
-        }}));
-      return make('div', {class: 'chips', role: 'group', 'aria-label': say('filter')}, buttons);
+      view.replaceChildren(...Olive.makeHome(pack, memory));
     }
 
     // --- the page of an item
-
-    function frameButtons(item, elements) {
-      const video = elements.find((element) => element.localName === 'video');
-      return [
-        video && document.pictureInPictureEnabled && Olive.iconButton('pip', say('pip'), togglePictureInPicture, {class: 'icon-button pip wide-only'}),
-        Olive.iconButton('present', say('present'), togglePresenting, {class: 'icon-button wide-only'}),
-        document.fullscreenEnabled && Olive.iconButton('full', say('fullscreen'), toggleFullscreen, {class: 'icon-button fullscreen'}),
-      ];
-    }
 
     function showItem(item, start) {
       close();
@@ -116,7 +76,7 @@
       const panels = [];
       const lists = {};
       stage = Olive.makeStage(item, {
-        memory, start, frameButtons, note: () => note(true), focus: () => frame.focus({preventScroll: true}), terms: () => terms,
+        memory, start, frameButtons: screen.buttons, note: () => note(true), focus: () => frame.focus({preventScroll: true}), terms: () => terms,
         again: () => showItem(item, {...Olive.address.read(), play: false}),
         onPage: (index) => lists.pages && lists.pages.follow(index),
       });
@@ -196,7 +156,7 @@
       });
       player.addEventListener('state', () => {
         note(true);
-        wake();
+        screen.wake();
         const session = navigator.mediaSession;
         if (session) session.playbackState = player.isPlaying ? 'playing' : 'paused';
       });
@@ -253,7 +213,7 @@
       if (left.cancelNext) left.cancelNext();
       left.close();
       current = null;
-      wake();
+      screen.wake();
     }
 
     // --- places
@@ -339,58 +299,12 @@
       });
     }
 
-    // --- the frame: full screen, presentation, picture in picture
-
-    function toggleFullscreen() {
-      if (!frame) return;
-      if (document.fullscreenElement) document.exitFullscreen();
-      else if (frame.requestFullscreen) frame.requestFullscreen().catch(() => togglePresenting());
-      else togglePresenting();
-    }
-
-    const isPresenting = () => root.classList.contains('presenting');
-    function togglePresenting() {
-      if (!frame && !isPresenting()) return;
-      root.classList.toggle('presenting');
-      root.classList.remove('blank');
-      Olive.announce(say(isPresenting() ? 'presentingOn' : 'presentingOff'));
-      if (isPresenting()) frame.focus({preventScroll: true});
-      wake();
-    }
-
-    function togglePictureInPicture() {
-      const video = stage && stage.elements && stage.elements.find((element) => element.localName === 'video');
-      if (!video || !document.pictureInPictureEnabled) return;
-      if (document.pictureInPictureElement) document.exitPictureInPicture();
-      else video.requestPictureInPicture().catch(() => Olive.announce(say('notPossible')));
-    }
-
     function leave() {
-      if (root.classList.contains('blank')) root.classList.remove('blank');
-      else if (isPresenting()) togglePresenting();
-      else if (stage && stage.cancelNext) stage.cancelNext();
+      if (!screen.leave() && stage && stage.cancelNext) stage.cancelNext();
     }
-
-    // Controls fade while a film fills the screen and nobody moves.
-    let idle = 0;
-    function wake() {
-      root.classList.remove('idle');
-      clearTimeout(idle);
-      if (stage && stage.player && stage.player.isPlaying && (document.fullscreenElement || isPresenting())) idle = setTimeout(() => root.classList.add('idle'), 2500);
-    }
-    for (const name of ['pointermove', 'pointerdown', 'keydown', 'focusin']) document.addEventListener(name, wake, {passive: true});
-    document.addEventListener('fullscreenchange', () => {
-      wake();
-      const button = view.querySelector('.fullscreen');
-      if (!button) return;
-      Olive.setIcon(button, document.fullscreenElement ? 'unfull' : 'full');
-      Olive.relabel(button, say(document.fullscreenElement ? 'leaveFullscreen' : 'fullscreen'));
-    });
 
     const api = {
-      stage: () => stage, frame: () => frame, isOn: () => memory.choice('keys', true), isPresenting, step, copyLink, openSearch, goHome, leave,
-      toggleFullscreen, togglePictureInPicture, togglePresenting,
-      toggleBlank: () => root.classList.toggle('blank'),
+      ...screen, stage: () => stage, frame: () => frame, isOn: () => memory.choice('keys', true), step, copyLink, openSearch, goHome, leave,
       nextView() {
         if (!stage || !stage.view) return;
         const names = ['side', 'corner', 'first', 'second'];

@@ -15,7 +15,7 @@
       else if (name === 'text') node.textContent = value;
       else node.setAttribute(name, value === true ? '' : value);
     }
-    node.append(...children.flat().filter((child) => child !== null && child !== undefined && child !== false));
+    node.append(...children.flat().filter((child) => child || child === 0));
     return node;
   };
 

@@ -9,7 +9,7 @@
     [['Space', 'K'], 'key-play'], [['J', 'L'], 'key-skip'], [['←', '→'], 'key-step'], [['↑', '↓'], 'key-volume'], [['M'], 'mute'],
     [['0', '–', '9'], 'key-tenths'], [['[', ']'], 'key-chapter'], [['<', '>'], 'speed'], [['N', 'P'], 'key-item'], [['PgUp', 'PgDn'], 'key-page'],
     [['+', '−'], 'zoom'], [['S'], 'swap'], [['D'], 'views'], [['F'], 'fullscreen'], [['I'], 'pip'], [['V'], 'present'], [['B', '.'], 'key-blank'],
-    [['C'], 'copyLink'], [['/'], 'search'], [['H'], 'home'], [['?'], 'help'], [['Esc'], 'key-leave'],
+    [['T'], 'pageText'], [['U'], 'copyLink'], [['/'], 'search'], [['H'], 'home'], [['?'], 'help'], [['Esc'], 'key-leave'],
   ];
 
   const isField = (node) => node.closest('input:not([type=range]):not([type=checkbox]), select, textarea, [contenteditable]');
@@ -60,7 +60,8 @@
         '+': () => sheet && sheet.zoomBy(1),
         '=': () => sheet && sheet.zoomBy(1),
         '-': () => sheet && sheet.zoomBy(-1),
-        c: () => app.copyLink(),
+        t: () => stage && stage.toggleText && stage.toggleText(),
+        u: () => app.copyLink(),
         '/': () => app.openSearch(),
         h: () => app.goHome(),
         '?': () => app.openHelp(),

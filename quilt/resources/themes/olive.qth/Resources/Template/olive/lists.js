@@ -26,14 +26,18 @@
     return make('span', {class: 'meta'}, Olive.icon(item.category || 'warning'), parts.join(' · '));
   }
 
-  Olive.makeCard = (item, memory) => make('li', {class: 'card', 'data-category': item.category},
-    make('a', {href: Olive.address.to({item: item.id})},
+  // The browser draws the entries of a long list only when they come into sight.
+  const kLong = 60;
+  const listClass = (name, entries) => (entries.length > kLong ? name + ' long' : name);
+
+  Olive.makeCards = (items, memory) => make('ul', {class: listClass('cards', items)}, items.map((item) =>
+    make('li', {class: 'card', 'data-category': item.category}, make('a', {href: Olive.address.to({item: item.id})},
       thumbnail(item, memory),
       make('span', {class: 'card-text'},
         make('span', {class: 'card-title', dir: 'auto', text: item.title}),
-        meta(item))));
+        meta(item))))));
 
-  Olive.makeContents = (items, current, memory) => make('ol', {class: 'rows'}, items.map((item) =>
+  Olive.makeContents = (items, current, memory) => make('ol', {class: listClass('rows', items)}, items.map((item) =>
     make('li', null, make('a', {class: 'row', href: Olive.address.to({item: item.id}), 'aria-current': item === current ? 'true' : null},
       thumbnail(item, memory),
       make('span', {class: 'row-text'}, make('span', {class: 'row-title', dir: 'auto', text: item.title}), meta(item))))));
@@ -59,7 +63,7 @@
            make('span', {class: 'meta', text: Olive.clock(chapter.start)}))));
     let marked = -1;
     return {
-      element: make('ol', {class: 'rows'}, buttons.map((button) => make('li', null, button))),
+      element: make('ol', {class: listClass('rows', buttons)}, buttons.map((button) => make('li', null, button))),
       follow(time) {
         const index = chapters.filter((chapter) => chapter.start <= time + 0.05).length - 1;
         if (index === marked) return;
@@ -79,7 +83,7 @@
       make('span', {text: i + 1})));
     let marked = -1;
     return {
-      element: make('ol', {class: 'pages'}, buttons.map((button) => make('li', null, button))),
+      element: make('ol', {class: listClass('pages', buttons)}, buttons.map((button) => make('li', null, button))),
       follow(index) {
         if (buttons[marked]) buttons[marked].removeAttribute('aria-current');
         marked = index;

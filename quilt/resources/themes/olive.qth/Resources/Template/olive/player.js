@@ -192,6 +192,7 @@
     }
 
     play() {
+      if (this.streams.length && !this.live.length) return;
       if (this.hasEnded || (this.duration && this.time >= this.duration - 0.05)) this.seek(0);
       this.wanted = true;
       this.started = performance.now();
@@ -236,7 +237,7 @@
     }
 
     run(stream) {
-      if (!stream.element.paused) return;
+      if (!stream.element.paused || stream.element.ended) return;  // what has ended would begin again
       const promise = stream.element.play();
       if (!promise) return;
       promise.catch((error) => {

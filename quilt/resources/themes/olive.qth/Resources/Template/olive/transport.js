@@ -11,7 +11,7 @@
   const speedLabel = (speed) => Olive.number(speed, 2) + '×';
 
   function seekBar(player, chapters) {
-    const range = make('input', {type: 'range', class: 'seek', min: 0, max: 1, step: 0.1, value: 0, 'aria-label': say('seek')});
+    const range = make('input', {type: 'range', class: 'seek', min: 0, max: 1, step: 'any', value: 0, 'aria-label': say('seek')});
     const marks = make('div', {class: 'marks', 'aria-hidden': 'true'});
     const bubble = make('div', {class: 'bubble', hidden: true, 'aria-hidden': 'true'});
     const bar = make('div', {class: 'seek-bar'}, range, marks, bubble);
