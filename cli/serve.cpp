@@ -8,6 +8,7 @@
 #include "cli/LibrarySession.h"
 #include "cli/Saving.h"
 #include "cli/Text.h"
+#include "cli/ThemeLookup.h"
 #include "quilt/platform/base/Worker.h"
 #include "quilt/platform/interfaces/Services.h"
 #include "quilt/scripting/bridge/Bridge.h"
@@ -25,12 +26,9 @@ FoundDocument check(const ServeRequest& request, const Catalogue& catalogue) {
   const FoundDocument found = findDocument(catalogue, request.document);
   const DocumentEntry& entry = *found.document;
   const std::string cannot = "The document " + nameOf(entry) + " cannot be served";
-  const auto record = readDocumentRecord(entry.path);
-  if (!record) throw Failure(cannot, record.error());
+  checkTheme(entry, cannot, "set one with \"quilt set\"");
   if (entry.type != kQuiltDocumentTypeInteractive)
     throw Failure(ExitCode::Usage, cannot + ": It is no Interactive document and has no page", entry.path);
-  if (!record->string("ThemePath"))
-    throw Failure(ExitCode::Usage, cannot + ": It has no theme; choose one with \"quilt set\"", entry.path);
   return found;
 }
 

@@ -65,6 +65,11 @@ HttpAnswer BridgeFixture::called(const Json& session, const Json& object, const 
       {{"session", session["session"]}, {"object", object["object"]}, {"method", method}, {"arguments", arguments}});
 }
 
+std::string BridgeFixture::codeOf(const HttpAnswer& answer) {
+  const Json json = answer.json();
+  return json.is_object() && json.contains("error") ? json["error"]["code"].get<std::string>() : "";
+}
+
 nlohmann::json BridgeFixture::value(const Json& session, const Json& object, const std::string& method,
                                     const Json& arguments) const {
   const HttpAnswer answer = called(session, object, method, arguments);

@@ -49,6 +49,8 @@ class BridgeFixture : public PackageFixture {
   /// The whole answer of a call; `object` is a reference as answers hold it.
   [[nodiscard]] HttpAnswer called(const Json& session, const Json& object, const std::string& method,
                                   const Json& arguments = Json::array()) const;
+  /// The code of a refusal; empty for any other answer.
+  static std::string codeOf(const HttpAnswer& answer);
   /// The value of a call; fails the test when it is refused.
   [[nodiscard]] Json value(const Json& session, const Json& object, const std::string& method,
                            const Json& arguments = Json::array()) const;

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "quilt/scripting/bridge/MainThreadCalls.h"
 
+#include <utility>
+
 #include "quilt/platform/base/MainThread.h"
 
 namespace quilt::scripting {
@@ -35,7 +37,7 @@ void MainThreadCalls::run(Call& call) {
     if (call.state != State::Waiting || _isEnding) return;
     call.state = State::Running;
   }
-  call.block();
+  std::exchange(call.block, nullptr)();  // what it holds goes before the caller learns that it is done
   {
     const std::lock_guard guard(_mutex);
     call.state = State::Done;

@@ -101,30 +101,6 @@ TEST_F(BridgeChangesThreadTest, ChangesBeforeTheStreamBeginsAreNotLostAndManyAre
   });
 }
 
-TEST_F(BridgeChangesThreadTest, ReadingChangesNothing) {
-  addSource(pictureFile(8, 6));
-  meanwhile([&] {
-    const Json session = opened();
-    const Json document = session["roots"]["document"];
-    const auto readAll = [&] {
-      const Json media = value(session, document, "cvMediaAtIndex:", {0});
-      const Json source = value(session, media, "cvSourceAtIndex:", {0});
-      const Json derivative = value(session, source, "cvMainDerivative");
-      const Json preview = value(session, source, "cvPreviewAtIndex:", {0});
-      for (const Json& object : {document, media, source, derivative, preview})
-        for (const Json& name : session["classes"][object["class"].get<std::string>()])
-          if (name.get<std::string>().back() != ':') (void)value(session, object, name);
-    };
-    readAll();  // makes what is made when it is first asked for
-    Listener listener(*this, session);
-    (void)value(session, document, "cvSetAuthor:", {"Mark"});
-    listener.client.readUntil("cvAuthor");
-    readAll();
-    (void)value(session, document, "cvSetDescription:", {"Mark"});
-    EXPECT_THAT(listener.client.readUntil("cvDescription"), HasSubstr(event(document, {"cvDescription"})));
-  });
-}
-
 TEST_F(BridgeChangesThreadTest, EveryAnswerThatCanChangeHasItsKey) {
   for (const ExposedClass& type : exposedClasses()) {
     std::set<std::string_view> told;
