@@ -36,6 +36,7 @@ struct Prepared {
 
 std::vector<char*> pointers(const std::vector<std::string>& texts) {
   std::vector<char*> list;
+  list.reserve(texts.size() + 1);
   for (const std::string& text : texts) list.push_back(const_cast<char*>(text.c_str()));
   list.push_back(nullptr);
   return list;
