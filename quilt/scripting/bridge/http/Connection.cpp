@@ -28,7 +28,7 @@ constexpr std::string_view kEveryField =
 
 int millisecondsUntil(std::chrono::steady_clock::time_point deadline) {
   const auto left = std::chrono::ceil<std::chrono::milliseconds>(deadline - std::chrono::steady_clock::now()).count();
-  return static_cast<int>(std::clamp<std::int64_t>(left, 0, 3600 * 1000));
+  return static_cast<int>(std::clamp<std::int64_t>(left, 0, 3'600'000));
 }
 
 std::string chunk(std::string_view piece) {
