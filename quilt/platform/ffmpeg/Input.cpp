@@ -108,6 +108,7 @@ Input::~Input() = default;
 Input& Input::operator=(Input&& other) noexcept {
   _context = std::move(other._context);  // before the source that it reads from
   _source = std::move(other._source);
+  _hasStreamInfo = other._hasStreamInfo;
   return *this;
 }
 
@@ -169,6 +170,7 @@ void Input::allow(double seconds) {
 }
 
 Result<void> Input::findStreamInfo() {
+  if (_hasStreamInfo) return {};  // the library reads memory that it has freed when asked a second time
   const unsigned count = _context->nb_streams;
   std::vector<AVDictionary*> options(std::max(count, 1U), nullptr);
   for (AVDictionary*& option : options) {
@@ -179,6 +181,7 @@ Result<void> Input::findStreamInfo() {
   for (AVDictionary*& option : options) av_dict_free(&option);
   if (outOfTime()) return failure(AVERROR_EXIT, path());
   if (code < 0) return failure(code, path());
+  _hasStreamInfo = true;
   return {};
 }
 
