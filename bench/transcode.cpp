@@ -88,8 +88,8 @@ struct Grade {
   Operation operation;
   const char* rivalPreset;
 };
-constexpr Grade kGrades[]{{"HD", kHighDefinition, &FfmpegTranscoder::transcodeToHD, "Fast 720p30"},
-                          {"SD", kStandardDefinition, &FfmpegTranscoder::transcodeToSD, "Fast 480p30"}};
+constexpr Grade kGrades[]{{"HD", kHighDefinitionBox, &FfmpegTranscoder::transcodeToHD, "Fast 720p30"},
+                          {"SD", kStandardDefinitionBox, &FfmpegTranscoder::transcodeToSD, "Fast 480p30"}};
 
 class Bench {
  public:

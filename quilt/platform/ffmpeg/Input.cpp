@@ -22,7 +22,7 @@ namespace {
 
 using SteadyClock = std::chrono::steady_clock;
 
-constexpr int kBufferBytes = 32 * 1024;
+constexpr int kReadBufferBytes = 32 * 1024;
 
 // Containers of sound and pictures only: no playlists (hls, dash, concat), image sequences, subtitles, scripts or
 // devices.
@@ -126,9 +126,9 @@ Result<Input> Input::open(const std::filesystem::path& path, double seconds) {
   if (!S_ISREG(status.st_mode)) return failure(AVERROR_DEMUXER_NOT_FOUND, path);
   source->size = status.st_size;
 
-  auto* buffer = static_cast<unsigned char*>(av_malloc(kBufferBytes));
+  auto* buffer = static_cast<unsigned char*>(av_malloc(kReadBufferBytes));
   if (buffer == nullptr) return failure(AVERROR(ENOMEM), path);
-  source->io = avio_alloc_context(buffer, kBufferBytes, 0, source.get(), &Source::read, nullptr, &Source::seek);
+  source->io = avio_alloc_context(buffer, kReadBufferBytes, 0, source.get(), &Source::read, nullptr, &Source::seek);
   if (source->io == nullptr) {
     av_free(buffer);
     return failure(AVERROR(ENOMEM), path);
