@@ -105,7 +105,8 @@ class QuiltMediaSource : public platform::Object {
   std::size_t previewCount() const;
   /// The preview for the index, made when it is not there yet. Null past the last, and after a warning on failure.
   std::shared_ptr<QuiltMediaPreview> previewAtIndex(std::size_t index);
-  /// Makes every preview, reporting each. False, after a critical line, when the block answers false.
+  /// Makes every preview, reporting each. False, after a critical line, when the block answers false. While an office
+  /// document is converted, for seconds, 0 is reported with a null preview, so that a cancel is heard.
   bool previewWithProgressionBlock(const ObjectProgressionBlock<QuiltMediaPreview>& withProgressionBlock);
   /// Writes the previews that were made since the source was flattened into the package.
   void flattenPreviews();

@@ -8,6 +8,7 @@
 
 #include "quilt/platform/base/Bitmap.h"
 #include "quilt/platform/base/Geometry.h"
+#include "quilt/platform/base/ProgressionBlock.h"
 #include "quilt/platform/base/Result.h"
 
 namespace quilt::platform {
@@ -37,9 +38,10 @@ class DocumentToolkit {
   virtual ~DocumentToolkit() = default;
 
   /// Fails as NotFound without a file, as Damaged for what is no document or has no pages, as Unsupported for what is
-  /// protected by a password or against copying and for kinds that nothing here handles.
-  [[nodiscard]] virtual Result<std::shared_ptr<PagedDocument>> openDocument(
-      const std::filesystem::path& path) const = 0;
+  /// protected by a password or against copying and for kinds that nothing here handles. Where opening may take
+  /// seconds, `goesOn` is asked several times a second, and after its first false the answer is Cancelled.
+  [[nodiscard]] virtual Result<std::shared_ptr<PagedDocument>> openDocument(const std::filesystem::path& path,
+                                                                            const ContinueBlock& goesOn = {}) const = 0;
 };
 
 }  // namespace quilt::platform

@@ -6,6 +6,7 @@
 #include <optional>
 #include <string>
 
+#include "quilt/platform/base/ProgressionBlock.h"
 #include "quilt/platform/base/Url.h"
 #include "quilt/platform/interfaces/ImageWrapper.h"
 
@@ -25,8 +26,12 @@ class Glance {
   /// A picture that stands for the file, or null.
   [[nodiscard]] virtual std::shared_ptr<ImageWrapper> thumbnailImageForURL(const Url& url) const = 0;
   /// Does beforehand what may take long: a document whose pages are asked for on the main thread is prepared on the
-  /// thread that wants them. Asking without it answers the same, later.
-  virtual void prepareDocument(const std::filesystem::path& path) const { (void)path; }
+  /// thread that wants them. Asking without it answers the same, later. `goesOn` is asked several times a second
+  /// where it takes long; after its first false the document stays unprepared.
+  virtual void prepareDocument(const std::filesystem::path& path, const ContinueBlock& goesOn = {}) const {
+    (void)path;
+    (void)goesOn;
+  }
   /// 0 for what is no document, cannot be opened or has no pages.
   [[nodiscard]] virtual std::size_t documentPagesCount(const std::filesystem::path& path) const = 0;
   /// None past the last page.
@@ -36,7 +41,7 @@ class Glance {
 
 /// The installed service's operations.
 std::shared_ptr<ImageWrapper> FDYThumbnailImageForURL(const Url& url);
-void FDYPreviewPrepareDocument(const std::filesystem::path& path);
+void FDYPreviewPrepareDocument(const std::filesystem::path& path, const ContinueBlock& goesOn = {});
 std::size_t FDYPreviewDocumentPagesCount(const std::filesystem::path& path);
 std::optional<DocumentPage> FDYPreviewDocumentPageAtIndex(const std::filesystem::path& path, std::size_t index);
 
