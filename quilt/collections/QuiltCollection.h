@@ -6,6 +6,7 @@
 #include <set>
 
 #include "quilt/documents/QuiltDocument.h"
+#include "quilt/platform/base/Export.h"
 
 namespace quilt {
 
@@ -16,7 +17,7 @@ class QuiltCollectionsController;
 ///
 /// A collection saves itself: setting title, description, author, copyright, keywords, category, advisoryLabel,
 /// preferredTheme or lastPublishURL rewrites "collection.plist" at once, on the setting thread, unless it is loading.
-class QuiltCollection : public platform::Object {
+class QUILT_EXPORT QuiltCollection : public platform::Object {
  public:
   // Construction
   /// A detached collection: fresh identity, made now, no folder.

@@ -2,11 +2,12 @@
 #pragma once
 
 #include "quilt/collections/QuiltCollection.h"
+#include "quilt/platform/base/Export.h"
 
 namespace quilt {
 
 /// The library: the collections found in one library folder. Any thread may call it; the list has a recursive lock.
-class QuiltCollectionsController : public platform::Object {
+class QUILT_EXPORT QuiltCollectionsController : public platform::Object {
  public:
   /// The shared controller, made on first use; lives until the process ends.
   static std::shared_ptr<QuiltCollectionsController> defaultController();

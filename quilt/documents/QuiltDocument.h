@@ -5,6 +5,7 @@
 
 #include "quilt/media/QuiltMedia.h"
 #include "quilt/platform/base/ChildList.h"
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/MainThread.h"
 #include "quilt/platform/base/Property.h"
 #include "quilt/sources/ModelTypes.h"
@@ -32,7 +33,7 @@ inline constexpr const char* kQuiltDocumentPropertiesFilename = "properties.plis
 /// A document saves itself: setting title, description, author, keywords, category, advisoryLabel, jukeboxOrder, theme,
 /// creationDate or lastPublishURL rewrites the properties file at once, on the setting thread, unless the document is
 /// processing. While a long operation or a load runs, isProcessing is true and saving is refused.
-class QuiltDocument : public platform::Object, public ImageBrowserItem, public platform::PasteboardItem {
+class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserItem, public platform::PasteboardItem {
  public:
   // Construction
   static std::shared_ptr<QuiltDocument> init();

@@ -3,6 +3,7 @@
 
 #include "quilt/media/QuiltMediaExtra.h"
 #include "quilt/platform/base/ChildList.h"
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Property.h"
 #include "quilt/sources/ModelTypes.h"
 #include "quilt/sources/QuiltMediaSource.h"
@@ -15,7 +16,7 @@ class QuiltDocument;
 /// One item of a document: a movie, audio, an image, a document file, a web page, a montage of stills or two sources
 /// shown together. Owned by its document; any thread may call it; sources and extras have a recursive lock each, never
 /// held together.
-class QuiltMedia : public platform::Object, public ImageBrowserItem, public platform::PasteboardItem {
+class QUILT_EXPORT QuiltMedia : public platform::Object, public ImageBrowserItem, public platform::PasteboardItem {
  public:
   // Construction
   static std::shared_ptr<QuiltMedia> init();

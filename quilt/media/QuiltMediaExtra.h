@@ -1,12 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/sources/QuiltMediaSource.h"
 
 namespace quilt {
 
 /// A source that accompanies an item (slides, a hand-out). Differs from other sources in its place alone.
-class QuiltMediaExtra : public QuiltMediaSource {
+class QUILT_EXPORT QuiltMediaExtra : public QuiltMediaSource {
  public:
   static std::shared_ptr<QuiltMediaExtra> init();
   static std::shared_ptr<QuiltMediaExtra> initWithURL(const Url& url);

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Property.h"
 #include "quilt/platform/base/RecursiveMonitor.h"
 #include "quilt/sources/ModelTypes.h"
@@ -11,7 +12,7 @@ class QuiltMediaSource;
 
 /// The points of a source's sound, from which a host draws a waveform. Owned by its source; its monitor is the lock of
 /// the source's samples.
-class QuiltMediaAudioSamples : public platform::Object {
+class QUILT_EXPORT QuiltMediaAudioSamples : public platform::Object {
  public:
   /// No identity, nothing set.
   static std::shared_ptr<QuiltMediaAudioSamples> init();

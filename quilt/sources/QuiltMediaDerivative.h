@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Property.h"
 #include "quilt/sources/ModelTypes.h"
 
@@ -15,7 +16,7 @@ inline constexpr const char* kQuiltMediaDerivativeCompatibilityTag480p = "480p";
 
 /// One encoded file, or one web link, of a source in one format. Owned by its source; any thread may call it. Holds no
 /// file open.
-class QuiltMediaDerivative : public platform::Object {
+class QUILT_EXPORT QuiltMediaDerivative : public platform::Object {
  public:
   /// A fresh identity and nothing else.
   static std::shared_ptr<QuiltMediaDerivative> init();

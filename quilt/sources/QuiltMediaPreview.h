@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Property.h"
 #include "quilt/sources/ModelTypes.h"
 
@@ -10,7 +11,7 @@ class QuiltMediaSource;
 
 /// One still of a source: a movie's chapter or poster frame, a document's page, the picture of an image. Owned by its
 /// source; any thread may call it. Holds its image once that was asked for.
-class QuiltMediaPreview : public platform::Object {
+class QUILT_EXPORT QuiltMediaPreview : public platform::Object {
  public:
   static std::shared_ptr<QuiltMediaPreview> init();
   /// A preview of the image fitted into high definition. Null for an absent image.

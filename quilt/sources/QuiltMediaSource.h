@@ -2,6 +2,7 @@
 #pragma once
 
 #include "quilt/platform/base/ChildList.h"
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Property.h"
 #include "quilt/sources/ModelTypes.h"
 #include "quilt/sources/QuiltMediaAudioSamples.h"
@@ -26,7 +27,7 @@ inline constexpr const char* kQuiltMediaContentCategoryDualSource = "DualSource"
 /// One piece of content of a media item: its encoded files (derivatives), its stills (previews), its audio samples.
 /// Owned by the item as a source, an extra or the audio commentary. Any thread may call it; each of the three
 /// collections has its own recursive lock.
-class QuiltMediaSource : public platform::Object {
+class QUILT_EXPORT QuiltMediaSource : public platform::Object {
  public:
   // Construction
   static std::shared_ptr<QuiltMediaSource> init();

@@ -5,6 +5,7 @@
 #include <memory>
 #include <variant>
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Pasteboard.h"
 #include "quilt/sources/ModelTypes.h"
 
@@ -32,7 +33,7 @@ using ImageRepresentation = std::variant<std::monostate, Path, Url, std::shared_
 
 /// An object that an image browser shows as a cell. The two representation operations always agree; they may load or
 /// draw a poster, and so are called where that may take its time.
-class ImageBrowserItem {
+class QUILT_EXPORT ImageBrowserItem {
  public:
   virtual ~ImageBrowserItem() = default;
 

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Property.h"
 #include "quilt/platform/interfaces/Bundles.h"
 #include "quilt/sources/ModelTypes.h"
@@ -12,7 +13,7 @@ inline constexpr const char* kQuiltThemeExtension = "qth";
 
 /// One theme bundle: an HTML template and a preview image. Immutable in practice once made; shared by the documents and
 /// collections that refer to it. Any thread.
-class QuiltTheme : public platform::Object, public ImageBrowserItem {
+class QUILT_EXPORT QuiltTheme : public platform::Object, public ImageBrowserItem {
  public:
   /// Validates the bundle. Null, after one warning, when it is no theme of a supported version.
   static std::shared_ptr<QuiltTheme> initWithPath(const Path& path);

@@ -2,6 +2,7 @@
 #pragma once
 
 #include "quilt/platform/base/ChildList.h"
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/ProgressionBlock.h"
 #include "quilt/themes/QuiltTheme.h"
 
@@ -12,7 +13,7 @@ inline constexpr const char* kQuiltDefaultThemeIdentifier = "org.quilt.theme.oli
 
 /// The installed themes: those of the user, of the system and of the application, in that order. Any thread may call
 /// it; the list has a recursive lock and changes on the main thread.
-class QuiltThemesController : public platform::Object {
+class QUILT_EXPORT QuiltThemesController : public platform::Object {
  public:
   /// The shared controller, made on first use; lives until the process ends.
   static std::shared_ptr<QuiltThemesController> defaultController();

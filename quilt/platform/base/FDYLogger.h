@@ -13,6 +13,7 @@
 #include <vector>
 
 #include "quilt/platform/base/Error.h"
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Url.h"
 
 namespace quilt::platform {
@@ -20,7 +21,7 @@ namespace quilt::platform {
 enum class LogLevel { Critical, Warning, Debug };
 
 /// One argument of a message: an object's text (or a missing object), an integer or a real.
-class LogArgument {
+class QUILT_EXPORT LogArgument {
  public:
   LogArgument(std::nullopt_t) {}                                     // NOLINT(google-explicit-constructor)
   LogArgument(const char* text);                                     // NOLINT(google-explicit-constructor)
@@ -47,17 +48,17 @@ class LogArgument {
 
 /// Fills in the placeholders "%@" (object), "%ld" and "%d" (integer), "%lf" (real, six decimals) and "%%" from left to
 /// right. A placeholder without an argument prints "(null)" or 0; arguments left over are not printed.
-std::string formatMessage(std::string_view format, const std::vector<LogArgument>& arguments);
+QUILT_EXPORT std::string formatMessage(std::string_view format, const std::vector<LogArgument>& arguments);
 
 /// Receives every line. Called on the thread that logs, one line at a time; must not wait for another thread.
-class LogSink {
+class QUILT_EXPORT LogSink {
  public:
   virtual ~LogSink() = default;
   virtual void write(LogLevel level, const std::string& message) = 0;
 };
 
 /// The shared logger. Every operation may be called on any thread.
-class FDYLogger {
+class QUILT_EXPORT FDYLogger {
  public:
   FDYLogger() = delete;
 

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include "quilt/platform/base/Export.h"
+
 namespace quilt::platform {
 
 struct Size {
@@ -20,10 +22,10 @@ struct Rect {
 
 /// The largest size with the aspect ratio of `size` that fits inside `container`; also enlarges.
 /// An empty size gives an empty size.
-Size FDYFitSizeToSize(Size size, Size container);
+QUILT_EXPORT Size FDYFitSizeToSize(Size size, Size container);
 
 /// The largest centred part of an image of `size` that has the aspect ratio of `container`.
 /// An empty size gives an empty rectangle.
-Rect FDYFillSizeToSize(Size size, Size container);
+QUILT_EXPORT Rect FDYFillSizeToSize(Size size, Size container);
 
 }  // namespace quilt::platform

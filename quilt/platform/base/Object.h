@@ -7,6 +7,7 @@
 #include <string_view>
 #include <vector>
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Observation.h"
 
 namespace quilt::platform {
@@ -16,7 +17,7 @@ namespace quilt::platform {
 /// Properties (see Property) may be read and set on any thread. Observers of a key hear of each change, also when the
 /// new value equals the old.
 /// Whoever calls an operation keeps the object alive until it returns; an observer may drop its own hold meanwhile.
-class Object : public std::enable_shared_from_this<Object> {
+class QUILT_EXPORT Object : public std::enable_shared_from_this<Object> {
  public:
   Object() = default;
   Object(const Object&) = delete;

@@ -5,6 +5,8 @@
 #include <memory>
 #include <string_view>
 
+#include "quilt/platform/base/Export.h"
+
 namespace quilt::platform {
 
 class Object;
@@ -31,7 +33,7 @@ using ChangeObserver = std::function<void(const ChangeNotice&)>;
 
 /// An observation that ends with the handle. After reset() or destruction the observer is not running on any other
 /// thread and will not run again; it may end itself from inside its own notice. The observed object may die first.
-class [[nodiscard]] Observation {
+class QUILT_EXPORT [[nodiscard]] Observation {
  public:
   Observation() = default;
   Observation(Observation&&) noexcept = default;

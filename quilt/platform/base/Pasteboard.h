@@ -6,6 +6,7 @@
 #include <utility>
 #include <vector>
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/PropertyList.h"
 
 namespace quilt::platform {
@@ -14,7 +15,7 @@ class PasteboardItem;
 
 /// What is being copied or dragged: property lists by type, in memory. A host carries them over to its toolkit's
 /// clipboard. One thread at a time.
-class Pasteboard {
+class QUILT_EXPORT Pasteboard {
  public:
   void clearContents() { _items.clear(); }
   /// Appends what the object writes of itself, one property list for each of its types.
@@ -36,7 +37,7 @@ inline constexpr unsigned kPasteboardNoOptions = 0;
 inline constexpr unsigned kPasteboardReadingAsString = 1;
 
 /// An object that can be put on a pasteboard.
-class PasteboardItem {
+class QUILT_EXPORT PasteboardItem {
  public:
   virtual ~PasteboardItem() = default;
 

@@ -10,6 +10,7 @@
 #include <vector>
 
 #include "quilt/platform/base/Date.h"
+#include "quilt/platform/base/Export.h"
 
 namespace quilt::platform {
 
@@ -20,7 +21,7 @@ using Data = std::vector<std::uint8_t>;
 
 /// A property-list dictionary that keeps its keys in the order in which they were first set.
 /// Look-up is linear: records have a dozen keys.
-class Dictionary {
+class QUILT_EXPORT Dictionary {
  public:
   using Entry = std::pair<std::string, PropertyList>;
   using const_iterator = std::vector<Entry>::const_iterator;
@@ -69,7 +70,7 @@ class Dictionary {
 
 /// One value of a property list. Booleans, whole numbers and reals are kinds of their own, and stay what they are
 /// through a file.
-class PropertyList {
+class QUILT_EXPORT PropertyList {
  public:
   using Value = std::variant<bool, std::int64_t, double, std::string, Date, Data, Array, Dictionary>;
 
@@ -116,6 +117,6 @@ Dictionary entriesBeyond(const Keys& known, const Dictionary& record) {
 }
 
 /// Appends every entry of `rest` to `record`.
-void appendAll(Dictionary& record, const Dictionary& rest);
+QUILT_EXPORT void appendAll(Dictionary& record, const Dictionary& rest);
 
 }  // namespace quilt::platform

@@ -5,6 +5,7 @@
 #include <cstddef>
 #include <mutex>
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/MainThread.h"
 
 namespace quilt::platform {
@@ -17,7 +18,7 @@ namespace quilt::platform {
 /// - When the main thread has to wait for it, it runs the blocks queued for it meanwhile.
 ///
 /// Meets the standard's Lockable requirements; use it with std::unique_lock.
-class RecursiveMonitor {
+class QUILT_EXPORT RecursiveMonitor {
  public:
   RecursiveMonitor() = default;
   RecursiveMonitor(const RecursiveMonitor&) = delete;

@@ -6,10 +6,12 @@
 #include <string>
 #include <string_view>
 
+#include "quilt/platform/base/Export.h"
+
 namespace quilt::platform {
 
 /// The address of a file or of a web page. A value; never empty.
-class Url {
+class QUILT_EXPORT Url {
  public:
   /// The URL of a local file: "file://" and the absolute path, percent-encoded byte by byte, so that any name survives.
   /// A relative path is taken from the working folder.

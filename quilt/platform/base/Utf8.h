@@ -4,6 +4,8 @@
 #include <cstddef>
 #include <string_view>
 
+#include "quilt/platform/base/Export.h"
+
 namespace quilt::platform {
 
 inline constexpr char32_t kReplacementCharacter = 0xFFFD;
@@ -17,6 +19,6 @@ struct Utf8Character {
 };
 
 /// The first character of a text that is not empty: shortest form only, no surrogates, up to U+10FFFF.
-Utf8Character firstUtf8Character(std::string_view text);
+QUILT_EXPORT Utf8Character firstUtf8Character(std::string_view text);
 
 }  // namespace quilt::platform

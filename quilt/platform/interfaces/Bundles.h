@@ -6,13 +6,14 @@
 #include <string_view>
 #include <vector>
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/PropertyList.h"
 
 namespace quilt::platform {
 
 /// A folder with metadata ("Info.plist") and resources. The metadata lies in the folder or in its "Contents"; resources
 /// lie in "Resources" beside the metadata, else beside the metadata itself.
-class Bundle {
+class QUILT_EXPORT Bundle {
  public:
   virtual ~Bundle() = default;
 
@@ -24,7 +25,7 @@ class Bundle {
 };
 
 /// Opens and finds bundles. Any thread.
-class Bundles {
+class QUILT_EXPORT Bundles {
  public:
   virtual ~Bundles() = default;
 

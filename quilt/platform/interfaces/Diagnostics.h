@@ -4,6 +4,8 @@
 #include <string>
 #include <vector>
 
+#include "quilt/platform/base/Export.h"
+
 namespace quilt::platform {
 
 /// One decoder, encoder, renderer or library, as the program's `doctor` lists it.
@@ -15,7 +17,7 @@ struct Capability {
 };
 
 /// What this build and this machine can do.
-class Diagnostics {
+class QUILT_EXPORT Diagnostics {
  public:
   virtual ~Diagnostics() = default;
   [[nodiscard]] virtual std::vector<Capability> capabilities() const = 0;

@@ -5,6 +5,7 @@
 #include <optional>
 
 #include "quilt/platform/base/Bitmap.h"
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Geometry.h"
 #include "quilt/platform/base/Result.h"
 
@@ -28,7 +29,7 @@ struct Shadow {
 
 /// An offscreen picture in the making: origin at the lower left, y growing upwards, images with their own upper edge
 /// upwards. What lies outside of it is cut off. One thread at a time.
-class Canvas {
+class QUILT_EXPORT Canvas {
  public:
   virtual ~Canvas() = default;
 
@@ -49,7 +50,7 @@ class Canvas {
 };
 
 /// Makes canvases. Any thread.
-class Drawing {
+class QUILT_EXPORT Drawing {
  public:
   virtual ~Drawing() = default;
 

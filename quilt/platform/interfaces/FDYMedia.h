@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Result.h"
 
 namespace quilt::platform {
@@ -35,7 +36,7 @@ struct MediaFacts {
 };
 
 /// The inspection of one kind of file, or of all.
-class MediaInspector {
+class QUILT_EXPORT MediaInspector {
  public:
   virtual ~MediaInspector() = default;
 
@@ -44,7 +45,7 @@ class MediaInspector {
 };
 
 /// One inspected file. Immutable.
-class FDYMedia {
+class QUILT_EXPORT FDYMedia {
  public:
   /// Inspects with the installed service; null when the file cannot be opened as a medium.
   static std::shared_ptr<const FDYMedia> initWithPath(const std::filesystem::path& path);

@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "quilt/platform/base/Date.h"
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Result.h"
 
 namespace quilt::platform {
@@ -46,7 +47,7 @@ using CopyCallback = CopyAnswer (*)(int what, CopyStage stage, const CopyState& 
                                     void* context);
 
 /// An exclusive lock on a file, given up by the destructor or the end of the process.
-class FileLock {
+class QUILT_EXPORT FileLock {
  public:
   virtual ~FileLock() = default;
 
@@ -56,7 +57,7 @@ class FileLock {
 
 /// The file system. Paths are absolute. Every operation may be called on any thread; none leaves a partial result
 /// under a final name. Errors carry the file and a sentence for people.
-class FileManager {
+class QUILT_EXPORT FileManager {
  public:
   virtual ~FileManager() = default;
 

@@ -6,6 +6,7 @@
 #include <optional>
 #include <string>
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Url.h"
 #include "quilt/platform/interfaces/ImageWrapper.h"
 
@@ -18,7 +19,7 @@ struct DocumentPage {
 };
 
 /// The quick-preview service: a picture of any file, and the pages of documents.
-class Glance {
+class QUILT_EXPORT Glance {
  public:
   virtual ~Glance() = default;
 
@@ -35,9 +36,10 @@ class Glance {
 };
 
 /// The installed service's operations.
-std::shared_ptr<ImageWrapper> FDYThumbnailImageForURL(const Url& url);
-void FDYPreviewPrepareDocument(const std::filesystem::path& path);
-std::size_t FDYPreviewDocumentPagesCount(const std::filesystem::path& path);
-std::optional<DocumentPage> FDYPreviewDocumentPageAtIndex(const std::filesystem::path& path, std::size_t index);
+QUILT_EXPORT std::shared_ptr<ImageWrapper> FDYThumbnailImageForURL(const Url& url);
+QUILT_EXPORT void FDYPreviewPrepareDocument(const std::filesystem::path& path);
+QUILT_EXPORT std::size_t FDYPreviewDocumentPagesCount(const std::filesystem::path& path);
+QUILT_EXPORT std::optional<DocumentPage> FDYPreviewDocumentPageAtIndex(const std::filesystem::path& path,
+                                                                       std::size_t index);
 
 }  // namespace quilt::platform

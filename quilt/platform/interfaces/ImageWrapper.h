@@ -6,6 +6,7 @@
 #include <span>
 
 #include "quilt/platform/base/Bitmap.h"
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Geometry.h"
 #include "quilt/platform/base/Result.h"
 #include "quilt/platform/base/Url.h"
@@ -19,7 +20,7 @@ inline constexpr Size kHighDefinition{1280, 720};
 /// An image: immutable, shared, and lazy. One made from a file knows its size from the header and decodes when pixels
 /// are first needed, at no more than the size then needed. Sizes are displayed sizes: the orientation that a camera
 /// recorded is applied. Any thread.
-class ImageWrapper {
+class QUILT_EXPORT ImageWrapper {
  public:
   virtual ~ImageWrapper() = default;
 
@@ -44,7 +45,7 @@ class ImageWrapper {
 };
 
 /// Makes images.
-class Images {
+class QUILT_EXPORT Images {
  public:
   virtual ~Images() = default;
 

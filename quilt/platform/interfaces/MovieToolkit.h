@@ -6,6 +6,7 @@
 #include <optional>
 #include <vector>
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Result.h"
 #include "quilt/platform/interfaces/FDYMedia.h"
 #include "quilt/platform/interfaces/ImageWrapper.h"
@@ -13,7 +14,7 @@
 namespace quilt::platform {
 
 /// One opened movie. Used by one thread at a time. Times are seconds from the start.
-class Movie {
+class QUILT_EXPORT Movie {
  public:
   virtual ~Movie() = default;
 
@@ -32,7 +33,7 @@ class Movie {
 };
 
 /// Opens movies. Any thread.
-class MovieToolkit {
+class QUILT_EXPORT MovieToolkit {
  public:
   virtual ~MovieToolkit() = default;
   [[nodiscard]] virtual Result<std::unique_ptr<Movie>> openMovie(const std::filesystem::path& path) const = 0;

@@ -4,6 +4,7 @@
 #include <memory>
 #include <utility>
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/interfaces/Bundles.h"
 #include "quilt/platform/interfaces/Clock.h"
 #include "quilt/platform/interfaces/DateFormatter.h"
@@ -52,10 +53,10 @@ struct Services {
 };
 
 /// The process's set. Written by installServices and ScopedService only.
-const Services& services();
+QUILT_EXPORT const Services& services();
 
 /// Replaces the whole set. While no other thread uses the library.
-void installServices(Services set);
+QUILT_EXPORT void installServices(Services set);
 
 /// Replaces one service for the life of the object, while no other thread uses the library:
 ///

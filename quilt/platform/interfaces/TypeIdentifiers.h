@@ -7,6 +7,8 @@
 #include <string>
 #include <string_view>
 
+#include "quilt/platform/base/Export.h"
+
 namespace quilt::platform {
 
 /// The type identifiers that the model names. Public ones where one is in general use, else this library's own.
@@ -65,7 +67,7 @@ inline constexpr const char* kHTML = "public.html";
 }  // namespace types
 
 /// Which type a file is of, and how types relate. May be called on any thread.
-class TypeIdentifiers {
+class QUILT_EXPORT TypeIdentifiers {
  public:
   virtual ~TypeIdentifiers() = default;
 
@@ -103,6 +105,6 @@ inline bool isPagedDocument(const TypeIdentifiers& types, std::string_view ident
 }  // namespace types
 
 /// The installed service's preferredIdentifier.
-std::optional<std::string> FDYTypePreferredIdentifier(const std::filesystem::path& path);
+QUILT_EXPORT std::optional<std::string> FDYTypePreferredIdentifier(const std::filesystem::path& path);
 
 }  // namespace quilt::platform

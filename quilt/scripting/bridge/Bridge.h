@@ -7,8 +7,9 @@
 #include <string>
 
 #include "quilt/documents/QuiltDocument.h"
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Result.h"
-#include "quilt/scripting/bridge/http/Server.h"
+#include "quilt/scripting/bridge/http/Limits.h"
 
 namespace quilt::scripting {
 
@@ -18,7 +19,7 @@ namespace quilt::scripting {
 ///
 /// The accessors run on the main thread, so a host keeps its loop turning while a bridge is there. Made and destroyed
 /// on any thread; the end waits for calls under way.
-class Bridge {
+class QUILT_EXPORT Bridge {
  public:
   struct Options {
     std::uint16_t port = 0;  ///< 0: any that is free
