@@ -18,17 +18,7 @@ if(QUILT_SANITIZE)
 endif()
 option(QUILT_INSTALL "Rules for cmake --install" ${install_by_default})
 
-# The headers that others include: all of these folders but the files named, which the folders keep to themselves.
-set(quilt_public_headers_model quilt/quilt.h quilt/version.h)
-foreach(folder platform/base platform/interfaces sources media themes documents collections hosts)
-  file(GLOB found CONFIGURE_DEPENDS RELATIVE ${PROJECT_SOURCE_DIR} ${PROJECT_SOURCE_DIR}/quilt/${folder}/*.h)
-  list(APPEND quilt_public_headers_model ${found})
-endforeach()
-list(APPEND quilt_public_headers_model quilt/scripting/Accessor.h)
-list(REMOVE_ITEM quilt_public_headers_model quilt/platform/base/MonitorWait.h quilt/sources/DocumentSave.h
-     quilt/sources/ModelFiles.h quilt/sources/RecordNames.h quilt/sources/RepeatedReport.h)
-set(quilt_public_headers_platform quilt/platform/install.h)
-set(quilt_public_headers_bridge quilt/scripting/bridge/Bridge.h quilt/scripting/bridge/http/Limits.h)
+include(cmake/PublicHeaders.cmake)
 
 # quilt_installed_library(name OF OBJECTS_OF... [USES OURS...] [LINKS PUBLIC...] [NEEDS PRIVATE...])
 # Makes quilt_NAME_KIND, installed as libquilt-NAME and Quilt::NAME, for each kind asked for and for the alias Quilt::NAME.
@@ -57,7 +47,8 @@ function(quilt_installed_library name)
       endif()
       set_target_properties(${target} PROPERTIES INSTALL_RPATH "$ORIGIN")
     else()
-      target_link_libraries(${target} INTERFACE ${arg_NEEDS})
+      list(TRANSFORM arg_NEEDS REPLACE "(.+)" "$<LINK_ONLY:\\1>" OUTPUT_VARIABLE needed)
+      target_link_libraries(${target} INTERFACE ${needed})
     endif()
     if(NOT QUILT_INSTALL OR NOT kind_made IN_LIST QUILT_LIBRARY_KINDS)
       set_target_properties(${target} PROPERTIES EXCLUDE_FROM_ALL ON)
