@@ -20,23 +20,26 @@ namespace quilt::scripting {
 using Value = std::variant<std::monostate, std::string, std::int64_t, double, std::vector<std::string>,
                            std::shared_ptr<platform::Object>>;
 
+/// What a method takes: nothing, a text or none, or an index.
 enum class Argument { None, Text, Index };
+/// What a method answers; all but a number may be none.
 enum class Answer { Nothing, Text, Number, Texts, Object };
 
 /// One method that a script may call. It writes one debug line and goes through the object's own operation.
 struct Accessor {
-  std::string_view name;  ///< as scripts say it, with a colon when it takes an argument: "cvSetTitle:"
-  Argument argument;
-  Answer answer;
-  std::string_view summary;
-  Value (*perform)(platform::Object& receiver, const Value& argument);
+  std::string_view name;     ///< as scripts say it, with a colon when it takes an argument: "cvSetTitle:"
+  Argument argument;         ///< what it takes
+  Answer answer;             ///< what it answers
+  std::string_view summary;  ///< one sentence for people who write scripts
+  Value (*perform)(platform::Object& receiver,
+                   const Value& argument);  ///< the receiver is of the class; the argument fits
 };
 
 /// One class that scripts may reach.
 struct ExposedClass {
-  std::string_view name;  ///< "QuiltDocument"
-  std::span<const Accessor> accessors;
-  bool (*isInstance)(const platform::Object& object);
+  std::string_view name;                               ///< "QuiltDocument"
+  std::span<const Accessor> accessors;                 ///< every method, in the order of the documentation
+  bool (*isInstance)(const platform::Object& object);  ///< also true for derived classes
 };
 
 /// The six classes.

@@ -11,8 +11,8 @@ namespace quilt {
 
 /// What copyfile_callback needs to turn bytes into a percentage.
 struct CopyContext {
-  std::int32_t total;  ///< bytes
-  ProgressionBlock block;
+  std::int32_t total;      ///< bytes
+  ProgressionBlock block;  ///< hears the percentage
 };
 
 /// The progress callback for FileManager::copyfile; `context` is a CopyContext. Goes on at the start and the finish,

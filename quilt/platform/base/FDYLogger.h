@@ -18,11 +18,15 @@
 
 namespace quilt::platform {
 
+/// How much a line matters, most first.
 enum class LogLevel { Critical, Warning, Debug };
 
 /// One argument of a message: an object's text (or a missing object), an integer or a real.
 class QUILT_EXPORT LogArgument {
  public:
+  /// @{
+  /// Everything that a message may name: a text, a path, a URL or an error by its text, an integer, a real. Null and
+  /// none, and an empty path, are a missing object.
   LogArgument(std::nullopt_t) {}                                     // NOLINT(google-explicit-constructor)
   LogArgument(const char* text);                                     // NOLINT(google-explicit-constructor)
   LogArgument(std::string text) : _value(std::move(text)) {}         // NOLINT(google-explicit-constructor)
@@ -36,11 +40,16 @@ class QUILT_EXPORT LogArgument {
   LogArgument(T value) : _value(static_cast<std::int64_t>(value)) {}  // NOLINT(google-explicit-constructor)
   template <std::floating_point T>
   LogArgument(T value) : _value(static_cast<double>(value)) {}  // NOLINT(google-explicit-constructor)
+  /// @}
 
   /// Text as "%@" prints it; "(null)" for a missing object.
   [[nodiscard]] std::string asObject() const;
+  /// @{
+  /// The number as "%ld" and "%lf" print it: an integer is also a real, a real is cut to an integer; 0 for a text, a
+  /// missing object and what is out of range.
   [[nodiscard]] std::int64_t asInteger() const;
   [[nodiscard]] double asReal() const;
+  /// @}
 
  private:
   std::variant<std::monostate, std::string, std::int64_t, double> _value;
@@ -54,6 +63,7 @@ QUILT_EXPORT std::string formatMessage(std::string_view format, const std::vecto
 class QUILT_EXPORT LogSink {
  public:
   virtual ~LogSink() = default;
+  /// One line, formatted, without a line feed.
   virtual void write(LogLevel level, const std::string& message) = 0;
 };
 
@@ -62,6 +72,9 @@ class QUILT_EXPORT FDYLogger {
  public:
   FDYLogger() = delete;
 
+  /// @{
+  /// Formats the message as formatMessage() does and hands it to every sink, on this thread. Critical: an operation
+  /// failed. Warning: something was refused, is missing or is left out. Debug: what happened, for developers.
   template <class... Arguments>
   static void logCritical(std::string_view format, const Arguments&... arguments) {
     log(LogLevel::Critical, format, {LogArgument(arguments)...});
@@ -74,10 +87,13 @@ class QUILT_EXPORT FDYLogger {
   static void logDebug(std::string_view format, const Arguments&... arguments) {
     log(LogLevel::Debug, format, {LogArgument(arguments)...});
   }
+  /// @}
 
+  /// @{
   /// Adds a sink until removeSink. Without a sink, lines go nowhere.
   static void addSink(std::shared_ptr<LogSink> sink);
   static void removeSink(const std::shared_ptr<LogSink>& sink);
+  /// @}
 
  private:
   static void log(LogLevel level, std::string_view format, const std::vector<LogArgument>& arguments);

@@ -5,19 +5,26 @@
 
 namespace quilt::platform {
 
+/// A width and a height, in the unit of whoever answers them: pixels for images, points for pages.
 struct Size {
+  /// @{
+  /// The two sides; 0 by 0 when nothing was set.
   double width = 0;
   double height = 0;
   bool operator==(const Size&) const = default;
+  /// @}
 };
 
 /// Origin at the lower left, y growing upwards.
 struct Rect {
+  /// @{
+  /// The corner at the lower left, and the sides.
   double x = 0;
   double y = 0;
   double width = 0;
   double height = 0;
   bool operator==(const Rect&) const = default;
+  /// @}
 };
 
 /// The largest size with the aspect ratio of `size` that fits inside `container`; also enlarges.

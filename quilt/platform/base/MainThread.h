@@ -9,6 +9,7 @@ namespace quilt::platform {
 
 /// Who is running: one address for each thread, valid while the thread lives.
 using ThreadIdentity = const void*;
+/// The calling thread's.
 QUILT_EXPORT ThreadIdentity currentThreadIdentity();
 
 /// The main thread and the blocks that other threads have queued for it.
@@ -22,6 +23,7 @@ class QUILT_EXPORT MainThread {
 
   /// Makes the calling thread the main thread. Only while no other thread uses the library.
   static void adopt();
+  /// Whether the caller runs on the main thread.
   static bool isCurrent();
 
   /// Runs the block on the main thread and returns after it has run: at once when called there, otherwise queued.

@@ -28,9 +28,11 @@ class QUILT_EXPORT Object : public std::enable_shared_from_this<Object> {
   Observation observe(std::string_view key, ChangeObserver observer,
                       ObservationOptions options = ObservationOptions::None);
 
+  /// @{
   /// Announces a change of `key`, and of every key that depends on it, to their observers.
   void willChangeValueForKey(std::string_view key) { announce(key, ChangePhase::Will); }
   void didChangeValueForKey(std::string_view key) { announce(key, ChangePhase::Did); }
+  /// @}
 
   /// Whether anyone observes the key or a key that depends on it.
   [[nodiscard]] bool isObserved(std::string_view key) const;
@@ -46,6 +48,7 @@ class QUILT_EXPORT Object : public std::enable_shared_from_this<Object> {
   /// The keys whose values are computed from that of `key`.
   [[nodiscard]] virtual std::vector<std::string_view> keysDependingOn(std::string_view key) const;
 
+  /// A shared pointer to this object, for its own operations to hand on. Not in constructors.
   template <class T>
   [[nodiscard]] std::shared_ptr<T> shared(T* self) {
     return std::static_pointer_cast<T>(self->shared_from_this());

@@ -17,6 +17,7 @@ class PasteboardItem;
 /// clipboard. One thread at a time.
 class QUILT_EXPORT Pasteboard {
  public:
+  /// Forgets what was written.
   void clearContents() { _items.clear(); }
   /// Appends what the object writes of itself, one property list for each of its types.
   void writeObject(const PasteboardItem& object);
@@ -45,6 +46,7 @@ class QUILT_EXPORT PasteboardItem {
   [[nodiscard]] virtual std::vector<std::string> writableTypesForPasteboard(const Pasteboard& pasteboard) const = 0;
   /// kPasteboardNoOptions, or flags.
   [[nodiscard]] virtual unsigned writingOptionsForType(const std::string& type, const Pasteboard& pasteboard) const = 0;
+  /// What the object is under one of its writable types.
   [[nodiscard]] virtual PropertyList pasteboardPropertyListForType(const std::string& type) const = 0;
 };
 

@@ -24,9 +24,13 @@ class QUILT_EXPORT RecursiveMonitor {
   RecursiveMonitor(const RecursiveMonitor&) = delete;
   RecursiveMonitor& operator=(const RecursiveMonitor&) = delete;
 
+  /// @{
+  /// Enters, waiting as long as it takes; enters when that is possible at once, and answers whether; leaves, once for
+  /// each time entered.
   void lock();
   bool try_lock();
   void unlock();
+  /// @}
 
  private:
   bool enterIfPossible();
@@ -38,6 +42,7 @@ class QUILT_EXPORT RecursiveMonitor {
   bool _mainThreadWaits = false;
 };
 
+/// Holds a monitor for its own life.
 using MonitorLock = std::unique_lock<RecursiveMonitor>;
 
 }  // namespace quilt::platform

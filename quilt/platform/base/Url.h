@@ -21,12 +21,15 @@ class QUILT_EXPORT Url {
   /// names another host or holds an encoded NUL.
   static std::optional<Url> parse(std::string_view text);
 
+  /// Whether it is the URL of a local file.
   [[nodiscard]] bool isFileUrl() const { return _isFile; }
+  /// The URL as text, percent-encoded as it was given or made.
   [[nodiscard]] const std::string& absoluteString() const { return _text; }
 
   /// The path part, percent-decoded: for a file URL the file's path.
   [[nodiscard]] std::filesystem::path relativePath() const;
 
+  /// Equal when their texts are.
   bool operator==(const Url&) const = default;
 
  private:

@@ -17,6 +17,7 @@ class QUILT_EXPORT Bundle {
  public:
   virtual ~Bundle() = default;
 
+  /// The folder that was opened.
   [[nodiscard]] virtual const std::filesystem::path& path() const = 0;
   /// A metadata value, read from disk by each call. None when the file cannot be read or lacks the key.
   [[nodiscard]] virtual std::optional<PropertyList> infoDictionaryNoCacheValueForKey(std::string_view key) const = 0;
@@ -40,9 +41,11 @@ class QUILT_EXPORT Bundles {
       std::string_view withSearchPath, std::string_view andExtension, bool includingApplicationBundle) const = 0;
 };
 
+/// @{
 /// The metadata keys of a bundle.
 inline constexpr const char* kBundleIdentifierKey = "CFBundleIdentifier";
 inline constexpr const char* kBundleDisplayNameKey = "CFBundleDisplayName";
 inline constexpr const char* kBundleShortVersionKey = "CFBundleShortVersionString";
+/// @}
 
 }  // namespace quilt::platform

@@ -10,6 +10,7 @@ namespace quilt::platform {
 class QUILT_EXPORT Clock {
  public:
   virtual ~Clock() = default;
+  /// The present.
   [[nodiscard]] virtual Date now() const = 0;
 };
 

@@ -13,18 +13,22 @@ namespace quilt::platform {
 
 /// sRGB, each part from 0 to 1.
 struct Color {
+  /// @{
+  /// From 0 to 1; alpha 1 is opaque.
   double red = 0;
   double green = 0;
   double blue = 0;
   double alpha = 1;
+  /// @}
 };
 
+/// Opaque black.
 inline constexpr Color kBlack{0, 0, 0, 1};
 
 /// A shadow that falls straight down: no offset, only blur.
 struct Shadow {
   double blurRadius = 0;  ///< pixels; a Gaussian of half this deviation
-  Color color;
+  Color color;            ///< with the alpha of its darkest place
 };
 
 /// An offscreen picture in the making: origin at the lower left, y growing upwards, images with their own upper edge
@@ -33,6 +37,7 @@ class QUILT_EXPORT Canvas {
  public:
   virtual ~Canvas() = default;
 
+  /// Lays the colour over the whole canvas.
   virtual void fill(Color color) = 0;
   /// Draws the part `from` of the image, in its pixels with the origin at its lower left, over what is there into `to`,
   /// scaled with high quality; its shadow first. With a corner radius the image is cut to a rounded `to`.

@@ -14,8 +14,8 @@ namespace quilt::platform {
 
 /// A page of a document: its picture and its text in reading order.
 struct DocumentPage {
-  std::shared_ptr<ImageWrapper> image;
-  std::string text;
+  std::shared_ptr<ImageWrapper> image;  ///< never null in an answer
+  std::string text;                     ///< UTF-8; empty for a page of pictures and when it cannot be read
 };
 
 /// The quick-preview service: a picture of any file, and the pages of documents.
@@ -30,16 +30,18 @@ class QUILT_EXPORT Glance {
   virtual void prepareDocument(const std::filesystem::path& path) const { (void)path; }
   /// 0 for what is no document, cannot be opened or has no pages.
   [[nodiscard]] virtual std::size_t documentPagesCount(const std::filesystem::path& path) const = 0;
-  /// None past the last page.
+  /// None past the last page, and for a page that cannot be drawn.
   [[nodiscard]] virtual std::optional<DocumentPage> documentPageAtIndex(const std::filesystem::path& path,
                                                                         std::size_t index) const = 0;
 };
 
+/// @{
 /// The installed service's operations.
 QUILT_EXPORT std::shared_ptr<ImageWrapper> FDYThumbnailImageForURL(const Url& url);
 QUILT_EXPORT void FDYPreviewPrepareDocument(const std::filesystem::path& path);
 QUILT_EXPORT std::size_t FDYPreviewDocumentPagesCount(const std::filesystem::path& path);
 QUILT_EXPORT std::optional<DocumentPage> FDYPreviewDocumentPageAtIndex(const std::filesystem::path& path,
                                                                        std::size_t index);
+/// @}
 
 }  // namespace quilt::platform

@@ -13,6 +13,8 @@ namespace quilt::platform {
 
 /// The type identifiers that the model names. Public ones where one is in general use, else this library's own.
 namespace types {
+/// @{
+/// The families: what every item is, web addresses and folders, and the kinds of media.
 inline constexpr const char* kItem = "public.item";
 inline constexpr const char* kURL = "public.url";
 inline constexpr const char* kFolder = "public.folder";
@@ -21,7 +23,10 @@ inline constexpr const char* kMovie = "public.movie";
 inline constexpr const char* kVideo = "public.video";
 inline constexpr const char* kAudio = "public.audio";
 inline constexpr const char* kImage = "public.image";
+/// @}
 
+/// @{
+/// Sound.
 inline constexpr const char* kAIFF = "public.aiff-audio";
 inline constexpr const char* kAIFC = "public.aifc-audio";
 inline constexpr const char* kM4A = "org.quilt.m4a-audio";
@@ -29,7 +34,10 @@ inline constexpr const char* kMP3 = "public.mp3";
 inline constexpr const char* kMPEG4Audio = "public.mpeg-4-audio";
 inline constexpr const char* kProtectedMPEG4Audio = "org.quilt.protected-mpeg-4-audio";
 inline constexpr const char* kWAV = "org.quilt.waveform-audio";
+/// @}
 
+/// @{
+/// Movies.
 inline constexpr const char* kMovieContainer = "org.quilt.movie-container";
 inline constexpr const char* kMPEG4 = "public.mpeg-4";
 inline constexpr const char* kMPEG = "public.mpeg";
@@ -39,7 +47,10 @@ inline constexpr const char* k3GPP = "public.3gpp";
 inline constexpr const char* kAVI = "public.avi";
 inline constexpr const char* kMatroska = "org.matroska.mkv";
 inline constexpr const char* kWebM = "org.webmproject.webm";
+/// @}
 
+/// @{
+/// Images.
 inline constexpr const char* kJPEG = "public.jpeg";
 inline constexpr const char* kJPEG2000 = "public.jpeg-2000";
 inline constexpr const char* kTIFF = "public.tiff";
@@ -49,9 +60,12 @@ inline constexpr const char* kICNS = "org.quilt.icon-file";
 inline constexpr const char* kBMP = "com.microsoft.bmp";
 inline constexpr const char* kHEIC = "public.heic";
 inline constexpr const char* kSVG = "public.svg-image";
+/// @}
 
+/// @{
+/// Documents and texts.
 inline constexpr const char* kPDF = "com.adobe.pdf";
-inline constexpr const char* kEPUB = "org.quilt.epub";  // the platform's own identifier
+inline constexpr const char* kEPUB = "org.quilt.epub";  // this library's own, beside the public one
 inline constexpr const char* kEPUBContainer = "org.idpf.epub-container";
 inline constexpr const char* kTextDocument = "org.oasis-open.opendocument.text";
 inline constexpr const char* kFlatTextDocument = "org.oasis-open.opendocument.text-flat-xml";
@@ -64,6 +78,7 @@ inline constexpr const char* kPowerPointPpt = "com.microsoft.powerpoint.ppt";
 inline constexpr const char* kPowerPointOpenXML = "org.openxmlformats.presentationml.presentation";
 inline constexpr const char* kText = "public.plain-text";
 inline constexpr const char* kHTML = "public.html";
+/// @}
 }  // namespace types
 
 /// Which type a file is of, and how types relate. May be called on any thread.
