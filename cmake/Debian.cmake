@@ -22,32 +22,32 @@ set(CPACK_DEBIAN_PROGRAM_PACKAGE_DEPENDS "${library} (= ${version})")
 set(CPACK_DEBIAN_PROGRAM_PACKAGE_RECOMMENDS xdg-utils)
 set(CPACK_DEBIAN_PROGRAM_PACKAGE_CONFLICTS quilt)
 set(CPACK_COMPONENT_PROGRAM_DESCRIPTION "makes interactive media packages
- Movies, audio, images, PDF, EPUB and office documents, web links and lectures
- become packages that stand alone and open offline in any browser.
- This is the program, with its themes.")
+Movies, audio, images, PDF, EPUB and office documents, web links and lectures
+become packages that stand alone and open offline in any browser.
+This is the program, with its themes.")
 
 set(CPACK_DEBIAN_LIBRARY_PACKAGE_NAME ${library})
 set(CPACK_DEBIAN_LIBRARY_PACKAGE_SECTION libs)
 set(CPACK_DEBIAN_LIBRARY_PACKAGE_RECOMMENDS "quilt-media (= ${version})")
 set(CPACK_DEBIAN_LIBRARY_PACKAGE_SUGGESTS "libreoffice-writer-nogui | libreoffice-writer, libreoffice-impress-nogui | libreoffice-impress")
-set(CPACK_DEBIAN_LIBRARY_PACKAGE_GENERATE_SHLIBS ON)
-set(CPACK_DEBIAN_LIBRARY_PACKAGE_GENERATE_SHLIBS_POLICY "=")
 set(CPACK_COMPONENT_LIBRARY_DESCRIPTION "library for interactive media packages
- The document model, the services behind it and the bridge to browsers, for
- desktop applications that make interactive media packages.
- LibreOffice, where it is installed, shows office documents.")
+The document model, the services behind it and the bridge to browsers, for
+desktop applications that make interactive media packages.
+LibreOffice, where it is installed, shows office documents.")
 
 set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_NAME libquilt-dev)
 set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_SECTION libdevel)
 set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_DEPENDS "${library} (= ${version})")
 set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_SUGGESTS "libavformat-dev, libavfilter-dev, libvips-dev, libcairo2-dev, libzip-dev, libmupdf-dev, libpugixml-dev, libicu-dev")
 set(CPACK_COMPONENT_DEVELOPMENT_DESCRIPTION "library for interactive media packages (development files)
- Headers, archives and the files for CMake and pkg-config. Linking the
- archives, instead of the shared libraries, needs the suggested packages.")
+Headers, archives and the files for CMake and pkg-config. Linking the
+archives, instead of the shared libraries, needs the suggested packages.")
 
 # Depends comes from what the programs are linked with; our own libraries are in no installed package yet.
 set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS ON)
 set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_SHLIBDEPS OFF)
+set(CPACK_DEBIAN_PACKAGE_GENERATE_SHLIBS ON)
+set(CPACK_DEBIAN_PACKAGE_GENERATE_SHLIBS_POLICY "=")
 set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS_PRIVATE_DIRS ${PROJECT_BINARY_DIR})
 
 # What Debian asks of every package: its licences, its history, and manual pages that are packed.

@@ -72,7 +72,9 @@ quilt_pkg_config(quilt "interactive media packages: the model and its platform" 
 
 # The program, with what it finds beside itself.
 set(CMAKE_INSTALL_DEFAULT_COMPONENT_NAME program)
-install(FILES LICENSE DESTINATION ${CMAKE_INSTALL_DATADIR}/doc/quilt)
+if(NOT QUILT_DEBIAN)  # which has the licence itself
+  install(FILES LICENSE DESTINATION ${CMAKE_INSTALL_DATADIR}/doc/quilt)
+endif()
 install(DIRECTORY quilt/resources/themes/ DESTINATION ${CMAKE_INSTALL_DATADIR}/quilt/Themes)
 install(FILES schema/manifest.schema.json DESTINATION ${CMAKE_INSTALL_DATADIR}/quilt/schema)
 if(QUILT_BUILD_CLI)

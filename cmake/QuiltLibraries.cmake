@@ -32,6 +32,7 @@ function(quilt_installed_library name)
     string(TOUPPER ${kind_made} library_type)
     add_library(${target} ${library_type} ${objects})
     target_compile_features(${target} INTERFACE cxx_std_20)
+    quilt_sanitize(${target})
     list(TRANSFORM quilt_public_headers_${name} PREPEND ${PROJECT_SOURCE_DIR}/ OUTPUT_VARIABLE headers)
     target_sources(${target} PUBLIC FILE_SET HEADERS BASE_DIRS ${PROJECT_SOURCE_DIR} FILES ${headers})
     set_target_properties(${target} PROPERTIES LINKER_LANGUAGE CXX OUTPUT_NAME quilt-${name} EXPORT_NAME ${name}
