@@ -7,6 +7,7 @@
 #include <string>
 
 #include "quilt/platform/base/Bitmap.h"
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Geometry.h"
 #include "quilt/platform/base/ProgressionBlock.h"
 #include "quilt/platform/base/Result.h"
@@ -16,7 +17,7 @@ namespace quilt::platform {
 /// One opened document. Any thread; calls on one document wait for each other. Pages are counted from 0. Each call
 /// fails when the page does not exist (NotFound) or cannot be made sense of (Damaged), and then leaves the document as
 /// it was.
-class PagedDocument {
+class QUILT_EXPORT PagedDocument {
  public:
   virtual ~PagedDocument() = default;
 
@@ -33,7 +34,7 @@ class PagedDocument {
 };
 
 /// Opens documents. Any thread.
-class DocumentToolkit {
+class QUILT_EXPORT DocumentToolkit {
  public:
   virtual ~DocumentToolkit() = default;
 

@@ -8,6 +8,7 @@
 #include "quilt/scripting/bridge/Page.h"
 #include "quilt/scripting/bridge/Secret.h"
 #include "quilt/scripting/bridge/http/Files.h"
+#include "quilt/scripting/bridge/http/Server.h"
 
 namespace quilt::scripting {
 
@@ -21,7 +22,7 @@ constexpr std::string_view kScript = "conveyor.js";
 http::Response missing() { return http::plain(404, "There is nothing here.\n"); }
 
 http::Response script() {
-  for (const auto& file : resources::embeddedFiles())
+  for (const auto& file : resources::embeddedScripts())
     if (file.path == "scripting/conveyor.js")
       return {200,
               {{"Content-Type", "text/javascript; charset=utf-8"}, {"Cache-Control", "no-cache"}},
