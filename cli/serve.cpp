@@ -100,6 +100,9 @@ void ActingDelegate::perform(const ServeRequest& request) {
     _context.messages.warning("There is no \"xdg-open\" to open the address with; open it in a browser");
   _context.messages.note("Serving " + nameOf(*found.document) + " until Ctrl-C");
   waitForInterrupt();
+  if (!(*bridge)->settle())
+    throw explain("The last edits of the document " + nameOf(*found.document) + " cannot be saved", _context.log,
+                  document->propertiesPath(), document->path());
   throw Interrupt::failure("Every edit is saved");
 }
 

@@ -146,7 +146,7 @@ export interface QuiltMediaSource {
   cvSetTitle(text: string | null): Promise<null>;
   /** Its description. */
   cvDescription(): Promise<string | null>;
-  /** Changes the description. */
+  /** Changes the description, until the record is read again: it keeps the title instead. */
   cvSetDescription(text: string | null): Promise<null>;
   /** Seconds from the start of its item; 0 when it has no time code. */
   cvTimeCode(): Promise<number>;
