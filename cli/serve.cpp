@@ -103,7 +103,8 @@ void ActingDelegate::perform(const ServeRequest& request) {
   if (!(*bridge)->settle())
     throw explain("The last edits of the document " + nameOf(*found.document) + " cannot be saved", _context.log,
                   document->propertiesPath(), document->path());
-  throw Interrupt::failure("Every edit is saved");
+  _context.messages.note("Stopped. Every edit is saved");
+  throw Failure(Interrupt::exitCode(), "");  // which is how serving ends, and no mishap
 }
 
 void PreviewDelegate::perform(const ServeRequest& request) {

@@ -37,7 +37,7 @@
     const isLong = kind === 'description', names = kNames[kind];
     const pencil = make('button', {type: 'button', class: 'pencil', onclick: () => open()});
     const mark = make('span', {class: 'saved-mark', 'aria-hidden': 'true', hidden: true}, Olive.icon('check'), make('span', {text: say('saved')}));
-    const element = make('div', {class: 'editable ' + kind});
+    const element = make('div', {class: 'editable of-' + kind});
     let editor = null, timer = 0;
 
     function show() {
