@@ -14,9 +14,9 @@
   const editors = new Set();  // those that are open
   let last = 0;
 
-  // The record cannot hold other control characters, and one line is one line.
+  // The record cannot hold other control characters nor halves of characters, and one line is one line.
   function tidy(text, isLong) {
-    const clean = text.replace(/[\u0000-\u0008\u000b\u000c\u000e-\u001f\ufffe\uffff]/g, '');
+    const clean = text.replace(/[\u0000-\u0008\u000b\u000c\u000e-\u001f\ufffe\uffff]|\p{Surrogate}/gu, '');
     return isLong ? clean.trimEnd() : clean.replace(/\s*\n\s*/g, ' ').trim();
   }
 
@@ -90,7 +90,7 @@
       const button = (label, kindOf, act) => make('button', {type: 'button', class: kindOf, text: say(label), onclick: act, onpointerdown: (event) => event.preventDefault()});
       const element = make('div', {class: 'editor', role: 'group', 'aria-label': say(names.edit)}, field,
         make('div', {class: 'edit-tools'}, make('span', {class: 'edit-hint', id: id + '-hint', text: say(isLong ? 'editHintLong' : 'editHint')}),
-             button('revert', 'quiet', () => revert()), button('save', 'primary', () => commit())),
+             make('span', {class: 'edit-buttons'}, button('revert', 'quiet', () => revert()), button('save', 'primary', () => commit()))),
         news, problem);
       let saving = false, seen = before, width = 0;
       field.value = before;

@@ -211,10 +211,10 @@
     }
 
     function showExtras(item) {
+      const left = new Set(Olive.partsOf(item).map((part) => part.id));
+      for (const row of document.querySelectorAll('.extras > li, .part')) if (!left.has(row.dataset.id) && !row.querySelector('.editor')) row.remove();
       const list = document.querySelector('.extras');
-      if (!list) return;
-      for (const row of [...list.children]) if (!item.extras.some((extra) => extra.id === row.dataset.id)) row.remove();
-      if (!list.children.length) list.parentNode.remove();
+      if (list && !list.children.length) list.parentNode.remove();
     }
 
     function showNotice(words, ...actions) {
@@ -290,7 +290,7 @@
       const fill = () => list.replaceChildren(...Olive.partsOf(item).map((part) => {
         const of = part === item.commentary ? say('commentary') : Olive.titleOfPart(part);
         const title = make('p', {class: 'row-title', dir: 'auto', 'data-title-of': part.id, text: Olive.titleOfPart(part)});
-        const row = make('li', {class: 'part'}, Olive.icon(part === item.commentary ? 'voice' : part.category || 'warning'), title);
+        const row = make('li', {class: 'part', 'data-id': part.id}, Olive.icon(part === item.commentary ? 'voice' : part.category || 'warning'), title);
         editable(title, part, 'title', {of});
         return row;
       }));
