@@ -27,7 +27,6 @@ using platform::Error;
 using platform::ErrorKind;
 
 constexpr int kTickMilliseconds = 500;
-constexpr std::chrono::milliseconds kTimeToShowToken{50};
 
 Error errorOf(int number, const std::string& what) {
   ErrorKind kind = ErrorKind::InputOutput;
@@ -84,7 +83,6 @@ class Server::Implementation {
     Descriptor socket;
     std::atomic<bool> passedDoor{false};
     std::atomic<bool> isDone{false};
-    std::chrono::steady_clock::time_point came = std::chrono::steady_clock::now();
     std::thread thread{};
   };
 
@@ -94,19 +92,8 @@ class Server::Implementation {
       if (poll(watched, 2, kTickMilliseconds) < 0) watched[0].revents = watched[1].revents = 0;
       removeDone();
       if (_rooms.tick) _rooms.tick();
-      if (watched[1].revents != 0 && !isFullOfNewcomers()) admit();
+      if (watched[1].revents != 0) admit();
     }
-  }
-
-  // Whether all places are taken and somebody has not had the time to show the token: whoever waits outside waits a
-  // little longer, or those who belong here could be shown out before they have said a word.
-  bool isFullOfNewcomers() {
-    if (_clients.size() < _limits.connections) return false;
-    const auto stranger = oldestStranger();
-    if (stranger == _clients.end() || std::chrono::steady_clock::now() - stranger->came > kTimeToShowToken)
-      return false;
-    std::this_thread::sleep_for(std::chrono::milliseconds(2));
-    return true;
   }
 
   void admit() {
@@ -145,16 +132,13 @@ class Server::Implementation {
 
   // Ends the oldest connection that has shown nothing yet, so that strangers cannot crowd out those who belong here.
   bool evictStranger() {
-    const auto stranger = oldestStranger();
+    const auto stranger =
+        std::find_if(_clients.begin(), _clients.end(), [](const Client& client) { return !client.passedDoor; });
     if (stranger == _clients.end()) return false;
     ::shutdown(stranger->socket.number(), SHUT_RDWR);
     stranger->thread.join();
     _clients.erase(stranger);
     return true;
-  }
-
-  std::list<Client>::iterator oldestStranger() {
-    return std::find_if(_clients.begin(), _clients.end(), [](const Client& client) { return !client.passedDoor; });
   }
 
   void removeDone() {
