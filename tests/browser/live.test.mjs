@@ -305,6 +305,18 @@ describe('a served document', {skip: whyNoProgram}, () => {
     await edit(page, kTitle, 'From Tree to Table');
   }, {quiet: false}));
 
+  test('finds its way back when the program has let go of the page', () => visit(async (page) => {
+    await page.evaluate(() => window.conveyor.close());
+    await edit(page, kTitle, 'After a sleep');  // at once, with objects that are no more
+    assert.equal(served.record.Title, 'After a sleep');
+    await page.evaluate(() => window.conveyor.close());
+    await model.cvSetTitle('Changed meanwhile');
+    await shows(page, '.hero h1', 'Changed meanwhile');
+    await model.cvSetTitle('From Tree to Table');
+    await shows(page, '.hero h1', 'From Tree to Table');
+    assert.equal(await page.locator('.live-notice').count(), 0);
+  }, {quiet: false}));
+
   test('is edited by the keyboard alone', () => visit(async (page) => {
     const name = () => page.evaluate(() => document.activeElement.getAttribute('aria-label') || document.activeElement.textContent);
     const tabTo = async (label, limit = 40) => {

@@ -20,6 +20,7 @@ std::optional<platform::FileIdentity> recordOf(const QuiltDocument& document) {
 
 EditKeeper::EditKeeper(std::shared_ptr<QuiltDocument> document)
     : _document(std::move(document)), _saves(_document->observe("modifiedDate", [this](const platform::ChangeNotice&) {
+        if (_editor.load() == std::this_thread::get_id()) _hasSaved = true;
         _lastEdit = Clock::now();
         _isPageOld = true;
         _wantsSettling = true;
@@ -27,8 +28,13 @@ EditKeeper::EditKeeper(std::shared_ptr<QuiltDocument> document)
 
 bool EditKeeper::keep(const std::function<bool()>& edit) {
   const auto before = recordOf(*_document);
-  if (!edit()) return true;
-  if (recordOf(*_document) != before) return true;  // by the model itself
+  _hasSaved = false;
+  _editor = std::this_thread::get_id();
+  const bool hasEdited = edit();
+  _editor = std::thread::id();
+  if (!hasEdited) return true;
+  // By the model itself. A save of another thread may have read the document before the edit.
+  if (_hasSaved && recordOf(*_document) != before) return true;
   _isUnsaved = true;
   return save();
 }

@@ -5,6 +5,7 @@
 #include <chrono>
 #include <functional>
 #include <memory>
+#include <thread>
 
 #include "quilt/documents/QuiltDocument.h"
 
@@ -36,6 +37,8 @@ class EditKeeper {
   bool save();
 
   const std::shared_ptr<QuiltDocument> _document;
+  std::atomic<std::thread::id> _editor{};  // the thread of an edit under way
+  bool _hasSaved = false;                  // whether that edit has made the document save; that thread's own
   std::atomic<bool> _isUnsaved{false};
   std::atomic<bool> _isPageOld{false};
   std::atomic<bool> _wantsSettling{false};
