@@ -101,8 +101,9 @@ void ActingDelegate::perform(const ServeRequest& request) {
   _context.messages.note("Serving " + inQuotes(found.document->title, found.document->uuid) + " until Ctrl-C");
   waitForInterrupt();
   if (!(*bridge)->settle())
-    throw explain("The last edits of the document " + nameOf(*found.document) + " cannot be saved", _context.log,
-                  document->propertiesPath(), document->path());
+    throw explain(
+        "The last edits of the document " + inQuotes(found.document->title, found.document->uuid) + " cannot be saved",
+        _context.log, document->propertiesPath(), document->path());
   _context.messages.note("Stopped. Every edit is saved");
   throw Failure(Interrupt::exitCode(), "");  // which is how serving ends, and no mishap
 }

@@ -515,6 +515,18 @@ describe('a served document of one item', {skip: whyNoProgram}, () => {
   });
   after(() => served && served.stop());
 
+  test('says at the end what could not be saved', async () => {
+    const model = await served.client(), record = join(served.package, 'properties.plist'), kept = readFileSync(record);
+    rmSync(record);
+    mkdirSync(record);
+    await assert.rejects(model.cvSetTitle('Lost'), {code: 'not-saved'});
+    assert.notEqual(await served.stop(), 130);
+    assert.match(served.errors, /The last edits of the document "Alone" cannot be saved/);
+    rmSync(record, {recursive: true, force: true});
+    writeFileSync(record, kept);
+    await served.start();
+  });
+
   test('is edited beside its item', () => shared.visit(null, async (page) => {
     await until(page, isLive);
     await edit(page, '.package-texts .of-title', 'By itself');
