@@ -175,7 +175,7 @@ TEST_F(BridgeHostileThreadTest, ThoseWhoBelongHereComeInWhileStrangersKeepComing
       while (!isDone) {
         here.emplace_back(port());
         if (here.size() > 20) here.pop_front();
-        std::this_thread::sleep_for(1ms);
+        std::this_thread::sleep_for(10ms);
       }
     });
   for (int i = 0; i < 20; ++i) expectService();
