@@ -298,6 +298,8 @@ describe('a served document', {skip: whyNoProgram}, () => {
       await page.waitForSelector('.edit-problem:not(:empty)');
       assert.match(await page.textContent('.edit-problem'), /cannot be written to disk/);
       assert.equal(await page.inputValue(`${kTitle} textarea`), 'Unwritten');
+      await shows(page, '.brand span', 'Unwritten');
+      assert.equal(await page.textContent('.edit-news'), '', 'nobody else changed it');
     });
     await page.click(`${kTitle} .primary`);
     await page.waitForSelector('textarea', {state: 'detached'});

@@ -178,6 +178,8 @@
         meanwhile() {
           if (saving || text.value === seen) return;
           seen = text.value;
+          news.replaceChildren();
+          if (seen === wanted()) return;  // what is typed here, though it may not be on disk yet
           const take = button('takeTheirs', 'quiet', () => {
             field.value = seen;
             news.replaceChildren();
