@@ -31,7 +31,8 @@ class QUILT_EXPORT Bridge {
     std::size_t objectsPerSession = 50000;          ///< that a client holds; more are refused
   };
 
-  /// Serves the document's package folder as it is, and as long as the bridge lives. Fails when the port is taken.
+  /// Serves the document's package folder as it is, and as long as the bridge lives; only the data that its page reads
+  /// follows the model. Fails when the port is taken.
   static platform::Result<std::unique_ptr<Bridge>> serve(const std::shared_ptr<QuiltDocument>& document,
                                                          const Options& options);
   Bridge(const Bridge&) = delete;
@@ -45,6 +46,10 @@ class QUILT_EXPORT Bridge {
   [[nodiscard]] std::uint16_t port() const;
   /// Sessions that are open now.
   [[nodiscard]] std::size_t sessionCount() const;
+
+  /// Main thread: saves what a failure left unsaved, and has the package's data on disk say what the document says;
+  /// both happen by themselves too, soon after an edit and at the end. False when the record cannot be written.
+  bool settle();
 
  private:
   class Implementation;
