@@ -1,10 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <QAbstractEventDispatcher>
 #include <QCoreApplication>
 #include <QEvent>
 #include <QEventLoop>
 #include <QObject>
+#include <atomic>
 #include <memory>
 
 #include "quilt/hosts/ToolkitLoop.h"
@@ -38,22 +40,36 @@ class QtMainLoop {
  private:
   class Receiver final : public QObject {
    public:
-    explicit Receiver(std::mutex& posting) : _posting(posting) {}
+    explicit Receiver(std::mutex& posting) : _posting(posting) {
+      // Qt's dispatcher over GLib lets a nested loop sleep although events are posted: those that came before the one
+      // whose handler opened the nested loop.
+      QAbstractEventDispatcher* const dispatcher = QAbstractEventDispatcher::instance();
+      connect(dispatcher, &QAbstractEventDispatcher::aboutToBlock, this, [this, dispatcher] {
+        if (_posted > 0) dispatcher->wakeUp();
+      });
+    }
 
-    static QEvent::Type wakeEvent() {
-      static const int type = QEvent::registerEventType();
-      return static_cast<QEvent::Type>(type);
+    void post() {
+      ++_posted;
+      QCoreApplication::postEvent(this, new QEvent(wakeEvent()));
     }
 
     bool event(QEvent* event) override {
       { const std::lock_guard orderedAfterPosting(_posting); }  // in words that every checker of threads understands
       if (event->type() != wakeEvent()) return QObject::event(event);
+      --_posted;
       platform::MainThread::runQueuedBlocks();
       return true;
     }
 
    private:
+    static QEvent::Type wakeEvent() {
+      static const int type = QEvent::registerEventType();
+      return static_cast<QEvent::Type>(type);
+    }
+
     std::mutex& _posting;
+    std::atomic<int> _posted = 0;
   };
 
   class Loop final : public ToolkitLoop {
@@ -61,7 +77,7 @@ class QtMainLoop {
     Loop() : _receiver(std::make_unique<Receiver>(mutex())) {}
 
    private:
-    void post() override { QCoreApplication::postEvent(_receiver.get(), new QEvent(Receiver::wakeEvent())); }
+    void post() override { _receiver->post(); }
     void turn() override { QCoreApplication::processEvents(QEventLoop::AllEvents | QEventLoop::WaitForMoreEvents); }
     void detach() override { _receiver.reset(); }
 

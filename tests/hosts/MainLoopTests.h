@@ -5,6 +5,7 @@
 
 #include <array>
 #include <atomic>
+#include <chrono>
 #include <memory>
 #include <optional>
 #include <stdexcept>
@@ -255,7 +256,10 @@ TYPED_TEST_P(MainLoopThreadTest, AWakeThatComesLateTouchesNothing) {
   const std::shared_ptr<platform::RunLoop> loop = platform::services().runLoop;
   for (int worker = 0; worker < 4; ++worker) {
     this->startWorker([&] {
-      while (!stop) loop->wake();
+      while (!stop) {
+        loop->wake();
+        std::this_thread::sleep_for(std::chrono::microseconds(50));  // or the loop would do nothing else
+      }
     });
   }
   this->adapter->runUntil([turns = 0]() mutable { return ++turns > 20; });
@@ -264,7 +268,10 @@ TYPED_TEST_P(MainLoopThreadTest, AWakeThatComesLateTouchesNothing) {
   this->joinWorkers();
   // What is left of their events runs no block of anyone.
   this->adapter = this->toolkit.makeAdapter();
-  this->adapter->runUntil([turns = 0]() mutable { return ++turns > 20; });
+  this->adapter->runUntil([this, turns = 0]() mutable {
+    this->adapter->wake();
+    return ++turns > 20;
+  });
 }
 
 TYPED_TEST_P(MainLoopThreadTest, AnotherAdapterMayFollow) {

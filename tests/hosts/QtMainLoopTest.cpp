@@ -39,4 +39,29 @@ class Qt6 {
 
 INSTANTIATE_TYPED_TEST_SUITE_P(Qt, MainLoopThreadTest, Qt6);
 
+namespace {
+
+using QtMainLoopThreadTest = MainLoopThreadTest<Qt6>;
+
+// A slot of the host's shows a modal dialog. The block was queued before the slot was called and behind its event.
+TEST_F(QtMainLoopThreadTest, ADialogOfTheHostsRunsTheBlocksBehindIt) {
+  QCoreApplication::sendPostedEvents();
+  countQueuedBlocks();
+  QEventLoop dialog;
+  bool closed = false;
+  QMetaObject::invokeMethod(
+      &dialog,
+      [&] {
+        dialog.exec();
+        closed = true;
+      },
+      Qt::QueuedConnection);
+  startWorker([&] { platform::performBlockOnMainThread([&] { dialog.quit(); }); });
+  waitForQueuedBlocks(1);
+  adapter->runUntil([&] { return closed; });
+  joinWorkers();
+}
+
+}  // namespace
+
 }  // namespace quilt::hosts
