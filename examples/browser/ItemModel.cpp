@@ -13,6 +13,18 @@ using quilt::QuiltCollection;
 using quilt::QuiltDocument;
 using quilt::QuiltMedia;
 
+namespace {
+
+/// "Movie · 1:05". Asks the item's sources, and so is asked when the item joins and not while it is painted.
+QString kindOf(const QuiltMedia& item) {
+  const QString category = toQt(item.contentCategory());
+  const auto seconds = static_cast<int>(item.duration());
+  return seconds == 0 ? category
+                      : category + QString(" · %1:%2").arg(seconds / 60).arg(seconds % 60, 2, 10, QLatin1Char('0'));
+}
+
+}  // namespace
+
 ItemModel::ItemModel(Posters& posters, QObject* parent) : QAbstractListModel(parent), _posters(posters) {
   connect(&posters, &Posters::ready, this, [this](const QString& uid) {
     if (const QModelIndex index = indexOf(uid.toStdString()); index.isValid())
@@ -48,9 +60,9 @@ void ItemModel::follow(const std::shared_ptr<quilt::platform::Object>& owner, st
 std::vector<ItemModel::Row> ItemModel::currentRows() const {
   std::vector<Row> rows;
   if (_document) {
-    for (const auto& item : _document->media()) rows.push_back({item, item, item, nullptr});
+    for (const auto& item : _document->media()) rows.push_back({item, item, item, kindOf(*item), nullptr});
   } else if (_collection) {
-    for (const auto& document : _collection->documents()) rows.push_back({document, document, document, nullptr});
+    for (const auto& document : _collection->documents()) rows.push_back({document, document, document, {}, nullptr});
   }
   return rows;
 }
@@ -143,7 +155,7 @@ QVariant ItemModel::data(const QModelIndex& index, int role) const {
     case SubtitleRole: {
       const auto document = std::dynamic_pointer_cast<QuiltDocument>(row.object);
       if (document && document->isProcessing()) return tr("Working…");
-      return toQt(row.item->imageSubtitle());
+      return document ? toQt(row.item->imageSubtitle()) : row.kind;
     }
     case PosterRole:
       return _posters.poster(row.item);

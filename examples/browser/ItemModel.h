@@ -54,6 +54,7 @@ class ItemModel : public QAbstractListModel {
     std::shared_ptr<quilt::platform::Object> object;
     std::shared_ptr<quilt::ImageBrowserItem> item;
     std::shared_ptr<quilt::platform::PasteboardItem> dragged;
+    QString kind;  ///< of an item
     std::shared_ptr<Watch> watch;
     bool operator==(const Row& other) const { return object == other.object; }
   };

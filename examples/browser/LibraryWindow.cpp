@@ -5,6 +5,7 @@
 #include <QFileDialog>
 #include <QLabel>
 #include <QListView>
+#include <QMenu>
 #include <QMessageBox>
 #include <QPainter>
 #include <QSplitter>
@@ -12,6 +13,7 @@
 #include <QStyledItemDelegate>
 #include <QTimer>
 #include <QToolBar>
+#include <QToolButton>
 #include <QVBoxLayout>
 
 #include "examples/browser/BrowserView.h"
@@ -44,7 +46,6 @@ class SidebarDelegate : public QStyledItemDelegate {
     const int width = cell.fontMetrics.horizontalAdvance(count);
     cell.text = "  " + cell.fontMetrics.elidedText(cell.text, Qt::ElideRight, cell.rect.width() - width - 34);
     cell.state &= ~QStyle::State_HasFocus;
-    QStyledItemDelegate::paint(painter, cell, {});
     const QWidget* const widget = option.widget;
     widget->style()->drawControl(QStyle::CE_ItemViewItem, &cell, painter, widget);
     const bool isSelected = option.state.testFlag(QStyle::State_Selected);
@@ -83,8 +84,8 @@ LibraryWindow::LibraryWindow(std::shared_ptr<quilt::QuiltCollectionsController> 
 }
 
 LibraryWindow::~LibraryWindow() {
-  // The views go before the models that they show.
-  delete takeCentralWidget();
+  _posters.close();
+  delete takeCentralWidget();  // the views go before the models that they show
 }
 
 void LibraryWindow::makeActions() {
@@ -99,8 +100,16 @@ void LibraryWindow::makeActions() {
                  &LibraryWindow::makeCollection);
   _add = bar->addAction(style()->standardIcon(QStyle::SP_DialogOpenButton), tr("Add Files…"), this,
                         &LibraryWindow::askForFiles);
-  _export = bar->addAction(style()->standardIcon(QStyle::SP_DialogSaveButton), tr("Export…"), this,
-                           &LibraryWindow::askForExport);
+  auto* const formats = new QMenu(this);
+  formats->addAction(tr("In Full Quality…"), this,
+                     [this] { askForExport(quilt::kQuiltMediaDerivativeCompatibilityTagDesktop); });
+  formats->addAction(tr("For Tablets (720p)…"), this,
+                     [this] { askForExport(quilt::kQuiltMediaDerivativeCompatibilityTag720p); });
+  formats->addAction(tr("For Phones (480p)…"), this,
+                     [this] { askForExport(quilt::kQuiltMediaDerivativeCompatibilityTag480p); });
+  _export = bar->addAction(style()->standardIcon(QStyle::SP_DialogSaveButton), tr("Export"));
+  _export->setMenu(formats);
+  qobject_cast<QToolButton*>(bar->widgetForAction(_export))->setPopupMode(QToolButton::InstantPopup);
 }
 
 void LibraryWindow::makeLayout() {
@@ -114,6 +123,7 @@ void LibraryWindow::makeLayout() {
   _sidebar->setFrameShape(QFrame::NoFrame);
   _sidebar->setAcceptDrops(true);
   _sidebar->setDropIndicatorShown(true);
+  _sidebar->setDragDropOverwriteMode(true);  // a drop goes onto a collection, not between two
   _sidebar->setEditTriggers(QAbstractItemView::EditKeyPressed);
   _sidebar->setMinimumWidth(180);
 
@@ -278,12 +288,12 @@ void LibraryWindow::askForFiles() {
   }
 }
 
-void LibraryWindow::askForExport() {
+void LibraryWindow::askForExport(const std::string& format) {
   const QModelIndexList selected = _browser->selectionModel()->selectedIndexes();
   const auto document = _items.document() ? _items.document() : _items.documentAt(selected.value(0));
   if (!document) return;
   const QString folder = QFileDialog::getExistingDirectory(this, tr("Export to"));
-  if (!folder.isEmpty()) (void)exportTo(document, toPath(folder));
+  if (!folder.isEmpty()) (void)exportTo(document, toPath(folder), format);
 }
 
 void LibraryWindow::importInto(const std::shared_ptr<QuiltCollection>& collection,
@@ -305,12 +315,13 @@ void LibraryWindow::addTo(const std::shared_ptr<QuiltDocument>& document, const 
   tell(tr("Not everything was added"), problems);
 }
 
-quilt::Path LibraryWindow::exportTo(const std::shared_ptr<QuiltDocument>& document, const quilt::Path& folder) {
+quilt::Path LibraryWindow::exportTo(const std::shared_ptr<QuiltDocument>& document, const quilt::Path& folder,
+                                    const std::string& format) {
   _panel->setWhatWasTyped();  // while the document is exported it does not save itself
   Exported exported;
-  const bool wentOn =
-      runWithProgress(this, tr("Exporting “%1”…").arg(toQt(document->imageTitle())),
-                      [&](const ProgressionBlock& block) { exported = exportDocument(document, folder, block); });
+  const bool wentOn = runWithProgress(
+      this, tr("Exporting “%1”…").arg(toQt(document->imageTitle())),
+      [&](const ProgressionBlock& block) { exported = exportDocument(document, folder, format, block); });
   if (!exported.path.empty()) {
     statusBar()->showMessage(tr("Exported to “%1”").arg(toQt(exported.path)), 10000);
   } else if (!wentOn) {

@@ -36,7 +36,8 @@ class LibraryWindow : public QMainWindow {
   void importInto(const std::shared_ptr<quilt::QuiltCollection>& collection, const std::vector<quilt::Path>& files);
   void addTo(const std::shared_ptr<quilt::QuiltDocument>& document, const std::vector<quilt::Path>& files);
   /// What was made; empty when nothing was.
-  quilt::Path exportTo(const std::shared_ptr<quilt::QuiltDocument>& document, const quilt::Path& folder);
+  quilt::Path exportTo(const std::shared_ptr<quilt::QuiltDocument>& document, const quilt::Path& folder,
+                       const std::string& format);
 
   [[nodiscard]] BrowserView* browser() const { return _browser; }
   [[nodiscard]] QListView* sidebar() const { return _sidebar; }
@@ -50,7 +51,7 @@ class LibraryWindow : public QMainWindow {
   void showSelection();
   void updateHeader();
   void askForFiles();
-  void askForExport();
+  void askForExport(const std::string& format);
   void makeCollection();
   void tell(const QString& title, const Problems& problems);
   /// In a later turn of the loop, because a drop must be answered first.

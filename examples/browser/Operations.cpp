@@ -196,15 +196,15 @@ Problems addFiles(const std::shared_ptr<QuiltDocument>& document, const std::vec
   return problems;
 }
 
-Exported exportDocument(const std::shared_ptr<QuiltDocument>& document, const Path& folder,
+Exported exportDocument(const std::shared_ptr<QuiltDocument>& document, const Path& folder, const std::string& format,
                         const ProgressionBlock& block) {
   const LogLines log;
   bool isCancelled = false;
-  const Path path = document->exportToPath(
-      folder, /*zipped=*/false, {quilt::kQuiltMediaDerivativeCompatibilityTagDesktop}, [&](double percentage) {
-        isCancelled = !quilt::platform::report(block, percentage) || isCancelled;
-        return !isCancelled;
-      });
+  const auto untilCancelled = [&](double percentage) {
+    isCancelled = !quilt::platform::report(block, percentage) || isCancelled;
+    return !isCancelled;
+  };
+  const Path path = document->exportToPath(folder, /*zipped=*/false, {format}, untilCancelled);
   if (!path.empty() || isCancelled) return {path, {}};
   return {{},
           {problem(tr("“%1” was not exported to “%2”").arg(nameOf(*document), toQt(folder)), log,

@@ -41,7 +41,8 @@ struct Exported {
   quilt::Path path;  ///< empty when it was cancelled or failed
   Problems problems;
 };
+/// As a folder, with its media in the format ("Desktop", "720p" or "480p").
 Exported exportDocument(const std::shared_ptr<quilt::QuiltDocument>& document, const quilt::Path& folder,
-                        const quilt::ProgressionBlock& block);
+                        const std::string& format, const quilt::ProgressionBlock& block);
 
 }  // namespace browser

@@ -39,7 +39,7 @@ constexpr int kMemory = 128 << 10;  // KiB of pictures
 
 Posters::Posters(QObject* parent) : QObject(parent), _entries(kMemory) { _threads.setMaxThreadCount(2); }
 
-Posters::~Posters() {
+void Posters::close() {
   _isClosing = true;
   quilt::platform::services().runLoop->runUntil([this] { return _running == 0; });
   _threads.waitForDone();

@@ -23,8 +23,10 @@ class Posters : public QObject {
   static constexpr int kSize = 384;
 
   explicit Posters(QObject* parent = nullptr);
-  /// Waits for the picture being made; the main thread runs blocks meanwhile, because drawing may need it.
-  ~Posters() override;
+  ~Posters() override { close(); }
+
+  /// Waits for the pictures that are being made; the main thread runs blocks meanwhile, because drawing may need it.
+  void close();
 
   /// The picture, or a null one while it is being made or when there is none; ready() tells when to ask again. When the
   /// version has risen, the old picture until the new one is there.
