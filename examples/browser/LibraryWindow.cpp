@@ -93,6 +93,7 @@ void LibraryWindow::makeActions() {
   bar->setMovable(false);
   bar->setToolButtonStyle(Qt::ToolButtonTextBesideIcon);
   bar->setIconSize({18, 18});
+  bar->layout()->setContentsMargins(8, 4, 8, 4);
   _back = bar->addAction(style()->standardIcon(QStyle::SP_ArrowBack), tr("Back"), this, &LibraryWindow::goBack);
   _back->setShortcut(QKeySequence::Back);
   bar->addSeparator();
@@ -117,7 +118,19 @@ void LibraryWindow::makeLayout() {
   splitter->setHandleWidth(1);
   splitter->setChildrenCollapsible(false);
 
-  _sidebar = new QListView(splitter);
+  auto* const left = new QWidget(splitter);
+  left->setAutoFillBackground(true);
+  left->setBackgroundRole(QPalette::Base);
+  left->setMinimumWidth(180);
+  auto* const leftColumn = new QVBoxLayout(left);
+  leftColumn->setContentsMargins(0, 0, 0, 0);
+  leftColumn->setSpacing(8);
+  auto* const heading = label(0.9, true, left);
+  heading->setText(tr("Collections"));
+  heading->setContentsMargins(12, 20, 12, 0);
+  _sidebar = new QListView(left);
+  leftColumn->addWidget(heading);
+  leftColumn->addWidget(_sidebar, 1);
   _sidebar->setModel(&_collections);
   _sidebar->setItemDelegate(new SidebarDelegate(_sidebar));
   _sidebar->setFrameShape(QFrame::NoFrame);
@@ -125,7 +138,6 @@ void LibraryWindow::makeLayout() {
   _sidebar->setDropIndicatorShown(true);
   _sidebar->setDragDropOverwriteMode(true);  // a drop goes onto a collection, not between two
   _sidebar->setEditTriggers(QAbstractItemView::EditKeyPressed);
-  _sidebar->setMinimumWidth(180);
 
   auto* const middle = new QWidget(splitter);
   middle->setAutoFillBackground(true);
@@ -135,8 +147,8 @@ void LibraryWindow::makeLayout() {
   column->setSpacing(2);
   _title = label(1.35, false, middle);
   _subtitle = label(1, true, middle);
-  _title->setContentsMargins(20, 16, 20, 0);
-  _subtitle->setContentsMargins(20, 0, 20, 4);
+  _title->setContentsMargins(17, 16, 17, 0);
+  _subtitle->setContentsMargins(17, 0, 17, 4);
   _browser = new BrowserView(middle);
   _browser->setModel(&_items);
   column->addWidget(_title);
@@ -342,6 +354,8 @@ void LibraryWindow::tell(const QString& title, const Problems& problems) {
   auto* const box = new QMessageBox(QMessageBox::Warning, tr("Quilt Browser"), title, QMessageBox::Ok, this);
   box->setTextFormat(Qt::PlainText);
   box->setInformativeText(lines.join("\n\n"));
+  box->setStyleSheet(
+      "QLabel#qt_msgbox_label { font-weight: bold; } QLabel#qt_msgbox_informativelabel { min-width: 380px; }");
   box->setAttribute(Qt::WA_DeleteOnClose);
   box->open();
 }

@@ -23,13 +23,15 @@ namespace {
 
 QString tr(const char* text) { return QCoreApplication::translate("Operations", text); }
 QString nameOf(const Path& file) { return toQt(file.filename()); }
+/// The library's errors are sentences without a full stop.
+QString sentence(const QString& text) { return text.endsWith('.') ? text : text + "."; }
 QString nameOf(const QuiltDocument& document) {
   return document.title() ? toQt(document.title()) : tr("Untitled Episode");
 }
 
 Problem problem(const QString& what, const LogLines& log, const QString& advice) {
   const QString cause = toQt(log.cause());
-  return {cause.isEmpty() ? what : what + ": " + cause, advice};
+  return {cause.isEmpty() ? what + "." : what + ": " + sentence(cause), advice};
 }
 
 enum class Kind { Document, Item, Neither };
@@ -44,7 +46,7 @@ Kind kindOf(const Path& file) {
 std::optional<Problem> whyNotUsable(const Path& file) {
   const auto attributes = services().files->attributesOfItemAtPath(file);
   if (!attributes)
-    return Problem{tr("“%1” cannot be read: %2").arg(nameOf(file), toQt(attributes.error().text)),
+    return Problem{tr("“%1” cannot be read: %2").arg(nameOf(file), sentence(toQt(attributes.error().text))),
                    tr("Check that the file is still there and that you may read it.")};
   if (attributes->kind == quilt::platform::FileKind::Folder)
     return Problem{tr("“%1” is a folder.").arg(nameOf(file)), tr("Drop the files that it holds instead.")};
@@ -111,7 +113,8 @@ Problems moveDocuments(const quilt::QuiltCollectionsController& library, const s
       const Path package = document->path();
       const Path target = to->path() / package.filename();
       if (const auto moved = services().files->moveItem(package, target); !moved) {
-        problems.push_back({what + ": " + toQt(moved.error().text), tr("Check the disk that the library is on.")});
+        problems.push_back(
+            {what + ": " + sentence(toQt(moved.error().text)), tr("Check the disk that the library is on.")});
         continue;
       }
       // Opened anew: what the document knows of its files are their places in the package that was.
@@ -153,7 +156,9 @@ Problems importFiles(const std::shared_ptr<QuiltCollection>& collection, const s
                                  tr("Try to open it in a player; if it does not play there, it is damaged.")));
       continue;
     }
-    if (!document->title()) document->setTitle(file.stem().native());
+    // Without a title of its own the document has been saved under a fall-back.
+    const auto facts = services().inspector->inspect(file);
+    if (!facts || facts->metadataTitle.value_or("").empty()) document->setTitle(file.stem().native());
     takePoster(*document);
   }
   if (items.empty()) return problems;

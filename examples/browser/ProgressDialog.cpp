@@ -28,7 +28,7 @@ bool runWithProgress(QWidget* window, const QString& label,
   dialog.setWindowTitle(QProgressDialog::tr("Quilt Browser"));
   dialog.setAutoClose(false);
   dialog.setAutoReset(false);
-  dialog.setMinimumWidth(380);
+  dialog.setMinimumSize(420, 120);
   dialog.setMinimumDuration(kMomentBeforeItShows);
   QObject::connect(&dialog, &QProgressDialog::canceled, [&] {
     isCancelled = true;

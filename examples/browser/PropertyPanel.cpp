@@ -40,7 +40,7 @@ PropertyPanel::PropertyPanel(QWidget* parent) : QWidget(parent), _heading(new QL
   bold.setBold(true);
   _heading->setFont(bold);
   _form->setRowWrapPolicy(QFormLayout::WrapAllRows);
-  _form->setVerticalSpacing(10);
+  _form->setVerticalSpacing(4);
   auto* const layout = new QVBoxLayout(this);
   layout->setContentsMargins(16, 16, 16, 16);
   layout->setSpacing(14);
@@ -121,7 +121,10 @@ void PropertyPanel::add(const char* name, const QString& label, const std::share
     editor = line;
   }
   editor->setObjectName(name);
-  _form->addRow(label, editor);
+  auto* const caption = new QLabel(label, this);
+  caption->setBuddy(editor);
+  caption->setContentsMargins(0, index == 0 ? 0 : 8, 0, 0);
+  _form->addRow(caption, editor);
   _fields.push_back({editor, [object, get] { return (object.get()->*get)(); },
                      [object, set](quilt::Text text) { (object.get()->*set)(std::move(text)); }});
 }

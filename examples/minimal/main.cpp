@@ -17,6 +17,11 @@ struct StandardError final : quilt::platform::LogSink {
 };
 
 bool importAndExport(const quilt::Path& libraryFolder, const quilt::Path& file, const quilt::Path& destination) {
+  // Asked first: of any other file the library makes an empty document.
+  if (!quilt::QuiltDocument::canImportFromPath(file)) {
+    std::cerr << file.native() << " is not there, or is no movie, sound, PDF or EPUB\n";
+    return false;
+  }
   const auto library = quilt::QuiltCollectionsController::defaultController();
   if (!library->loadLibraryPath(libraryFolder, {})) return false;
   auto collection = library->collectionAtIndex(0);

@@ -111,13 +111,17 @@ class BrowserTest : public quilt::support::ModelFixture {
     const auto index = static_cast<std::size_t>(number);
     const QString title =
         QString(kKinds[index / std::size(kPlaces) % std::size(kKinds)]).arg(kPlaces[index % std::size(kPlaces)]);
-    writeRecord(package / "properties.plist", {{"Version", "1.0"},
-                                               {"UUID", uuid},
-                                               {"Title", title.toStdString()},
-                                               {"Author", "Ann Example"},
-                                               {"Type", "Interactive"},
-                                               {"CreationDate", day(number)},
-                                               {"ModifiedDate", day(number)}});
+    writeRecord(package / "properties.plist",
+                {{"Version", "1.0"},
+                 {"UUID", uuid},
+                 {"Title", title.toStdString()},
+                 {"Author", "Ann Example"},
+                 {"Description", "A quarter of an hour on foot, with the sound of the place."},
+                 {"Keywords", "places, walks"},
+                 {"Category", "Travel"},
+                 {"Type", "Interactive"},
+                 {"CreationDate", day(number)},
+                 {"ModifiedDate", day(number)}});
     fs::copy_file(folder() / "posters" / (std::to_string(index % kPosters) + ".png"), package / "poster.png");
   }
 
@@ -130,7 +134,7 @@ class BrowserTest : public quilt::support::ModelFixture {
   void openWindow() {
     controller = quilt::QuiltCollectionsController::init();
     window = std::make_unique<LibraryWindow>(controller);
-    window->resize(1180, 720);
+    window->resize(1140, 720);
     window->show();
     window->load(library());
   }
@@ -199,6 +203,7 @@ class BrowserTest : public quilt::support::ModelFixture {
   void saveScreenshot(QWidget& widget, const char* name) const {
     const fs::path screenshots = QUILT_SCREENSHOT_FOLDER;
     fs::create_directories(screenshots);
+    QTest::qWait(100);
     EXPECT_TRUE(widget.grab().save(toQt(screenshots / (std::string(name) + ".png"))));
   }
 
