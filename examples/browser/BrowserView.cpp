@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "examples/browser/BrowserView.h"
 
+#include <QDrag>
 #include <QDropEvent>
 #include <QMimeData>
 #include <QPainter>
@@ -105,6 +106,34 @@ void BrowserView::paintGap() {
   painter.setRenderHint(QPainter::Antialiasing);
   painter.setPen(QPen(palette().color(QPalette::Highlight), 3, Qt::SolidLine, Qt::RoundCap));
   painter.drawLine(x, cell.top() + 4, x, cell.bottom() - 4);
+}
+
+// With a small picture: one as large as the cells would hide where they are dropped.
+void BrowserView::startDrag(Qt::DropActions supportedActions) {
+  const QModelIndexList dragged = selectedIndexes();
+  if (dragged.isEmpty()) return;
+  constexpr int kWidth = 96;
+  QPixmap picture = dragged.front().data(ItemModel::PosterRole).value<QPixmap>();
+  if (picture.isNull()) {
+    picture = QPixmap(kWidth, kWidth * 3 / 4);
+    picture.fill(palette().color(QPalette::Mid));
+  }
+  picture = picture.scaledToWidth(kWidth, Qt::SmoothTransformation);
+  if (dragged.size() > 1) {
+    QPainter painter(&picture);
+    painter.setRenderHint(QPainter::Antialiasing);
+    const QRect badge(kWidth - 34, 4, 30, 20);
+    painter.setPen(Qt::NoPen);
+    painter.setBrush(palette().color(QPalette::Highlight));
+    painter.drawRoundedRect(badge, 10, 10);
+    painter.setPen(palette().color(QPalette::HighlightedText));
+    painter.drawText(badge, Qt::AlignCenter, QString::number(dragged.size()));
+  }
+  auto* const drag = new QDrag(this);  // Qt deletes it
+  drag->setMimeData(model()->mimeData(dragged));
+  drag->setPixmap(picture);
+  drag->setHotSpot({-8, -8});
+  drag->exec(supportedActions, defaultDropAction());
 }
 
 bool BrowserView::accepts(const QDropEvent& event) const {

@@ -20,6 +20,7 @@ class BrowserView : public QListView {
 
  protected:
   void paintEvent(QPaintEvent* event) override;
+  void startDrag(Qt::DropActions supportedActions) override;
   void dragEnterEvent(QDragEnterEvent* event) override;
   void dragMoveEvent(QDragMoveEvent* event) override;
   void dragLeaveEvent(QDragLeaveEvent* event) override;

@@ -93,7 +93,7 @@ void LibraryWindow::makeActions() {
   bar->setMovable(false);
   bar->setToolButtonStyle(Qt::ToolButtonTextBesideIcon);
   bar->setIconSize({18, 18});
-  bar->layout()->setContentsMargins(8, 4, 8, 4);
+  bar->setStyleSheet("QToolBar { padding: 4px 8px; spacing: 6px; }");
   _back = bar->addAction(style()->standardIcon(QStyle::SP_ArrowBack), tr("Back"), this, &LibraryWindow::goBack);
   _back->setShortcut(QKeySequence::Back);
   bar->addSeparator();
