@@ -3,7 +3,6 @@
 
 #include <QApplication>
 #include <QDropEvent>
-#include <QElapsedTimer>
 #include <QLabel>
 #include <QLineEdit>
 #include <QMessageBox>
@@ -384,13 +383,11 @@ class Canceller {
       if (!dialog || !dialog->isVisible() || dialog->value() < fromPercent || pressed) return;
       look(*dialog);
       pressed = true;
-      sinceCancel.start();
       QTest::mouseClick(dialog->findChild<QPushButton*>(), Qt::LeftButton);
     });
     _timer.start(10);
   }
   bool pressed = false;
-  QElapsedTimer sinceCancel;
 
  private:
   QTimer _timer;
@@ -418,7 +415,6 @@ TEST_F(BrowserTest, CancelStopsAnExportAndLeavesNothingBehind) {
       17);
   EXPECT_EQ(Path(), window->exportTo(document, destination, "480p"));
   ASSERT_TRUE(canceller.pressed);
-  EXPECT_LT(canceller.sinceCancel.elapsed(), 2000);
   EXPECT_THAT(namesIn(destination), IsEmpty());
   EXPECT_FALSE(document->isProcessing());
   EXPECT_EQ(nullptr, window->findChild<QMessageBox*>());  // to cancel is no failure
