@@ -88,8 +88,8 @@ struct Grade {
   Operation operation;
   const char* rivalPreset;
 };
-constexpr Grade kGrades[]{{"HD", kHighDefinition, &FfmpegTranscoder::transcodeToHD, "Fast 720p30"},
-                          {"SD", kStandardDefinition, &FfmpegTranscoder::transcodeToSD, "Fast 480p30"}};
+constexpr Grade kGrades[]{{"HD", kHighDefinitionBox, &FfmpegTranscoder::transcodeToHD, "Fast 720p30"},
+                          {"SD", kStandardDefinitionBox, &FfmpegTranscoder::transcodeToSD, "Fast 480p30"}};
 
 class Bench {
  public:
@@ -176,7 +176,7 @@ class Bench {
   static Plan planFor(const fs::path& source, const Grade& grade) {
     Plan plan;
     Result<Input> input = Input::open(source, 15);
-    if (!input || !input->findStreamInfo()) return plan;
+    if (!input) return plan;
     const Result<Outline> found = outline(*input);
     if (!found || found->video == nullptr) return plan;
     plan.video = planVideo(videoTraits(*input, *found->video), grade.box);

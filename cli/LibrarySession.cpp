@@ -56,7 +56,7 @@ LibrarySession::~LibrarySession() {
 }
 
 std::shared_ptr<QuiltCollection> LibrarySession::open(const CollectionEntry& entry) {
-  const std::string name = "The collection " + inQuotes(entry.title.empty() ? entry.uuid : entry.title);
+  const std::string name = "The collection " + inQuotes(entry.title, entry.uuid);
   if (entry.damage) throw Failure(name + " cannot be opened", *entry.damage);
   for (const auto& opened : _controller->collections())
     if (opened->path() == entry.path) return opened;
@@ -68,7 +68,7 @@ std::shared_ptr<QuiltCollection> LibrarySession::open(const CollectionEntry& ent
 
 std::shared_ptr<QuiltDocument> LibrarySession::open(const FoundDocument& found) {
   const DocumentEntry& entry = *found.document;
-  const std::string name = "The document " + inQuotes(entry.title.empty() ? entry.uuid : entry.title);
+  const std::string name = "The document " + inQuotes(entry.title, entry.uuid);
   if (entry.damage) throw Failure(name + " cannot be opened", *entry.damage);
   for (const auto& document : open(*found.collection)->documents())
     if (document->path() == entry.path) return document;

@@ -48,7 +48,7 @@ std::vector<Candidate> those(const std::vector<Candidate>& all, const Test& test
   return matching;
 }
 
-std::string join(const std::vector<std::string>& words) {
+std::string alternatives(const std::vector<std::string>& words) {
   std::string text;
   for (std::size_t i = 0; i < words.size(); ++i) {
     if (i > 0) text += i + 1 == words.size() ? " or " : ", ";
@@ -62,7 +62,7 @@ std::string describe(Kinds kinds) {
   if (kinds.documents) words.emplace_back("document");
   if (kinds.collections) words.emplace_back("collection");
   if (kinds.items) words.emplace_back("item");
-  return join(words);
+  return alternatives(words);
 }
 
 Failure ambiguous(const std::string& name, const std::vector<Candidate>& matching) {

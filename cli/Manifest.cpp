@@ -22,10 +22,10 @@ using platform::services;
 constexpr std::uint64_t kLongest = std::uint64_t{16} << 20;
 constexpr int kDeepest = 32;
 
-std::string join(const std::string& place, const std::string& key) {
+std::string placeIn(const std::string& place, const std::string& key) {
   return place.empty() ? escaped(key) : place + "." + escaped(key);
 }
-std::string join(const std::string& place, std::size_t index) { return fmt::format("{}[{}]", place, index); }
+std::string placeIn(const std::string& place, std::size_t index) { return fmt::format("{}[{}]", place, index); }
 
 const char* kindName(const Json& value) {
   switch (value.type()) {
@@ -84,7 +84,7 @@ class ObjectReader {
   ObjectReader(const Json& object, std::string place, Problems& problems)
       : _object(object), _place(std::move(place)), _problems(problems) {}
 
-  [[nodiscard]] std::string placeOf(const char* key) const { return join(_place, key); }
+  [[nodiscard]] std::string placeOf(const char* key) const { return placeIn(_place, key); }
 
   const Json* member(const char* key) {
     _known.emplace_back(key);
@@ -115,7 +115,7 @@ class ObjectReader {
     for (const char* key : _known) known += (known.empty() ? "" : ", ") + std::string(key);
     for (const auto& [key, value] : _object.items())
       if (std::none_of(_known.begin(), _known.end(), [&name = key](const char* other) { return name == other; }))
-        _problems.add(join(_place, key), "This key is unknown here; known are " + known);
+        _problems.add(placeIn(_place, key), "This key is unknown here; known are " + known);
   }
 
  private:
@@ -193,7 +193,7 @@ void readSources(ObjectReader& reader, ManifestItem& item, Problems& problems) {
   if (source) problems.add(reader.placeOf("source"), "An item with a category has \"sources\" instead");
   const auto elements = reader.array("sources", true);
   for (std::size_t i = 0; i < elements.size(); ++i)
-    if (auto one = readSource(*elements[i], join(reader.placeOf("sources"), i), true, problems))
+    if (auto one = readSource(*elements[i], placeIn(reader.placeOf("sources"), i), true, problems))
       item.sources.push_back(std::move(*one));
   if (*item.category == kQuiltMediaContentCategoryDualSource && elements.size() != 2 && !elements.empty())
     problems.add(reader.placeOf("sources"), fmt::format("A dual-source item has two sources, not {}", elements.size()));
@@ -210,7 +210,7 @@ ManifestItem readItem(const Json& value, const std::string& place, Problems& pro
   readSources(reader, item, problems);
   const auto extras = reader.array("extras");
   for (std::size_t i = 0; i < extras.size(); ++i)
-    if (auto extra = readSource(*extras[i], join(reader.placeOf("extras"), i), false, problems))
+    if (auto extra = readSource(*extras[i], placeIn(reader.placeOf("extras"), i), false, problems))
       item.extras.push_back(std::move(*extra));
   if (const Json* commentary = reader.member("commentary"))
     item.commentary = readSource(*commentary, reader.placeOf("commentary"), false, problems);
@@ -236,7 +236,7 @@ std::vector<std::string> readFormats(ObjectReader& reader, Problems& problems) {
   const auto elements = reader.array("formats");
   const auto& known = QuiltMediaSource::compatibilityTagsInOrderOfQuality();
   for (std::size_t i = 0; i < elements.size(); ++i) {
-    const std::string place = join(reader.placeOf("formats"), i);
+    const std::string place = placeIn(reader.placeOf("formats"), i);
     const Text format = readText(*elements[i], place, problems);
     if (!format) continue;
     if (std::find(known.begin(), known.end(), *format) == known.end()) {
@@ -269,7 +269,7 @@ Manifest readRoot(const Json& root, const Path& path, Problems& problems) {
     manifest.collection = readCollection(*collection, reader.placeOf("collection"), problems);
   const auto media = reader.array("media", true);
   for (std::size_t i = 0; i < media.size(); ++i)
-    manifest.media.push_back(readItem(*media[i], join("media", i), problems));
+    manifest.media.push_back(readItem(*media[i], placeIn("media", i), problems));
   reader.finish();
   return manifest;
 }

@@ -82,6 +82,10 @@ std::string escaped(std::string_view text) {
 
 std::string inQuotes(std::string_view text) { return '"' + escaped(text) + '"'; }
 
+std::string inQuotes(const std::string& title, const std::string& uuid) {
+  return inQuotes(title.empty() ? uuid : title);
+}
+
 bool isText(std::string_view bytes) {
   for (std::size_t at = 0; at < bytes.size();) {
     const Character character = characterAt(bytes, at);

@@ -15,6 +15,8 @@ std::string escaped(std::string_view text);
 
 /// escaped() in double quotes.
 std::string inQuotes(std::string_view text);
+/// What an object is called in a message: its title, or without one its identifier.
+std::string inQuotes(const std::string& title, const std::string& uuid);
 
 /// Whether the bytes can be kept as a text: UTF-8 without control characters but for line ends and tabs.
 bool isText(std::string_view bytes);

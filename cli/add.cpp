@@ -21,7 +21,7 @@ constexpr const char* kStopped = "Nothing of the rest was added";
 using Kind = AddRequest::Kind;
 
 /// What to add where, looked at before anything is changed.
-struct Plan {
+struct AdditionPlan {
   std::vector<NewItem> items;         // of Kind::Items, Montage and DualSource
   std::vector<NewSource> companions;  // of Kind::Extras and Commentary
   std::vector<Failure> failures;
@@ -65,8 +65,8 @@ NewItem composed(const AddRequest& request, std::vector<NewSource> sources) {
   return item;
 }
 
-Plan look(const AddRequest& request) {
-  Plan plan;
+AdditionPlan look(const AddRequest& request) {
+  AdditionPlan plan;
   std::vector<NewSource> sources = lookAtAll(request, plan.failures);
   const bool isOneItem = request.kind == Kind::Montage || request.kind == Kind::DualSource;
   // What belongs together is added together or not at all.
@@ -97,8 +97,6 @@ Plan look(const AddRequest& request) {
   }
   return plan;
 }
-
-std::string nameOf(const std::string& title, const std::string& uuid) { return inQuotes(title.empty() ? uuid : title); }
 
 /// Adds one thing after the other, and tells how far the whole is.
 class Addition {
@@ -142,7 +140,7 @@ void print(Output& output, const QuiltMedia& item) {
 
 void print(Output& output, const QuiltMediaSource& source) { output.item(toJson(source), source.uuid()); }
 
-void addItems(const Plan& plan, QuiltDocument& document, Addition& addition, Output& output) {
+void addItems(const AdditionPlan& plan, QuiltDocument& document, Addition& addition, Output& output) {
   for (const NewItem& item : plan.items)
     addition.step(item.title, weightOf(item), document.path(), [&](const ProgressionBlock& block) {
       const auto added = addItem(document, item, block);
@@ -151,7 +149,7 @@ void addItems(const Plan& plan, QuiltDocument& document, Addition& addition, Out
     });
 }
 
-void addCompanions(const Plan& plan, Kind kind, QuiltDocument& document, QuiltMedia& item, Addition& addition,
+void addCompanions(const AdditionPlan& plan, Kind kind, QuiltDocument& document, QuiltMedia& item, Addition& addition,
                    Output& output) {
   for (const NewSource& companion : plan.companions)
     addition.step(companion.title, weightOf(companion), document.path(), [&](const ProgressionBlock& block) {
@@ -171,7 +169,7 @@ void addCompanions(const Plan& plan, Kind kind, QuiltDocument& document, QuiltMe
 void ActingDelegate::perform(const AddRequest& request) {
   _context.output.beginList();
   (void)findTarget(readCatalogue(library()), request);
-  Plan plan = look(request);
+  AdditionPlan plan = look(request);
   LibrarySession session(library());
   const Target target = findTarget(session.catalogue(), request);
   const auto document = session.open(target.document);
@@ -200,9 +198,9 @@ void PreviewDelegate::perform(const AddRequest& request) {
   _context.output.beginList();
   const Catalogue catalogue = readCatalogue(library());
   const Target target = findTarget(catalogue, request);
-  const Plan plan = look(request);
+  const AdditionPlan plan = look(request);
   const DocumentEntry& document = *target.document.document;
-  const std::string where = "the document " + nameOf(document.title, document.uuid);
+  const std::string where = "the document " + inQuotes(document.title, document.uuid);
   for (const NewItem& item : plan.items) {
     const std::string category = item.category.value_or(item.sources.front().category);
     Json sources = Json::array();
@@ -220,7 +218,7 @@ void PreviewDelegate::perform(const AddRequest& request) {
          {"source", companion.url.absoluteString()},
          {"to", owner.uuid}},
         fmt::format("Would {} {} {} the item {}", areExtras ? "add" : "make", inQuotes(companion.title),
-                    areExtras ? "as an extra to" : "the audio commentary of", nameOf(owner.title, owner.uuid)));
+                    areExtras ? "as an extra to" : "the audio commentary of", inQuotes(owner.title, owner.uuid)));
   throwIfAny(plan.failures, plan.items.size() + plan.companions.size(), kNotAdded);
 }
 

@@ -26,7 +26,7 @@ constexpr double kLooked = 3;
 constexpr double kCopied = 30;
 
 /// What to build, looked at before anything is made.
-struct Plan {
+struct BuildPlan {
   Manifest manifest;
   ExportTarget target;
   std::shared_ptr<QuiltTheme> theme;
@@ -65,8 +65,9 @@ std::shared_ptr<ImageWrapper> readPoster(const Manifest& manifest, std::vector<F
   return nullptr;
 }
 
-Plan look(const BuildRequest& request, const Context& context) {
-  Plan plan{readManifest(request.manifest), {absolutePath(request.output), request.zip, request.formats}, {}, {}, {}};
+BuildPlan look(const BuildRequest& request, const Context& context) {
+  BuildPlan plan{
+      readManifest(request.manifest), {absolutePath(request.output), request.zip, request.formats}, {}, {}, {}};
   if (plan.target.formats.empty()) plan.target.formats = plan.manifest.formats;
   if (plan.target.formats.empty()) plan.target.formats = {kQuiltMediaDerivativeCompatibilityTagDesktop};
   checkDestination(plan.target.folder, context.settings.library ? absolutePath(*context.settings.library) : Path());
@@ -149,7 +150,7 @@ class NewDocument {
   bool _isKept = false;
 };
 
-void describe(QuiltDocument& document, const Plan& plan, const LogCollector& log) {
+void describe(QuiltDocument& document, const BuildPlan& plan, const LogCollector& log) {
   const Manifest& manifest = plan.manifest;
   const std::string cannot = "The package " + nameOf(manifest) + " cannot be made";
   const bool saved = changeAndSave(document, [&] {
@@ -167,7 +168,7 @@ void describe(QuiltDocument& document, const Plan& plan, const LogCollector& log
     throw explain(cannot + ": Its poster cannot be written", log, document.posterImagePath(), document.path());
 }
 
-void addItems(QuiltDocument& document, const Plan& plan, const Context& context) {
+void addItems(QuiltDocument& document, const BuildPlan& plan, const Context& context) {
   double total = 0;
   for (const NewItem& item : plan.items) total += weightOf(item);
   double before = 0;
@@ -213,7 +214,7 @@ Json itemsOf(const QuiltDocument& document) {
 }  // namespace
 
 void ActingDelegate::perform(const BuildRequest& request) {
-  const Plan plan = look(request, _context);
+  const BuildPlan plan = look(request, _context);
   const Destination destination(plan.target.folder);
   // Beside the package, where there is as much space, and moving costs nothing.
   std::optional<TemporaryFolder> temporary;
@@ -240,7 +241,7 @@ void ActingDelegate::perform(const BuildRequest& request) {
 
 void PreviewDelegate::perform(const BuildRequest& request) {
   _context.output.beginList();
-  const Plan plan = look(request, _context);
+  const BuildPlan plan = look(request, _context);
   for (const NewItem& item : plan.items) {
     const std::string category = item.category.value_or(item.sources.front().category);
     Json sources = Json::array();

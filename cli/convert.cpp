@@ -15,8 +15,6 @@ namespace quilt::cli {
 
 namespace {
 
-std::string nameOf(const DocumentEntry& entry) { return inQuotes(entry.title.empty() ? entry.uuid : entry.title); }
-
 /// Calls the block on every source of the document: those of the items, their extras and commentaries.
 void forEachSource(const QuiltDocument& document,
                    const std::function<void(const QuiltMedia&, const QuiltMediaSource&)>& block) {
@@ -78,8 +76,9 @@ void ActingDelegate::perform(const ConvertRequest& request) {
     printNew(*document, format, known, _context.output);
     if (Interrupt::isRequested()) throw Interrupt::failure("The rest was not converted");
     if (!converted)
-      throw explain("The document " + nameOf(*found.document) + " cannot be converted to " + format, _context.log,
-                    document->path(), document->path());
+      throw explain(
+          "The document " + inQuotes(found.document->title, found.document->uuid) + " cannot be converted to " + format,
+          _context.log, document->path(), document->path());
     before += 100 / formats;
   }
 }
@@ -89,10 +88,12 @@ void PreviewDelegate::perform(const ConvertRequest& request) {
   const Catalogue catalogue = readCatalogue(library());
   const FoundDocument found = findDocument(catalogue, request.document);
   const DocumentEntry& entry = *found.document;
-  if (entry.damage) throw Failure("The document " + nameOf(entry) + " cannot be opened", *entry.damage);
+  if (entry.damage)
+    throw Failure("The document " + inQuotes(entry.title, entry.uuid) + " cannot be opened", *entry.damage);
   for (const std::string& format : request.formats)
     plan({{"action", "convert"}, {"document", entry.uuid}, {"format", format}},
-         fmt::format("Would make what is missing of the format {} in the document {}", format, nameOf(entry)));
+         fmt::format("Would make what is missing of the format {} in the document {}", format,
+                     inQuotes(entry.title, entry.uuid)));
 }
 
 }  // namespace quilt::cli

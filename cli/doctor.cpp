@@ -12,7 +12,7 @@ namespace quilt::cli {
 
 namespace {
 
-struct Row {
+struct Finding {
   std::string name;
   bool present;
   std::string text;
@@ -39,7 +39,7 @@ Json json(const QuiltTheme& theme) {
 
 void ActingDelegate::perform(const DoctorRequest&) {
   _context.output.beginList();
-  std::vector<std::pair<Row, Json>> rows;
+  std::vector<std::pair<Finding, Json>> rows;
   for (const platform::Capability& capability : platform::services().diagnostics->capabilities()) {
     const std::string text = capability.present ? escaped(capability.version) : escaped(capability.remedy);
     rows.push_back({{escaped(capability.name), capability.present, text}, json(capability)});

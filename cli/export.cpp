@@ -13,18 +13,16 @@ namespace quilt::cli {
 namespace {
 
 /// What to export where, checked.
-struct Plan {
+struct ExportPlan {
   FoundDocument found;
   Path folder;
   std::shared_ptr<QuiltTheme> theme;  ///< null: the document's own
 };
 
-std::string nameOf(const DocumentEntry& entry) { return inQuotes(entry.title.empty() ? entry.uuid : entry.title); }
-
-Plan check(const ExportRequest& request, const Catalogue& catalogue) {
-  Plan plan{findDocument(catalogue, request.document), absolutePath(request.folder), nullptr};
+ExportPlan check(const ExportRequest& request, const Catalogue& catalogue) {
+  ExportPlan plan{findDocument(catalogue, request.document), absolutePath(request.folder), nullptr};
   const DocumentEntry& entry = *plan.found.document;
-  const std::string cannot = "The document " + nameOf(entry) + " cannot be exported";
+  const std::string cannot = "The document " + inQuotes(entry.title, entry.uuid) + " cannot be exported";
   if (request.theme) {
     if (const auto record = readDocumentRecord(entry.path); !record) throw Failure(cannot, record.error());
     plan.theme = findTheme(*request.theme);
@@ -40,15 +38,16 @@ Plan check(const ExportRequest& request, const Catalogue& catalogue) {
 void ActingDelegate::perform(const ExportRequest& request) {
   (void)check(request, readCatalogue(library()));
   LibrarySession session(library());
-  const Plan plan = check(request, session.catalogue());
-  const std::string cannot = "The document " + nameOf(*plan.found.document) + " cannot be exported";
+  const ExportPlan plan = check(request, session.catalogue());
+  const std::string cannot =
+      "The document " + inQuotes(plan.found.document->title, plan.found.document->uuid) + " cannot be exported";
   const Destination destination(plan.folder);
   const auto document = session.open(plan.found);
   _context.log.beginOperation();
   if (plan.theme && !changeAndSave(*document, [&] { document->setTheme(plan.theme); }))
     throw explain(cannot, _context.log, document->path(), document->path());
-  const Path exported =
-      exportPackage(*document, nameOf(*plan.found.document), {plan.folder, request.zip, request.formats}, _context);
+  const Path exported = exportPackage(*document, inQuotes(plan.found.document->title, plan.found.document->uuid),
+                                      {plan.folder, request.zip, request.formats}, _context);
   _context.output.object({{"uuid", document->uuid()},
                           {"title", document->title().value_or("")},
                           {"type", document->type().value_or("")},
@@ -60,7 +59,7 @@ void ActingDelegate::perform(const ExportRequest& request) {
 
 void PreviewDelegate::perform(const ExportRequest& request) {
   const Catalogue catalogue = readCatalogue(library());
-  const Plan plan = check(request, catalogue);
+  const ExportPlan plan = check(request, catalogue);
   std::string formats;
   for (const std::string& format : request.formats) formats += (formats.empty() ? "" : ", ") + format;
   PreviewDelegate::plan({{"action", "export"},
@@ -70,7 +69,8 @@ void PreviewDelegate::perform(const ExportRequest& request) {
                          {"formats", request.formats},
                          {"zip", request.zip},
                          {"theme", plan.theme ? Json(plan.theme->path().native()) : Json()}},
-                        fmt::format("Would export the document {} to {} as {}, format {}", nameOf(*plan.found.document),
+                        fmt::format("Would export the document {} to {} as {}, format {}",
+                                    inQuotes(plan.found.document->title, plan.found.document->uuid),
                                     inQuotes(plan.folder.native()), request.zip ? "an archive" : "a package", formats));
 }
 

@@ -11,11 +11,10 @@ namespace quilt::cli {
 
 namespace {
 
-std::string nameOf(const DocumentEntry& entry) { return inQuotes(entry.title.empty() ? entry.uuid : entry.title); }
-
 FoundDocument check(const FinalizeRequest& request, const Catalogue& catalogue) {
   const FoundDocument found = findDocument(catalogue, request.document);
-  checkTheme(*found.document, "The document " + nameOf(*found.document) + " cannot be finalized",
+  checkTheme(*found.document,
+             "The document " + inQuotes(found.document->title, found.document->uuid) + " cannot be finalized",
              "set one with \"quilt set\"");
   return found;
 }
@@ -37,8 +36,8 @@ void ActingDelegate::perform(const FinalizeRequest& request) {
   });
   if (!finalized && Interrupt::isRequested()) throw Interrupt::failure("The document is not finalized");
   if (!finalized)
-    throw explain("The document " + nameOf(*found.document) + " cannot be finalized", _context.log, document->path(),
-                  document->path());
+    throw explain("The document " + inQuotes(found.document->title, found.document->uuid) + " cannot be finalized",
+                  _context.log, document->path(), document->path());
   _context.output.object({{"uuid", document->uuid()},
                           {"title", document->title().value_or("")},
                           {"type", document->type().value_or("")},
@@ -50,7 +49,7 @@ void PreviewDelegate::perform(const FinalizeRequest& request) {
   const Catalogue catalogue = readCatalogue(library());
   const DocumentEntry& entry = *check(request, catalogue).document;
   plan({{"action", "finalize"}, {"uuid", entry.uuid}, {"title", entry.title}, {"path", entry.path.native()}},
-       "Would finalize the document " + nameOf(entry));
+       "Would finalize the document " + inQuotes(entry.title, entry.uuid));
 }
 
 }  // namespace quilt::cli

@@ -14,22 +14,22 @@ namespace quilt::cli {
 
 namespace {
 
-struct Row {
+struct HelpRow {
   std::string name;
   std::string help;
 };
 
-std::string table(const char* heading, const std::vector<Row>& rows) {
+std::string table(const char* heading, const std::vector<HelpRow>& rows) {
   if (rows.empty()) return "";
   std::size_t width = 0;
-  for (const Row& row : rows) width = std::max(width, columns(row.name));
+  for (const HelpRow& row : rows) width = std::max(width, columns(row.name));
   std::string text = fmt::format("\n{}:\n", heading);
-  for (const Row& row : rows) text += fmt::format("  {}  {}\n", padded(row.name, width), row.help);
+  for (const HelpRow& row : rows) text += fmt::format("  {}  {}\n", padded(row.name, width), row.help);
   return text;
 }
 
-std::vector<Row> rowsOf(const std::vector<Option>& options) {
-  std::vector<Row> rows;
+std::vector<HelpRow> rowsOf(const std::vector<Option>& options) {
+  std::vector<HelpRow> rows;
   for (const Option& option : options) {
     const std::string letter = option.letter.empty() ? "" : std::string(option.letter) + ", ";
     rows.push_back({letter + usageOf(option), std::string(option.help)});
@@ -38,7 +38,7 @@ std::vector<Row> rowsOf(const std::vector<Option>& options) {
 }
 
 std::string overview() {
-  std::vector<Row> rows;
+  std::vector<HelpRow> rows;
   for (const CommandDescription& command : commands())
     rows.push_back({std::string(command.name), std::string(command.summary)});
   std::string text = "Usage: quilt COMMAND [ARGUMENT...]\n\nMakes and keeps interactive media packages.\n";
@@ -57,7 +57,7 @@ std::string explain(const CommandDescription& command) {
   summary.front() = static_cast<char>(std::toupper(static_cast<unsigned char>(summary.front())));
   text += summary + ".\n";
   if (!command.details.empty()) (text += "\n") += command.details;
-  std::vector<Row> positionals;
+  std::vector<HelpRow> positionals;
   for (const Positional& positional : command.positionals)
     positionals.push_back({std::string(positional.name), std::string(positional.help)});
   text += table("Arguments", positionals);

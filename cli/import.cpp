@@ -24,7 +24,7 @@ using platform::services;
 constexpr const char* kNotImported = "files could not be imported";
 
 /// A file that can be imported.
-struct Candidate {
+struct ImportedFile {
   Path path;
   std::string title;         ///< the title in its metadata, else its name
   bool hasOwnTitle = false;  ///< the library will find the title itself
@@ -60,7 +60,7 @@ std::vector<std::string> allFiles(const ImportRequest& request) {
 }
 
 // Looks at one file. Throws a Failure when it is nothing to import.
-Candidate check(const std::string& name) {
+ImportedFile check(const std::string& name) {
   const std::string cannot = "Cannot import " + inQuotes(name);
   const Path path = absolutePath(name);
   const auto attributes = services().files->attributesOfItemAtPath(path);
@@ -83,8 +83,8 @@ Candidate check(const std::string& name) {
 }
 
 // Looks at every file before anything is changed; what is wrong with one is added to the failures.
-std::vector<Candidate> checkAll(const std::vector<std::string>& files, std::vector<Failure>& failures) {
-  std::vector<Candidate> candidates;
+std::vector<ImportedFile> checkAll(const std::vector<std::string>& files, std::vector<Failure>& failures) {
+  std::vector<ImportedFile> candidates;
   for (const std::string& file : files) {
     if (Interrupt::isRequested()) throw Interrupt::failure("Nothing was imported");
     try {
@@ -99,14 +99,14 @@ std::vector<Candidate> checkAll(const std::vector<std::string>& files, std::vect
 /// Imports files into one collection, one after the other.
 class Import {
  public:
-  Import(const Context& context, QuiltCollection& collection, std::vector<Candidate> candidates)
+  Import(const Context& context, QuiltCollection& collection, std::vector<ImportedFile> candidates)
       : _context(context), _collection(collection), _candidates(std::move(candidates)) {
-    for (const Candidate& candidate : _candidates) _total += weight(candidate);
+    for (const ImportedFile& candidate : _candidates) _total += weight(candidate);
   }
 
   /// On a worker. Stops between two files, and inside one, when the user asks.
   void run() {
-    for (const Candidate& candidate : _candidates) {
+    for (const ImportedFile& candidate : _candidates) {
       if (Interrupt::isRequested()) return;
       _context.log.beginOperation();
       if (const auto document = importOne(candidate)) {
@@ -125,9 +125,9 @@ class Import {
 
  private:
   // A small file takes its time, too.
-  static double weight(const Candidate& candidate) { return static_cast<double>(candidate.size) + 1e6; }
+  static double weight(const ImportedFile& candidate) { return static_cast<double>(candidate.size) + 1e6; }
 
-  std::shared_ptr<QuiltDocument> importOne(const Candidate& candidate) {
+  std::shared_ptr<QuiltDocument> importOne(const ImportedFile& candidate) {
     const std::string cannot = "Cannot import " + inQuotes(candidate.path.native());
     const std::string stage = "Importing " + candidate.path.filename().native();
     const auto block = [&](double percentage) {
@@ -156,7 +156,7 @@ class Import {
     if (services().files->fileExistsAtPath(package)) (void)services().files->removeItem(package, _collection.path());
   }
 
-  void print(const Candidate& candidate, const QuiltDocument& document) {
+  void print(const ImportedFile& candidate, const QuiltDocument& document) {
     const std::string title = document.title().value_or("");
     const std::string type = document.type().value_or("");
     _context.output.item({{"uuid", document.uuid()},
@@ -170,7 +170,7 @@ class Import {
 
   Context _context;
   QuiltCollection& _collection;
-  const std::vector<Candidate> _candidates;
+  const std::vector<ImportedFile> _candidates;
   double _total = 0;
   double _before = 0;
   std::size_t _done = 0;
@@ -181,7 +181,7 @@ class Import {
 void ActingDelegate::perform(const ImportRequest& request) {
   _context.output.beginList();
   std::vector<Failure> failures;
-  const std::vector<Candidate> candidates = checkAll(allFiles(request), failures);
+  const std::vector<ImportedFile> candidates = checkAll(allFiles(request), failures);
   if (candidates.empty()) throwIfAny(failures, 0, kNotImported);
 
   LibrarySession session(library());
@@ -201,11 +201,11 @@ void ActingDelegate::perform(const ImportRequest& request) {
 void PreviewDelegate::perform(const ImportRequest& request) {
   _context.output.beginList();
   std::vector<Failure> failures;
-  const std::vector<Candidate> candidates = checkAll(allFiles(request), failures);
+  const std::vector<ImportedFile> candidates = checkAll(allFiles(request), failures);
   const Catalogue catalogue = readCatalogue(library());
   const CollectionEntry* entry = collectionFor(catalogue, request.collection);
   const std::string title = entry ? entry->title : kDefaultCollectionTitle;
-  for (const Candidate& candidate : candidates)
+  for (const ImportedFile& candidate : candidates)
     plan({{"action", "import"},
           {"source", candidate.path.native()},
           {"title", candidate.title},

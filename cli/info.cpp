@@ -80,7 +80,7 @@ Json json(const Sight& sight) {
   return json;
 }
 
-std::string join(const std::vector<std::string>& words) {
+std::string listed(const std::vector<std::string>& words) {
   std::string text;
   for (const std::string& word : words) text += (text.empty() ? "" : ", ") + word;
   return text;
@@ -92,7 +92,7 @@ std::string lines(const Sight& sight) {
   summary.add("Type", sight.contentType);
   summary.add("MIME type", sight.mimeType);
   summary.add("Category", sight.category.empty() ? "none" : sight.category);
-  summary.add("Suits", sight.tags.empty() ? "no format" : join(sight.tags));
+  summary.add("Suits", sight.tags.empty() ? "no format" : listed(sight.tags));
   summary.add("Size", sizeText(sight.size));
   summary.add("Video", facts.hasVideo ? facts.videoCodecName : "");
   summary.add("Audio", facts.hasAudio ? facts.audioCodecName : "");

@@ -68,10 +68,10 @@ void PreviewDelegate::perform(const MoveRequest& request) {
   const DocumentEntry& document = *plan.document.document;
   Json moved = Json::array();
   for (const std::size_t index : plan.indexes) moved.push_back(document.items[index].uuid);
-  PreviewDelegate::plan({{"action", "move"}, {"document", document.uuid}, {"items", moved}, {"to", request.to}},
-                        fmt::format("Would move {} item{} of the document {} to place {}", plan.indexes.size(),
-                                    plan.indexes.size() == 1 ? "" : "s",
-                                    inQuotes(document.title.empty() ? document.uuid : document.title), request.to));
+  PreviewDelegate::plan(
+      {{"action", "move"}, {"document", document.uuid}, {"items", moved}, {"to", request.to}},
+      fmt::format("Would move {} item{} of the document {} to place {}", plan.indexes.size(),
+                  plan.indexes.size() == 1 ? "" : "s", inQuotes(document.title, document.uuid), request.to));
 }
 
 }  // namespace quilt::cli

@@ -21,14 +21,14 @@ namespace {
 using platform::services;
 
 /// What to remove: items of a document, or one document or collection.
-struct Target {
+struct RemovalTarget {
   Found found;
   std::vector<ItemEntry> items;  ///< when not empty, of the document that was found
 };
 
-Target findTarget(const Catalogue& catalogue, const RemoveRequest& request) {
+RemovalTarget findTarget(const Catalogue& catalogue, const RemoveRequest& request) {
   if (!request.from) return {find(catalogue, request.objects.front(), {.collections = true, .documents = true}), {}};
-  Target target{findDocument(catalogue, *request.from), {}};
+  RemovalTarget target{findDocument(catalogue, *request.from), {}};
   const DocumentEntry& document = *std::get<FoundDocument>(target.found).document;
   for (const std::string& object : request.objects) {
     const ItemEntry& item = findItem(document, object);
@@ -39,22 +39,20 @@ Target findTarget(const Catalogue& catalogue, const RemoveRequest& request) {
   return target;
 }
 
-std::string nameOf(const std::string& title, const std::string& uuid) { return inQuotes(title.empty() ? uuid : title); }
-
-std::string describe(const Target& target) {
+std::string describe(const RemovalTarget& target) {
   if (const auto* found = std::get_if<FoundCollection>(&target.found)) {
     const std::size_t count = found->collection->documents.size();
     return fmt::format("the collection {} with {} document{}",
-                       nameOf(found->collection->title, found->collection->uuid), count, count == 1 ? "" : "s");
+                       inQuotes(found->collection->title, found->collection->uuid), count, count == 1 ? "" : "s");
   }
   const DocumentEntry& document = *std::get<FoundDocument>(target.found).document;
-  const std::string name = "the document " + nameOf(document.title, document.uuid);
+  const std::string name = "the document " + inQuotes(document.title, document.uuid);
   if (target.items.empty()) return name;
   if (target.items.size() > 1) return fmt::format("{} items of {}", target.items.size(), name);
-  return "the item " + nameOf(target.items.front().title, target.items.front().uuid) + " of " + name;
+  return "the item " + inQuotes(target.items.front().title, target.items.front().uuid) + " of " + name;
 }
 
-Json json(const Target& target) {
+Json json(const RemovalTarget& target) {
   if (const auto* found = std::get_if<FoundCollection>(&target.found)) return toJson(*found->collection);
   const DocumentEntry& document = *std::get<FoundDocument>(target.found).document;
   if (target.items.empty()) return toJson(document);
@@ -68,7 +66,7 @@ Json json(const Target& target) {
 }
 
 // Asks on a terminal; elsewhere --force has to be said.
-void confirm(const RemoveRequest& request, const Target& target, Messages& messages) {
+void confirm(const RemoveRequest& request, const RemovalTarget& target, Messages& messages) {
   if (request.force) return;
   if (!isatty(STDIN_FILENO) || !isatty(STDERR_FILENO))
     throw Failure(ExitCode::Usage,
@@ -106,7 +104,7 @@ void removeDocument(const FoundDocument& found, LibrarySession& session, const L
   checkGone(path, log);
 }
 
-void removeItems(const Target& target, LibrarySession& session, const LogCollector& log) {
+void removeItems(const RemovalTarget& target, LibrarySession& session, const LogCollector& log) {
   const auto document = session.open(std::get<FoundDocument>(target.found));
   std::vector<Path> folders;
   const bool saved = changeAndSave(*document, [&] {
@@ -125,7 +123,7 @@ void removeItems(const Target& target, LibrarySession& session, const LogCollect
 void ActingDelegate::perform(const RemoveRequest& request) {
   confirm(request, findTarget(readCatalogue(library()), request), _context.messages);
   LibrarySession session(library());
-  const Target target = findTarget(session.catalogue(), request);
+  const RemovalTarget target = findTarget(session.catalogue(), request);
   if (const auto* collection = std::get_if<FoundCollection>(&target.found)) {
     removeCollection(*collection->collection, session, _context.log);
   } else if (target.items.empty()) {
@@ -138,7 +136,7 @@ void ActingDelegate::perform(const RemoveRequest& request) {
 
 void PreviewDelegate::perform(const RemoveRequest& request) {
   const Catalogue catalogue = readCatalogue(library());
-  const Target target = findTarget(catalogue, request);
+  const RemovalTarget target = findTarget(catalogue, request);
   plan({{"action", "remove"}, {"objects", json(target)}}, "Would remove " + describe(target) + ", and all its files");
 }
 

@@ -19,13 +19,11 @@ namespace {
 
 using platform::services;
 
-std::string nameOf(const DocumentEntry& entry) { return inQuotes(entry.title.empty() ? entry.uuid : entry.title); }
-
 // The document that the request names, with what it takes to be shown.
 FoundDocument check(const ServeRequest& request, const Catalogue& catalogue) {
   const FoundDocument found = findDocument(catalogue, request.document);
   const DocumentEntry& entry = *found.document;
-  const std::string cannot = "The document " + nameOf(entry) + " cannot be served";
+  const std::string cannot = "The document " + inQuotes(entry.title, entry.uuid) + " cannot be served";
   checkTheme(entry, cannot, "set one with \"quilt set\"");
   if (entry.type != kQuiltDocumentTypeInteractive)
     throw Failure(ExitCode::Usage, cannot + ": It is no Interactive document and has no page", entry.path);
@@ -61,8 +59,8 @@ void finalize(QuiltDocument& document, const DocumentEntry& entry, const Context
   });
   if (finalized) return;
   if (Interrupt::isRequested()) throw Interrupt::failure("The document is not served");
-  throw explain("The document " + nameOf(entry) + " cannot be finalized", context.log, document.path(),
-                document.path());
+  throw explain("The document " + inQuotes(entry.title, entry.uuid) + " cannot be finalized", context.log,
+                document.path(), document.path());
 }
 
 // Turns the main loop until the user asks to stop.
@@ -85,7 +83,9 @@ void ActingDelegate::perform(const ServeRequest& request) {
   const auto document = session.open(found);
   if (isStale(*document)) finalize(*document, *found.document, _context);
   auto bridge = scripting::Bridge::serve(document, {.port = request.port});
-  if (!bridge) throw Failure("The document " + nameOf(*found.document) + " cannot be served", bridge.error());
+  if (!bridge)
+    throw Failure("The document " + inQuotes(found.document->title, found.document->uuid) + " cannot be served",
+                  bridge.error());
   const std::string address = (*bridge)->address();
   _context.progress.finish();
   _context.output.object({{"uuid", document->uuid()},
@@ -98,7 +98,7 @@ void ActingDelegate::perform(const ServeRequest& request) {
   std::optional<Browser> browser;
   if (request.open && !browser.emplace(address).hasStarted())
     _context.messages.warning("There is no \"xdg-open\" to open the address with; open it in a browser");
-  _context.messages.note("Serving " + nameOf(*found.document) + " until Ctrl-C");
+  _context.messages.note("Serving " + inQuotes(found.document->title, found.document->uuid) + " until Ctrl-C");
   waitForInterrupt();
   throw Interrupt::failure("Every edit is saved");
 }
@@ -107,7 +107,7 @@ void PreviewDelegate::perform(const ServeRequest& request) {
   const Catalogue catalogue = readCatalogue(library());
   const DocumentEntry& entry = *check(request, catalogue).document;
   plan({{"action", "serve"}, {"uuid", entry.uuid}, {"title", entry.title}, {"path", entry.path.native()}},
-       "Would finalize the document " + nameOf(entry) + " if it is stale, and serve it");
+       "Would finalize the document " + inQuotes(entry.title, entry.uuid) + " if it is stale, and serve it");
 }
 
 }  // namespace quilt::cli

@@ -19,7 +19,7 @@ namespace {
 
 constexpr const char* kFormatVersion = "1.0";
 
-constexpr std::string_view kKeys[] = {
+constexpr std::string_view kDocumentKeys[] = {
     "Version",  "UUID",          "Title",          "Description",      "Author",       "Keywords",
     "Category", "AdvisoryLabel", "jukeboxOrder",   "ThemePath",        "CreationDate", "ModifiedDate",
     "Type",     "Media",         "LastPublishURL", "DocumentDuration", "IsFlattened"};
@@ -192,7 +192,7 @@ void QuiltDocument::apply(const Dictionary& record) {
       if (const auto* entry = item.as<Dictionary>()) addMedia(QuiltMedia::initWithDictionary(*entry, self));
   }
   if (Text text = record.string("LastPublishURL")) setLastPublishURL(std::move(text));
-  _unknownEntries = platform::entriesBeyond(kKeys, record);
+  _unknownEntries = platform::entriesBeyond(kDocumentKeys, record);
 }
 
 void QuiltDocument::reload() {

@@ -10,18 +10,18 @@ namespace quilt {
 
 namespace {
 
-constexpr std::string_view kKeys[] = {"UUID",
-                                      "Title",
-                                      "Description",
-                                      "Sources",
-                                      "Extras",
-                                      "AudioCommentarySource",
-                                      "IsFlattened",
-                                      "TotalSizeInMegaBytes",
-                                      "ContentCategory",
-                                      "PosterImagePath",
-                                      "PosterImageWidth",
-                                      "PosterImageHeight"};
+constexpr std::string_view kMediaKeys[] = {"UUID",
+                                           "Title",
+                                           "Description",
+                                           "Sources",
+                                           "Extras",
+                                           "AudioCommentarySource",
+                                           "IsFlattened",
+                                           "TotalSizeInMegaBytes",
+                                           "ContentCategory",
+                                           "PosterImagePath",
+                                           "PosterImageWidth",
+                                           "PosterImageHeight"};
 
 template <class List>
 Array recordsOf(const List& list) {
@@ -70,7 +70,7 @@ std::shared_ptr<QuiltMedia> QuiltMedia::initWithDictionary(const Dictionary& dic
     if (const auto commentary = QuiltMediaSource::initWithDictionary(*record, media))
       media->setAudioCommentarySource(commentary);
   }
-  media->_unknownEntries = platform::entriesBeyond(kKeys, dictionary);
+  media->_unknownEntries = platform::entriesBeyond(kMediaKeys, dictionary);
   return media;
 }
 

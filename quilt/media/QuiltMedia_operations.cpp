@@ -18,12 +18,6 @@ constexpr const char* kNoMediaFolder = "Failed to create intermediate directorie
 constexpr const char* kNoSourcesFolder = "Failed to create intermediate directories for sources at path \"%@\": \"%@\"";
 constexpr const char* kNoExtrasFolder = "Failed to create intermediate directories for extras at path \"%@\": \"%@\"";
 
-bool makeFolder(const Path& folder, const std::shared_ptr<QuiltDocument>& document, const char* failure) {
-  const auto created = createDirectoryInPackage(folder, document);
-  if (!created) FDYLogger::logDebug(failure, folder, created.error());
-  return created.hasValue();
-}
-
 /// Maps a child's percentage into its step of `total`; the step's start is an integer quotient.
 ProgressionBlock integerStep(const ProgressionBlock& block, std::size_t step, std::size_t total) {
   return [&block, step, total](double percentage) {
@@ -71,7 +65,8 @@ bool QuiltMedia::flattenChildren(const ProgressionBlock& block) {
   const auto commentary = audioCommentarySource();
   report(block, 0);
   const auto document = documentOwner();
-  if (!makeFolder(path(), document, kNoMediaFolder) || !makeFolder(sourcesFolderPath(), document, kNoMediaFolder))
+  if (!makeFolderInPackage(path(), document, kNoMediaFolder) ||
+      !makeFolderInPackage(sourcesFolderPath(), document, kNoMediaFolder))
     return false;
 
   const std::size_t total = sources + extras + (commentary ? 1 : 0);
@@ -93,7 +88,7 @@ bool QuiltMedia::flattenChildren(const ProgressionBlock& block) {
     if (!commentary->isFlattened() && !flatten(*commentary, step, "Failed to flatten source \"%@\"")) return false;
     ++step;
   }
-  if (!makeFolder(extrasFolderPath(), document, kNoMediaFolder)) return false;
+  if (!makeFolderInPackage(extrasFolderPath(), document, kNoMediaFolder)) return false;
   // Unlike the sources, an extra that is flattened already takes no step.
   const bool extrasDone = _extras.walk([&](const auto& extra) {
     return extra->isFlattened() || flatten(*extra, step++, "Failed to flatten extra \"%@\"");
@@ -126,8 +121,9 @@ bool QuiltMedia::finalizeChildren(const ProgressionBlock& block) {
   const std::size_t total = sourcesCount() + extras + (commentary ? 1 : 0);
   report(block, 0);
   const auto document = documentOwner();
-  if (!makeFolder(path(), document, kNoMediaFolder) || !makeFolder(sourcesFolderPath(), document, kNoSourcesFolder) ||
-      !makeFolder(extrasFolderPath(), document, kNoExtrasFolder))
+  if (!makeFolderInPackage(path(), document, kNoMediaFolder) ||
+      !makeFolderInPackage(sourcesFolderPath(), document, kNoSourcesFolder) ||
+      !makeFolderInPackage(extrasFolderPath(), document, kNoExtrasFolder))
     return false;
   posterImage();  // writes the poster into the package
 

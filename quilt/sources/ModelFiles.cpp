@@ -23,6 +23,12 @@ platform::Result<void> createDirectoryInPackage(const Path& path, const std::sha
   return createDirectoryIfMissing(path);
 }
 
+bool makeFolderInPackage(const Path& path, const std::shared_ptr<QuiltDocument>& document, const char* failure) {
+  const auto created = createDirectoryInPackage(path, document);
+  if (!created) platform::FDYLogger::logDebug(failure, path, created.error());
+  return created.hasValue();
+}
+
 void deleteFromPackage(const Path& path, const std::shared_ptr<QuiltDocument>& document, const char* warning) {
   if (path.empty() || !services().files->fileExistsAtPath(path)) return;
   const auto removed = services().files->removeItem(path, document ? document->path() : Path());

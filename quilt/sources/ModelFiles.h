@@ -18,6 +18,9 @@ platform::Result<void> createDirectoryIfMissing(const Path& path);
 /// The same for a folder of the document's package. Unsafe when a symbolic link leads it out of the package.
 platform::Result<void> createDirectoryInPackage(const Path& path, const std::shared_ptr<QuiltDocument>& document);
 
+/// The same; a failure logs the debug line `failure` with the path and the error's text, and answers false.
+bool makeFolderInPackage(const Path& path, const std::shared_ptr<QuiltDocument>& document, const char* failure);
+
 /// Deletes a file or folder of the document's package, when something is there. A failure (also: the item lies outside
 /// the package, or there is no document) logs `warning` with the path and the error's text.
 void deleteFromPackage(const Path& path, const std::shared_ptr<QuiltDocument>& document, const char* warning);

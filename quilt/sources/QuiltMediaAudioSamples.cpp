@@ -16,8 +16,8 @@ using platform::services;
 
 namespace {
 
-constexpr std::string_view kKeys[] = {"UUID",      "SampleFilename", "SampleURL",
-                                      "SourceURL", "IsFlattened",    "TotalSizeInMegaBytes"};
+constexpr std::string_view kAudioSamplesKeys[] = {"UUID",      "SampleFilename", "SampleURL",
+                                                  "SourceURL", "IsFlattened",    "TotalSizeInMegaBytes"};
 
 }  // namespace
 
@@ -54,7 +54,7 @@ std::shared_ptr<QuiltMediaAudioSamples> QuiltMediaAudioSamples::initWithDictiona
   }
   if (const Text url = dictionary.string("SourceURL")) samples->setSourceURL(Url::parse(*url));
   if (const auto flattened = dictionary.boolean("IsFlattened")) samples->setIsFlattened(*flattened);
-  samples->_unknownEntries = platform::entriesBeyond(kKeys, dictionary);
+  samples->_unknownEntries = platform::entriesBeyond(kAudioSamplesKeys, dictionary);
   return samples;
 }
 

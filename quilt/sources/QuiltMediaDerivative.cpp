@@ -8,6 +8,7 @@
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/base/Paths.h"
 #include "quilt/platform/interfaces/Services.h"
+#include "quilt/sources/Grades.h"
 #include "quilt/sources/ModelFiles.h"
 #include "quilt/sources/QuiltMediaSource.h"
 #include "quilt/sources/RecordNames.h"
@@ -22,11 +23,7 @@ namespace types = platform::types;
 
 namespace {
 
-constexpr const char* kDesktop = kQuiltMediaDerivativeCompatibilityTagDesktop;
-constexpr const char* k720p = kQuiltMediaDerivativeCompatibilityTag720p;
-constexpr const char* k480p = kQuiltMediaDerivativeCompatibilityTag480p;
-
-constexpr std::string_view kKeys[] = {
+constexpr std::string_view kDerivativeKeys[] = {
     "UUID",        "Filename", "URL",   "ContentType", "CompatibilityTags", "MimeType",
     "IsFlattened", "Height",   "Width", "Duration",    "RelativePath",      "TotalSizeInMegaBytes"};
 
@@ -161,7 +158,7 @@ std::shared_ptr<QuiltMediaDerivative> QuiltMediaDerivative::initWithDictionary(
   if (const auto height = dictionary.real("Height")) derivative->setHeight(narrowed(*height));
   if (const auto duration = dictionary.real("Duration")) derivative->setDuration(narrowed(*duration));
   if (const auto flattened = dictionary.boolean("IsFlattened")) derivative->setIsFlattened(*flattened);
-  derivative->_unknownEntries = platform::entriesBeyond(kKeys, dictionary);
+  derivative->_unknownEntries = platform::entriesBeyond(kDerivativeKeys, dictionary);
   return derivative;
 }
 

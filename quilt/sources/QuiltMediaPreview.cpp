@@ -16,8 +16,8 @@ using platform::services;
 
 namespace {
 
-constexpr std::string_view kKeys[] = {"UUID",  "Title",  "Content",     "Index",    "Timecode",
-                                      "Width", "Height", "IsFlattened", "Filename", "RelativePath"};
+constexpr std::string_view kPreviewKeys[] = {"UUID",  "Title",  "Content",     "Index",    "Timecode",
+                                             "Width", "Height", "IsFlattened", "Filename", "RelativePath"};
 
 }  // namespace
 
@@ -50,7 +50,7 @@ std::shared_ptr<QuiltMediaPreview> QuiltMediaPreview::initWithDictionary(
   if (const auto index = dictionary.integer("Index")) preview->setIndex(static_cast<std::size_t>(*index));
   if (const auto timecode = dictionary.real("Timecode")) preview->setTimecode(*timecode);
   if (const auto flattened = dictionary.boolean("IsFlattened")) preview->setIsFlattened(*flattened);
-  preview->_unknownEntries = platform::entriesBeyond(kKeys, dictionary);
+  preview->_unknownEntries = platform::entriesBeyond(kPreviewKeys, dictionary);
   return preview;
 }
 

@@ -18,9 +18,9 @@ namespace types = platform::types;
 
 namespace {
 
-constexpr std::string_view kKeys[] = {"UUID",  "ContentCategory", "Derivatives", "Previews",    "AudioSamples",
-                                      "Title", "Description",     "Timecode",    "IsFlattened", "TotalSizeInMegaBytes",
-                                      "Dirty"};
+constexpr std::string_view kSourceKeys[] = {
+    "UUID",     "ContentCategory", "Derivatives",          "Previews", "AudioSamples", "Title", "Description",
+    "Timecode", "IsFlattened",     "TotalSizeInMegaBytes", "Dirty"};
 
 constexpr const char* kImageTypes[] = {types::kJPEG, types::kJPEG2000, types::kTIFF, types::kGIF,
                                        types::kPNG,  types::kICNS,     types::kBMP};
@@ -103,7 +103,7 @@ bool QuiltMediaSource::initializeWithDictionary(const Dictionary& dictionary,
   if (Text title = dictionary.string("Title")) setTitle(std::move(title));
   if (Text description = dictionary.string("Description")) setDescription(std::move(description));
   if (const auto timecode = dictionary.real("Timecode")) setTimecode(*timecode);
-  _unknownEntries = platform::entriesBeyond(kKeys, dictionary);
+  _unknownEntries = platform::entriesBeyond(kSourceKeys, dictionary);
   // Last: a dirty source drops what was just read but its main derivative.
   if (const auto dirty = dictionary.boolean("Dirty")) setDirty(*dirty);
   return true;

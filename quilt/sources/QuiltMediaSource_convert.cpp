@@ -5,6 +5,7 @@
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/base/Paths.h"
 #include "quilt/platform/interfaces/Services.h"
+#include "quilt/sources/Grades.h"
 #include "quilt/sources/ModelFiles.h"
 #include "quilt/sources/QuiltMediaSource.h"
 
@@ -14,10 +15,6 @@ using platform::FDYLogger;
 using platform::services;
 
 namespace {
-
-constexpr const char* kDesktop = kQuiltMediaDerivativeCompatibilityTagDesktop;
-constexpr const char* k720p = kQuiltMediaDerivativeCompatibilityTag720p;
-constexpr const char* k480p = kQuiltMediaDerivativeCompatibilityTag480p;
 
 platform::TranscoderProgressBlock stopWhenCancelled(const ProgressionBlock& block) {
   return [&block](float progress, bool& stop) {

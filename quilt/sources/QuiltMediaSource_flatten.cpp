@@ -18,12 +18,6 @@ constexpr const char* kNoSourceFolder = "Failed to create intermediate directori
 constexpr const char* kNoSamplesFolder =
     "Failed to create intermediate directories for audioSamples at path \"%@\": \"%@\"";
 
-bool makeFolder(const Path& folder, const std::shared_ptr<QuiltDocument>& document, const char* failure) {
-  const auto created = createDirectoryInPackage(folder, document);
-  if (!created) FDYLogger::logDebug(failure, folder, created.error());
-  return created.hasValue();
-}
-
 enum class Outcome { Done, Failed, Cancelled };
 
 }  // namespace
@@ -55,9 +49,9 @@ bool QuiltMediaSource::flattenCopy(bool copy, const ProgressionBlock& withProgre
       return Outcome::Failed;
     }
     const std::size_t total = derivativeCount() + _previews.count();
-    if (!makeFolder(path(), document(), kNoSourceFolder) ||
-        !makeFolder(derivativesFolderPath(), document(), kNoSourceFolder) ||
-        !makeFolder(audioSamplesFolderPath(), document(), kNoSamplesFolder))
+    if (!makeFolderInPackage(path(), document(), kNoSourceFolder) ||
+        !makeFolderInPackage(derivativesFolderPath(), document(), kNoSourceFolder) ||
+        !makeFolderInPackage(audioSamplesFolderPath(), document(), kNoSamplesFolder))
       return Outcome::Failed;
 
     std::size_t step = 0;
@@ -119,8 +113,8 @@ bool QuiltMediaSource::finalizeWithProgressionBlock(const ProgressionBlock& with
       return false;
     }
     report(withProgressionBlock, 0);
-    if (!makeFolder(path(), document(), kNoSourceFolder) ||
-        !makeFolder(previewsFolderPath(), document(), kNoSourceFolder))
+    if (!makeFolderInPackage(path(), document(), kNoSourceFolder) ||
+        !makeFolderInPackage(previewsFolderPath(), document(), kNoSourceFolder))
       return false;
     const bool previewed = previewWithProgressionBlock(
         [&](const auto& /*preview*/, double percentage) { return report(withProgressionBlock, percentage); });

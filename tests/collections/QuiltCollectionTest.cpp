@@ -8,6 +8,7 @@
 #include "quilt/collections/QuiltCollection.h"
 #include "quilt/platform/testing/ForwardingFileManager.h"
 #include "tests/support/FailingAllocation.h"
+#include "tests/support/FaultyServices.h"
 #include "tests/support/ModelFixture.h"
 #include "tests/support/PlistByPython.h"
 
@@ -33,8 +34,6 @@ using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 using ::testing::SizeIs;
 
-const Error kFailure{ErrorKind::NoSpace, "The disk is full.", {}};
-
 /// Counts and shows the writes, and fails them when asked.
 class WatchedPropertyLists final : public platform::PropertyLists {
  public:
@@ -49,7 +48,7 @@ class WatchedPropertyLists final : public platform::PropertyLists {
     const std::lock_guard guard(_mutex);
     ++writes;
     if (onWrite) onWrite(dictionary);
-    if (fail) return kFailure;
+    if (fail) return support::kFault;
     return _real->writeDictionary(dictionary, path);
   }
 
@@ -72,11 +71,11 @@ class FailingFiles final : public platform::ForwardingFileManager {
     return ForwardingFileManager::kindOfItemAtPath(path);
   }
   Result<void> createDirectoryAtPath(const Path& path) override {
-    if (failCreate) return kFailure;
+    if (failCreate) return support::kFault;
     return ForwardingFileManager::createDirectoryAtPath(path);
   }
   Result<std::vector<std::string>> contentsOfDirectoryAtPath(const Path& path) const override {
-    if (failList) return kFailure;
+    if (failList) return support::kFault;
     return ForwardingFileManager::contentsOfDirectoryAtPath(path);
   }
   Result<void> removeItem(const Path& path, const Path& within) override {
@@ -91,9 +90,9 @@ class UnsavableImage final : public ImageWrapper {
   platform::Size size() const override { return {1, 1}; }
   std::shared_ptr<ImageWrapper> convertToSD() const override { return nullptr; }
   std::shared_ptr<ImageWrapper> convertToHD() const override { return nullptr; }
-  Result<void> saveAsJPGAtPath(const Path&) const override { return kFailure; }
-  Result<void> saveAsPNGAtURL(const Url&) const override { return kFailure; }
-  Result<platform::Bitmap> bitmap() const override { return kFailure; }
+  Result<void> saveAsJPGAtPath(const Path&) const override { return support::kFault; }
+  Result<void> saveAsPNGAtURL(const Url&) const override { return support::kFault; }
+  Result<platform::Bitmap> bitmap() const override { return support::kFault; }
 };
 
 class QuiltCollectionTest : public support::ModelFixture {

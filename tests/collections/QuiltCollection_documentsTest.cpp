@@ -6,6 +6,7 @@
 #include "quilt/collections/QuiltCollection.h"
 #include "quilt/platform/testing/FailNthFileManager.h"
 #include "quilt/platform/testing/ForwardingFileManager.h"
+#include "tests/support/FaultyServices.h"
 #include "tests/support/MediaFixtures.h"
 #include "tests/support/ModelFixture.h"
 #include "tests/support/PlistByPython.h"
@@ -36,9 +37,7 @@ using ::testing::IsEmpty;
 using ::testing::Le;
 using ::testing::SizeIs;
 
-const Error kFailure{ErrorKind::NoSpace, "The disk is full.", {}};
-
-class FailingFiles final : public platform::ForwardingFileManager {
+class FailingDocumentFiles final : public platform::ForwardingFileManager {
  public:
   using ForwardingFileManager::ForwardingFileManager;
   std::string failCreateOf;  ///< the last component
@@ -46,7 +45,7 @@ class FailingFiles final : public platform::ForwardingFileManager {
   bool failCopy = false;
 
   Result<void> createDirectoryAtPath(const Path& path) override {
-    if (!failCreateOf.empty() && path.native().ends_with(failCreateOf)) return kFailure;
+    if (!failCreateOf.empty() && path.native().ends_with(failCreateOf)) return support::kFault;
     return ForwardingFileManager::createDirectoryAtPath(path);
   }
   Result<void> removeItem(const Path& path, const Path& within) override {
@@ -67,7 +66,7 @@ class FailingPropertyLists final : public platform::PropertyLists {
   std::string serialize(const platform::PropertyList& value) const override { return _real->serialize(value); }
   Result<Dictionary> readDictionary(const Path& path) const override { return _real->readDictionary(path); }
   Result<void> writeDictionary(const Dictionary& dictionary, const Path& path) override {
-    if (writesLeft-- <= 0) return kFailure;
+    if (writesLeft-- <= 0) return support::kFault;
     return _real->writeDictionary(dictionary, path);
   }
 
@@ -87,7 +86,7 @@ class SeesFacts final : public platform::MediaInspector {
 
 class SeesNothing final : public platform::MediaInspector {
  public:
-  Result<MediaFacts> inspect(const Path&) const override { return kFailure; }
+  Result<MediaFacts> inspect(const Path&) const override { return support::kFault; }
 };
 
 class QuiltCollectionDocumentsTest : public support::ModelFixture {
@@ -278,7 +277,7 @@ TEST_F(QuiltCollectionDocumentsTest, APackageThatIsGoneIsRemovedWithoutAMessage)
 
 TEST_F(QuiltCollectionDocumentsTest, APackageThatCannotBeDeletedIsReportedAndLeavesTheList) {
   const auto document = addPackage(packageOf("one"));
-  const auto files = std::make_shared<FailingFiles>(services().files);
+  const auto files = std::make_shared<FailingDocumentFiles>(services().files);
   const ScopedService scoped(&Services::files, files);
   files->failRemove = true;
 
@@ -419,7 +418,7 @@ TEST_F(QuiltCollectionDocumentsTest, ANewDocumentIsAsOldAsItsFirstSave) {
 }
 
 TEST_F(QuiltCollectionDocumentsTest, ANewDocumentThatCannotBeMadeIsReportedWithItsPath) {
-  const auto files = std::make_shared<FailingFiles>(services().files);
+  const auto files = std::make_shared<FailingDocumentFiles>(services().files);
   const ScopedService scoped(&Services::files, files);
   files->failCreateOf = ".qpk";
 
@@ -625,7 +624,7 @@ TEST_F(QuiltCollectionDocumentsTest, AFlattenThatReportsFiftyReachesTheBlockAsFi
 
 TEST_F(QuiltCollectionDocumentsTest, ADocumentThatCannotBeMadeIsReportedWithTheSource) {
   const Path file = pdf();
-  const auto files = std::make_shared<FailingFiles>(services().files);
+  const auto files = std::make_shared<FailingDocumentFiles>(services().files);
   const ScopedService scoped(&Services::files, files);
   files->failCreateOf = "paper.qpk";
   EXPECT_FALSE(collection->importDocumentFromPath(file, "paper", nullptr));
@@ -662,7 +661,7 @@ TEST_F(QuiltCollectionDocumentsTest, ADocumentThatCannotBeSavedIsReported) {
 
 TEST_F(QuiltCollectionDocumentsTest, AFlattenThatFailsTakesTheDocumentAway) {
   const Path file = pdf();
-  const auto files = std::make_shared<FailingFiles>(services().files);
+  const auto files = std::make_shared<FailingDocumentFiles>(services().files);
   const ScopedService scoped(&Services::files, files);
   files->failCopy = true;
 

@@ -6,6 +6,7 @@
 
 #include "quilt/collections/QuiltCollectionsController.h"
 #include "quilt/platform/testing/ForwardingFileManager.h"
+#include "tests/support/FaultyServices.h"
 #include "tests/support/ModelFixture.h"
 
 namespace quilt {
@@ -26,8 +27,6 @@ using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 using ::testing::SizeIs;
 
-const Error kFailure{ErrorKind::NoSpace, "The disk is full.", {}};
-
 /// Lists folders sorted, so that a test knows the order, and fails the operations that it names.
 class SortedFiles final : public platform::ForwardingFileManager {
  public:
@@ -37,11 +36,11 @@ class SortedFiles final : public platform::ForwardingFileManager {
   bool failRemove = false;
 
   Result<void> createDirectoryAtPath(const Path& path) override {
-    if (failCreate) return kFailure;
+    if (failCreate) return support::kFault;
     return ForwardingFileManager::createDirectoryAtPath(path);
   }
   Result<std::vector<std::string>> contentsOfDirectoryAtPath(const Path& path) const override {
-    if (failList) return kFailure;
+    if (failList) return support::kFault;
     auto names = ForwardingFileManager::contentsOfDirectoryAtPath(path);
     if (names) std::sort(names->begin(), names->end());
     return names;

@@ -13,13 +13,13 @@ namespace {
 
 using support::expectTellingError;
 
-using Toolkit = support::Candidate<DocumentToolkit>;
-const Toolkit kMupdf{"Mupdf", [] { return std::make_shared<MupdfDocuments>(); }};
-const Toolkit kAbsent{"Absent", [] { return std::make_shared<AbsentDocumentToolkit>(); }};
+using DocumentCandidate = support::Candidate<DocumentToolkit>;
+const DocumentCandidate kMupdf{"Mupdf", [] { return std::make_shared<MupdfDocuments>(); }};
+const DocumentCandidate kNoMupdf{"Absent", [] { return std::make_shared<AbsentDocumentToolkit>(); }};
 
 /// Holds of a build with pages and of one without.
 using DocumentToolkitFailureContract = support::ContractTest<DocumentToolkit>;
-INSTANTIATE_TEST_SUITE_P(Implementations, DocumentToolkitFailureContract, ::testing::Values(kMupdf, kAbsent),
+INSTANTIATE_TEST_SUITE_P(Implementations, DocumentToolkitFailureContract, ::testing::Values(kMupdf, kNoMupdf),
                          support::candidateName);
 
 TEST_P(DocumentToolkitFailureContract, WhatIsNoDocumentIsRefusedWithItsFile) {

@@ -13,7 +13,7 @@ using ::testing::ElementsAre;
 
 using Archive = support::Candidate<FDYArchive>;
 const Archive kZip{"Zip", [] { return std::make_shared<ZipArchive>(); }};
-const Archive kAbsent{"Absent", [] { return std::make_shared<AbsentArchive>(); }};
+const Archive kNoZip{"Absent", [] { return std::make_shared<AbsentArchive>(); }};
 
 class FDYArchiveFailureContract : public support::ContractTest<FDYArchive> {
  protected:
@@ -26,7 +26,7 @@ class FDYArchiveFailureContract : public support::ContractTest<FDYArchive> {
     return service->archiveFile(file, "Package.qpk", zip, block);
   }
 };
-INSTANTIATE_TEST_SUITE_P(Implementations, FDYArchiveFailureContract, ::testing::Values(kZip, kAbsent),
+INSTANTIATE_TEST_SUITE_P(Implementations, FDYArchiveFailureContract, ::testing::Values(kZip, kNoZip),
                          support::candidateName);
 
 TEST_P(FDYArchiveFailureContract, AFailureNamesTheFileAndKeepsWhatWasThere) {

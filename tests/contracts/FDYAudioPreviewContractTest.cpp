@@ -13,8 +13,8 @@ namespace {
 using ::testing::ElementsAre;
 
 using Preview = support::Candidate<FDYAudioPreview>;
-const Preview kFfmpeg{"Ffmpeg", [] { return std::make_shared<FfmpegAudioPreview>(); }};
-const Preview kAbsent{"Absent", [] { return std::make_shared<AbsentAudioPreview>(); }};
+const Preview kFfmpegPreview{"Ffmpeg", [] { return std::make_shared<FfmpegAudioPreview>(); }};
+const Preview kNoPreview{"Absent", [] { return std::make_shared<AbsentAudioPreview>(); }};
 
 class FDYAudioPreviewFailureContract : public support::ContractTest<FDYAudioPreview> {
  protected:
@@ -22,7 +22,7 @@ class FDYAudioPreviewFailureContract : public support::ContractTest<FDYAudioPrev
     return service->extractAudioSamplesFromAssetURL(Url::fileUrl(from), Url::fileUrl(to), [] { return true; });
   }
 };
-INSTANTIATE_TEST_SUITE_P(Implementations, FDYAudioPreviewFailureContract, ::testing::Values(kFfmpeg, kAbsent),
+INSTANTIATE_TEST_SUITE_P(Implementations, FDYAudioPreviewFailureContract, ::testing::Values(kFfmpegPreview, kNoPreview),
                          support::candidateName);
 
 TEST_P(FDYAudioPreviewFailureContract, AFailureNamesTheAssetAndLeavesNothing) {
@@ -33,7 +33,7 @@ TEST_P(FDYAudioPreviewFailureContract, AFailureNamesTheAssetAndLeavesNothing) {
 }
 
 using FDYAudioPreviewContractThreadTest = FDYAudioPreviewFailureContract;
-INSTANTIATE_TEST_SUITE_P(Implementations, FDYAudioPreviewContractThreadTest, ::testing::Values(kFfmpeg),
+INSTANTIATE_TEST_SUITE_P(Implementations, FDYAudioPreviewContractThreadTest, ::testing::Values(kFfmpegPreview),
                          support::candidateName);
 
 TEST_P(FDYAudioPreviewContractThreadTest, ThreadsExtractAtOnceAndGetTheSameFile) {

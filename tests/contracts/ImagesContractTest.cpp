@@ -16,11 +16,11 @@ using ::testing::ElementsAre;
 
 using Images_ = support::Candidate<Images>;
 const Images_ kVips{"Vips", [] { return std::make_shared<VipsImages>(); }};
-const Images_ kAbsent{"Absent", [] { return std::make_shared<AbsentImages>(); }};
+const Images_ kNoVips{"Absent", [] { return std::make_shared<AbsentImages>(); }};
 
 /// Holds of a build with images and of one without.
 using ImagesFailureContract = support::ContractTest<Images>;
-INSTANTIATE_TEST_SUITE_P(Implementations, ImagesFailureContract, ::testing::Values(kVips, kAbsent),
+INSTANTIATE_TEST_SUITE_P(Implementations, ImagesFailureContract, ::testing::Values(kVips, kNoVips),
                          support::candidateName);
 
 TEST_P(ImagesFailureContract, WhatIsNoImageIsRefusedWithItsFile) {

@@ -10,13 +10,13 @@ namespace {
 
 using support::expectTellingError;
 
-using Toolkit = support::Candidate<MovieToolkit>;
-const Toolkit kFfmpeg{"Ffmpeg", [] { return std::make_shared<FfmpegMovieToolkit>(); }};
-const Toolkit kAbsent{"Absent", [] { return std::make_shared<AbsentMovieToolkit>(); }};
+using MovieCandidate = support::Candidate<MovieToolkit>;
+const MovieCandidate kFfmpeg{"Ffmpeg", [] { return std::make_shared<FfmpegMovieToolkit>(); }};
+const MovieCandidate kNoFfmpeg{"Absent", [] { return std::make_shared<AbsentMovieToolkit>(); }};
 
 /// Holds of a build with movies and of one without.
 using MovieToolkitFailureContract = support::ContractTest<MovieToolkit>;
-INSTANTIATE_TEST_SUITE_P(Implementations, MovieToolkitFailureContract, ::testing::Values(kFfmpeg, kAbsent),
+INSTANTIATE_TEST_SUITE_P(Implementations, MovieToolkitFailureContract, ::testing::Values(kFfmpeg, kNoFfmpeg),
                          support::candidateName);
 
 TEST_P(MovieToolkitFailureContract, WhatIsNoMovieIsRefusedWithItsFile) {

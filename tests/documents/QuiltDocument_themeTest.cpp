@@ -25,9 +25,9 @@ using ::testing::IsEmpty;
 using ::testing::StartsWith;
 
 /// Lists folders sorted, so that a test knows the order, and fails the operations that it names.
-class SortedFiles final : public platform::ForwardingFileManager {
+class SortedThemeFiles final : public platform::ForwardingFileManager {
  public:
-  SortedFiles() : ForwardingFileManager(platform::services().files) {}
+  SortedThemeFiles() : ForwardingFileManager(platform::services().files) {}
 
   support::FailsAt failList, failCopy, failRemove;
   ErrorKind removal = ErrorKind::PermissionDenied;
@@ -76,7 +76,7 @@ class QuiltDocumentThemeTest : public support::DocumentFixture {
                  (document->path() / name).native() + "\": \"" + error + "\"");
   }
 
-  const Installed<SortedFiles> files{&Services::files};
+  const Installed<SortedThemeFiles> files{&Services::files};
   const std::shared_ptr<QuiltDocument> document = made();
   Progress progress;
 };

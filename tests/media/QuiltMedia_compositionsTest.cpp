@@ -15,11 +15,11 @@ using platform::services;
 using platform::Size;
 using Pixel = std::array<std::uint8_t, 3>;
 
-constexpr Pixel kRed{220, 30, 30};
-constexpr Pixel kGreen{30, 200, 30};
-constexpr Pixel kBlue{30, 30, 220};
+constexpr Pixel kBrickRed{220, 30, 30};
+constexpr Pixel kLeafGreen{30, 200, 30};
+constexpr Pixel kInkBlue{30, 30, 220};
 constexpr Pixel kYellow{230, 220, 20};
-constexpr Pixel kWhite{250, 250, 250};
+constexpr Pixel kPaperWhite{250, 250, 250};
 constexpr Pixel kBlack{0, 0, 0};
 
 class QuiltMediaCompositionsTest : public support::DocumentFixture {
@@ -73,100 +73,100 @@ TEST_F(QuiltMediaCompositionsTest, AMontageWithoutSourcesIsTheBadgeOnBlack) {
 }
 
 TEST_F(QuiltMediaCompositionsTest, OnePictureFillsTheMontageWithItsMiddle) {
-  addPicture(800, 400, kRed, kBlue);
+  addPicture(800, 400, kBrickRed, kInkBlue);
   montage();
-  expectNear(at(12, 500), kRed, "upper left");
-  expectNear(at(500, 12), kBlue, "lower right");
-  expectNear(at(240, 504), kRed, "left of the middle", 14);
-  expectNear(at(272, 504), kBlue, "right of the middle", 14);
+  expectNear(at(12, 500), kBrickRed, "upper left");
+  expectNear(at(500, 12), kInkBlue, "lower right");
+  expectNear(at(240, 504), kBrickRed, "left of the middle", 14);
+  expectNear(at(272, 504), kInkBlue, "right of the middle", 14);
 }
 
 TEST_F(QuiltMediaCompositionsTest, TwoPicturesStandSideBySide) {
-  addPicture(kRed);
-  addPicture(kBlue);
+  addPicture(kBrickRed);
+  addPicture(kInkBlue);
   montage();
   for (const double y : {12.0, 500.0}) {
-    expectNear(at(12, y), kRed, "left");
-    expectNear(at(500, y), kBlue, "right");
+    expectNear(at(12, y), kBrickRed, "left");
+    expectNear(at(500, y), kInkBlue, "right");
   }
 }
 
 TEST_F(QuiltMediaCompositionsTest, OfThreePicturesTheFirstIsAbove) {
-  addPicture(kRed);
-  addPicture(kGreen);
-  addPicture(kBlue);
+  addPicture(kBrickRed);
+  addPicture(kLeafGreen);
+  addPicture(kInkBlue);
   montage();
-  expectNear(at(12, 500), kRed, "upper left");
-  expectNear(at(500, 500), kRed, "upper right");
-  expectNear(at(12, 12), kGreen, "lower left");
-  expectNear(at(500, 12), kBlue, "lower right");
+  expectNear(at(12, 500), kBrickRed, "upper left");
+  expectNear(at(500, 500), kBrickRed, "upper right");
+  expectNear(at(12, 12), kLeafGreen, "lower left");
+  expectNear(at(500, 12), kInkBlue, "lower right");
 }
 
 TEST_F(QuiltMediaCompositionsTest, OfFivePicturesFourAreShownAndTheFirstIsStretchedUnderTheSecond) {
-  addPicture(400, 400, kWhite, kRed);
-  addPicture(kGreen);
-  addPicture(kBlue);
+  addPicture(400, 400, kPaperWhite, kBrickRed);
+  addPicture(kLeafGreen);
+  addPicture(kInkBlue);
   addPicture(kYellow);
-  addPicture(kRed);
+  addPicture(kBrickRed);
   montage();
-  expectNear(at(12, 500), kWhite, "upper left");
-  expectNear(at(240, 500), kWhite, "still the first's left half: it is twice as wide", 14);
-  expectNear(at(500, 500), kGreen, "upper right");
-  expectNear(at(12, 12), kBlue, "lower left");
+  expectNear(at(12, 500), kPaperWhite, "upper left");
+  expectNear(at(240, 500), kPaperWhite, "still the first's left half: it is twice as wide", 14);
+  expectNear(at(500, 500), kLeafGreen, "upper right");
+  expectNear(at(12, 12), kInkBlue, "lower left");
   expectNear(at(500, 12), kYellow, "lower right");
 }
 
 TEST_F(QuiltMediaCompositionsTest, TheMontageHasABlackFrame) {
-  addPicture(kWhite);
+  addPicture(kPaperWhite);
   montage();
   const Pixel edge = at(256, 511.9);
   EXPECT_LT(edge[0], 60) << "one pixel of the line of two lies inside";
-  expectNear(at(256, 506), kWhite, "inside of it", 14);
+  expectNear(at(256, 506), kPaperWhite, "inside of it", 14);
 }
 
 TEST_F(QuiltMediaCompositionsTest, TheBadgeThrowsAShadow) {
-  addPicture(kWhite);
+  addPicture(kPaperWhite);
   montage();
   const Pixel beside = at(110, 256);
   EXPECT_LT(beside[0], 235);
   EXPECT_GT(beside[0], 20);
-  expectNear(at(8, 504), kWhite, "not into the corners", 14);
+  expectNear(at(8, 504), kPaperWhite, "not into the corners", 14);
 }
 
 TEST_F(QuiltMediaCompositionsTest, ADualSourceShowsTheFirstInALowerCornerOfTheSecond) {
-  addPicture(400, 400, kGreen, kYellow);
-  addPicture(1920, 1080, kRed, kBlue);
+  addPicture(400, 400, kLeafGreen, kYellow);
+  addPicture(1920, 1080, kBrickRed, kInkBlue);
   dualSource();
   EXPECT_EQ(item->posterImage()->size(), (Size{512, 288}));
-  expectNear(at(250, 280), kRed, "the ground's left half");
-  expectNear(at(500, 12), kBlue, "its right half");
+  expectNear(at(250, 280), kBrickRed, "the ground's left half");
+  expectNear(at(500, 12), kInkBlue, "its right half");
   // The inset: 170.67 wide and, the first being square, high, from (20, 20).
-  expectNear(at(24, 100), kGreen, "its left half");
+  expectNear(at(24, 100), kLeafGreen, "its left half");
   expectNear(at(186, 100), kYellow, "its right half");
-  expectNear(at(100, 186), kGreen, "its upper edge");
-  expectNear(at(100, 205), kRed, "above it", 40);
+  expectNear(at(100, 186), kLeafGreen, "its upper edge");
+  expectNear(at(100, 205), kBrickRed, "above it", 40);
   expectNear(at(256, 287.5), kBlack, "the frame", 10);
 }
 
 TEST_F(QuiltMediaCompositionsTest, TheInsetHasRoundedCornersAndAShadow) {
-  addPicture(kWhite);
-  addPicture(1920, 1080, kWhite, kWhite);
+  addPicture(kPaperWhite);
+  addPicture(1920, 1080, kPaperWhite, kPaperWhite);
   dualSource();
-  expectNear(at(100, 100), kWhite, "the inset");
+  expectNear(at(100, 100), kPaperWhite, "the inset");
   EXPECT_LT(at(100, 17)[0], 230) << "below it";
   EXPECT_LT(at(20.5, 20.5)[0], 230) << "its corner is cut, and shadowed";
-  expectNear(at(400, 200), kWhite, "far from it");
+  expectNear(at(400, 200), kPaperWhite, "far from it");
 }
 
 TEST_F(QuiltMediaCompositionsTest, APortraitSourceGivesAPortraitPoster) {
-  addPicture(kRed);
-  addPicture(300, 600, kBlue, kBlue);
+  addPicture(kBrickRed);
+  addPicture(300, 600, kInkBlue, kInkBlue);
   dualSource();
   EXPECT_EQ(item->posterImage()->size(), (Size{240, 480})) << "256 × 512 in standard definition";
 }
 
 TEST_F(QuiltMediaCompositionsTest, WithoutASecondPictureADualSourceHasNoPoster) {
-  addPicture(kRed);
+  addPicture(kBrickRed);
   dualSource();
   takeLines();
   EXPECT_EQ(item->posterImage(), nullptr);
@@ -176,26 +176,26 @@ TEST_F(QuiltMediaCompositionsTest, WithoutASecondPictureADualSourceHasNoPoster) 
 
 TEST_F(QuiltMediaCompositionsTest, WithoutAFirstPictureADualSourceShowsTheSecondAlone) {
   item->addSource(QuiltMediaSource::init());
-  addPicture(1920, 1080, kRed, kBlue);
+  addPicture(1920, 1080, kBrickRed, kInkBlue);
   dualSource();
-  expectNear(at(100, 100), kRed, "no inset");
+  expectNear(at(100, 100), kBrickRed, "no inset");
 }
 
 TEST_F(QuiltMediaCompositionsTest, ASourceWithoutAPictureLeavesItsPlaceBlack) {
-  addPicture(kRed);
+  addPicture(kBrickRed);
   item->addSource(QuiltMediaSource::init());
   montage();
-  expectNear(at(12, 500), kRed, "left");
+  expectNear(at(12, 500), kBrickRed, "left");
   expectNear(at(500, 500), kBlack, "right");
 }
 
 TEST_F(QuiltMediaCompositionsTest, ACompositionIsSavedAndReadBack) {
-  addPicture(kRed);
+  addPicture(kBrickRed);
   montage();
   ASSERT_NE(item->posterImage(), nullptr);
   EXPECT_EQ(item->posterImageVersion(), 2u);
   item->invalidateCaches();
-  expectNear(at(12, 500), kRed, "from the file", 12);
+  expectNear(at(12, 500), kBrickRed, "from the file", 12);
   EXPECT_EQ(item->posterImageVersion(), 2u);
 }
 
@@ -233,10 +233,10 @@ class QuiltMediaCompositionReferencesTest : public QuiltMediaCompositionsTest {
 };
 
 TEST_F(QuiltMediaCompositionReferencesTest, AMontageOfFourLooksAsItDid) {
-  addPicture(640, 360, kRed, kBlue);
-  addPicture(300, 600, kGreen, kWhite);
-  addPicture(400, 400, kYellow, kGreen);
-  addPicture(800, 200, kBlue, kYellow);
+  addPicture(640, 360, kBrickRed, kInkBlue);
+  addPicture(300, 600, kLeafGreen, kPaperWhite);
+  addPicture(400, 400, kYellow, kLeafGreen);
+  addPicture(800, 200, kInkBlue, kYellow);
   montage();
   expectLike("montage-of-four");
 }
@@ -247,8 +247,8 @@ TEST_F(QuiltMediaCompositionReferencesTest, AnEmptyMontageLooksAsItDid) {
 }
 
 TEST_F(QuiltMediaCompositionReferencesTest, TwoSourcesLookAsTheyDid) {
-  addPicture(400, 300, kRed, kYellow);
-  addPicture(1920, 1080, kWhite, kBlue);
+  addPicture(400, 300, kBrickRed, kYellow);
+  addPicture(1920, 1080, kPaperWhite, kInkBlue);
   dualSource();
   expectLike("dual-source");
 }

@@ -27,10 +27,10 @@ using support::warning;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
-constexpr const char* kNoSourceFolder = "Failed to create intermediate directories for source at path \"";
+constexpr const char* kNoFolderOfSource = "Failed to create intermediate directories for source at path \"";
 constexpr const char* kNoSamplesFolder = "Failed to create intermediate directories for audioSamples at path \"";
 
-FailsAt at(const Path& path) {
+FailsAt failsAt(const Path& path) {
   return [path](const Path& changed) { return changed == path; };
 }
 
@@ -289,15 +289,15 @@ TEST_F(QuiltMediaSourceFlattenTest, FoldersThatCannotBeMadeFail) {
   const struct {
     Path (QuiltMediaSource::*place)() const;
     const char* line;
-  } folders[] = {{&QuiltMediaSource::path, kNoSourceFolder},
-                 {&QuiltMediaSource::derivativesFolderPath, kNoSourceFolder},
+  } folders[] = {{&QuiltMediaSource::path, kNoFolderOfSource},
+                 {&QuiltMediaSource::derivativesFolderPath, kNoFolderOfSource},
                  {&QuiltMediaSource::audioSamplesFolderPath, kNoSamplesFolder}};
   for (const auto& [place, line] : folders) {
     const auto source = addEmptySource();
     const auto derivative = addOutside(*source, "a.m4v");
     const Path failing = (*source.*place)();
     const Installed<FaultyFiles> files(&Services::files);
-    files->failCreate = at(failing);
+    files->failCreate = failsAt(failing);
     takeLines();
     EXPECT_FALSE(source->flattenCopy(true, progress.block()));
     EXPECT_EQ(takeLines(), (Lines{flattening(*source), noFolder(line, failing), flattenFailed(*source)}));
@@ -530,10 +530,10 @@ TEST_F(QuiltMediaSourceFlattenTest, FinalizingNeedsItsFolders) {
     const auto source = addEmptySource();
     const Path failing = (*source.*place)();
     const Installed<FaultyFiles> files(&Services::files);
-    files->failCreate = at(failing);
+    files->failCreate = failsAt(failing);
     takeLines();
     EXPECT_FALSE(source->finalizeWithProgressionBlock(progress.block()));
-    EXPECT_EQ(takeLines(), (Lines{finalizing(*source), noFolder(kNoSourceFolder, failing), finalizeFailed(*source)}));
+    EXPECT_EQ(takeLines(), (Lines{finalizing(*source), noFolder(kNoFolderOfSource, failing), finalizeFailed(*source)}));
   }
   EXPECT_THAT(progress.values, ElementsAre(0, 0));
 }

@@ -23,7 +23,6 @@ using namespace ffmpeg;
 namespace {
 
 constexpr std::size_t kFlushedBytes = std::size_t{64} << 10;
-constexpr double kStalledSeconds = 30;  // for one packet
 
 std::string littleEndian(std::uint64_t value) {
   std::string bytes;
@@ -169,7 +168,7 @@ Result<void> decodeAll(Input& input, const AVStream& stream, AVCodecContext& dec
     }
     return {};
   };
-  while (input.allow(kStalledSeconds), input.goesOn() && av_read_frame(input.context(), packet.get()) >= 0) {
+  while (input.allow(kPacketSeconds), input.goesOn() && av_read_frame(input.context(), packet.get()) >= 0) {
     if (packet->stream_index == stream.index) {
       SoundFrames frames(stream, *packet);
       while (const AVPacket* each = frames.next()) {

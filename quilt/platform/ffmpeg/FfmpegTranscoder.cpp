@@ -26,7 +26,6 @@ using namespace ffmpeg;
 
 namespace {
 
-constexpr double kStalledSeconds = 30;  // for one packet
 constexpr AVRational kCoverTimeBase{1, 1000};
 
 // What is known of a file before it is read through.
@@ -181,7 +180,7 @@ class Transcode {
     const Packet packet(av_packet_alloc());
     if (!packet) return failure(AVERROR(ENOMEM), _input.path());
     int code = 0;
-    while (_input.allow(kStalledSeconds), (code = av_read_frame(_input.context(), packet.get())) >= 0) {
+    while (_input.allow(kPacketSeconds), (code = av_read_frame(_input.context(), packet.get())) >= 0) {
       const auto found = _chains.find(packet->stream_index);
       if (found != _chains.end()) {
         const AVRational base = _input.context()->streams[packet->stream_index]->time_base;
@@ -268,12 +267,12 @@ Result<void> FfmpegTranscoder::transcodeToAudio(const Url& source, const Url& to
 
 Result<void> FfmpegTranscoder::transcodeToHD(const Url& source, const Url& toDestination,
                                              const TranscoderProgressBlock& withProgressionBlock) {
-  return transcode(source, toDestination, OutputKind::Movie, kHighDefinition, withProgressionBlock);
+  return transcode(source, toDestination, OutputKind::Movie, kHighDefinitionBox, withProgressionBlock);
 }
 
 Result<void> FfmpegTranscoder::transcodeToSD(const Url& source, const Url& toDestination,
                                              const TranscoderProgressBlock& withProgressionBlock) {
-  return transcode(source, toDestination, OutputKind::Movie, kStandardDefinition, withProgressionBlock);
+  return transcode(source, toDestination, OutputKind::Movie, kStandardDefinitionBox, withProgressionBlock);
 }
 
 }  // namespace quilt::platform

@@ -17,8 +17,6 @@ namespace quilt::platform::ffmpeg {
 
 namespace {
 
-constexpr int kTallestStandardDefinition = 576;
-
 // The "J" formats are the plain ones with full range.
 AVPixelFormat plainFormat(int format, bool& isFullRange) {
   switch (format) {
@@ -42,7 +40,7 @@ AVPixelFormat plainFormat(int format, bool& isFullRange) {
   }
 }
 
-int matrixOf(const AVFrame& frame) {
+int scalerMatrixOf(const AVFrame& frame) {
   switch (static_cast<int>(frame.colorspace)) {  // an open list: the library adds to it
     case AVCOL_SPC_BT709:
       return SWS_CS_ITU709;
@@ -75,7 +73,7 @@ int convert(const AVFrame& frame, PictureSize size, AVPixelFormat format, std::u
   if (!scaler) return AVERROR_PATCHWELCOME;
   constexpr int one = 1 << 16;
   // Fails, harmlessly, for formats that are RGB already.
-  sws_setColorspaceDetails(scaler.get(), sws_getCoefficients(matrixOf(frame)), isFullRange ? 1 : 0,
+  sws_setColorspaceDetails(scaler.get(), sws_getCoefficients(scalerMatrixOf(frame)), isFullRange ? 1 : 0,
                            sws_getCoefficients(SWS_CS_DEFAULT), 1, 0, one, one);
   const std::array<std::uint8_t*, 4> planes{pixels, nullptr, nullptr, nullptr};
   const std::array<int, 4> strides{stride, 0, 0, 0};

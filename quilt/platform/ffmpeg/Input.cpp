@@ -22,7 +22,7 @@ namespace {
 
 using SteadyClock = std::chrono::steady_clock;
 
-constexpr int kBufferBytes = 32 * 1024;
+constexpr int kReadBufferBytes = 32 * 1024;
 
 // Containers of sound and pictures only: no playlists (hls, dash, concat), image sequences, subtitles, scripts or
 // devices.
@@ -108,6 +108,7 @@ Input::~Input() = default;
 Input& Input::operator=(Input&& other) noexcept {
   _context = std::move(other._context);  // before the source that it reads from
   _source = std::move(other._source);
+  _hasStreamInfo = other._hasStreamInfo;
   return *this;
 }
 
@@ -125,9 +126,9 @@ Result<Input> Input::open(const std::filesystem::path& path, double seconds) {
   if (!S_ISREG(status.st_mode)) return failure(AVERROR_DEMUXER_NOT_FOUND, path);
   source->size = status.st_size;
 
-  auto* buffer = static_cast<unsigned char*>(av_malloc(kBufferBytes));
+  auto* buffer = static_cast<unsigned char*>(av_malloc(kReadBufferBytes));
   if (buffer == nullptr) return failure(AVERROR(ENOMEM), path);
-  source->io = avio_alloc_context(buffer, kBufferBytes, 0, source.get(), &Source::read, nullptr, &Source::seek);
+  source->io = avio_alloc_context(buffer, kReadBufferBytes, 0, source.get(), &Source::read, nullptr, &Source::seek);
   if (source->io == nullptr) {
     av_free(buffer);
     return failure(AVERROR(ENOMEM), path);
@@ -169,6 +170,7 @@ void Input::allow(double seconds) {
 }
 
 Result<void> Input::findStreamInfo() {
+  if (_hasStreamInfo) return {};  // the library reads memory that it has freed when asked a second time
   const unsigned count = _context->nb_streams;
   std::vector<AVDictionary*> options(std::max(count, 1U), nullptr);
   for (AVDictionary*& option : options) {
@@ -179,6 +181,7 @@ Result<void> Input::findStreamInfo() {
   for (AVDictionary*& option : options) av_dict_free(&option);
   if (outOfTime()) return failure(AVERROR_EXIT, path());
   if (code < 0) return failure(code, path());
+  _hasStreamInfo = true;
   return {};
 }
 

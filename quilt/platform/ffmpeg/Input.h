@@ -43,6 +43,7 @@ class Input {
   [[nodiscard]] bool goesOn();
 
   /// Fills in what the header does not say about the streams, by reading and decoding the start of the file.
+  /// Once is enough: later calls find nothing to do.
   Result<void> findStreamInfo();
 
   /// Bytes of the file at an offset, past the library; fewer at the end.
@@ -54,6 +55,7 @@ class Input {
 
   std::unique_ptr<Source> _source;  // outlives the context that reads from it
   FormatContext _context;
+  bool _hasStreamInfo = false;
 };
 
 /// Opens a decoder for the stream, bounded, with this many threads.

@@ -20,6 +20,7 @@ inline constexpr std::int64_t kProbeMicroseconds = 5'000'000;        ///< of med
 inline constexpr double kInspectionSeconds = 15;  ///< from opening to the facts
 inline constexpr double kMeasuringSeconds = 3;    ///< reading packets when the duration in the header cannot be trusted
 inline constexpr double kFrameSeconds = 30;       ///< from asking for a frame to having it
+inline constexpr double kPacketSeconds = 30;  ///< from asking for a packet to having it, however long the whole takes
 inline constexpr std::size_t kHeldPacketBytes = 64U << 20U;  ///< packets between a key frame and the frame asked for
 
 inline constexpr std::uint64_t kMaximumSamplePoints = 100'000'000;  ///< of a samples file: six days at 48 kHz

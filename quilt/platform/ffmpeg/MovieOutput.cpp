@@ -17,7 +17,7 @@ namespace quilt::platform::ffmpeg {
 
 namespace {
 
-constexpr int kBufferBytes = 256 * 1024;
+constexpr int kWriteBufferBytes = 256 * 1024;
 
 void freeIo(AVIOContext* io) {
   if (io == nullptr) return;
@@ -27,9 +27,9 @@ void freeIo(AVIOContext* io) {
 
 AVIOContext* makeIo(void* opaque, bool isWritten, int (*read)(void*, std::uint8_t*, int),
                     int (*write)(void*, std::uint8_t*, int), std::int64_t (*seek)(void*, std::int64_t, int)) {
-  auto* buffer = static_cast<unsigned char*>(av_malloc(kBufferBytes));
+  auto* buffer = static_cast<unsigned char*>(av_malloc(kWriteBufferBytes));
   if (buffer == nullptr) return nullptr;
-  AVIOContext* io = avio_alloc_context(buffer, kBufferBytes, isWritten ? 1 : 0, opaque, read, write, seek);
+  AVIOContext* io = avio_alloc_context(buffer, kWriteBufferBytes, isWritten ? 1 : 0, opaque, read, write, seek);
   if (io == nullptr) av_free(buffer);
   return io;
 }

@@ -15,8 +15,6 @@ namespace quilt::platform::ffmpeg {
 
 namespace {
 
-constexpr int kTallestStandardDefinition = 576;
-
 // How the values of a picture are to be read, nothing left open.
 struct Colours {
   int matrix;

@@ -10,6 +10,9 @@
 
 namespace quilt::platform::ffmpeg {
 
+/// Lines of the tallest picture whose colours are those of standard definition when nothing is said of them.
+inline constexpr int kTallestStandardDefinition = 576;
+
 /// Brings RGB with a wide range of brightness or colour into sRGB. Brightness up to half of reference white (203 cd/m²)
 /// is kept, what is above is rolled off so that the peak becomes white; hues are kept. Colours outside are clipped.
 class ToneMap {

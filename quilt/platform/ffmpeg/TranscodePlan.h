@@ -13,8 +13,8 @@
 namespace quilt::platform::ffmpeg {
 
 /// The sizes that a movie's picture is fitted into.
-inline constexpr PictureSize kHighDefinition{1280, 720};
-inline constexpr PictureSize kStandardDefinition{640, 480};
+inline constexpr PictureSize kHighDefinitionBox{1280, 720};
+inline constexpr PictureSize kStandardDefinitionBox{640, 480};
 
 inline constexpr int kMostFramesPerSecond = 60;
 

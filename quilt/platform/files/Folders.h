@@ -13,6 +13,9 @@
 
 namespace quilt::platform {
 
+/// How far below its top an operation follows a tree; each level keeps a descriptor or two open.
+inline constexpr int kDeepestFolder = 256;
+
 /// An item named by its opened folder and its name in it.
 struct Place {
   Descriptor folder;

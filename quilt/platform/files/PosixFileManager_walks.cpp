@@ -13,15 +13,12 @@ namespace quilt::platform {
 
 namespace {
 
-// Each level keeps a descriptor open.
-constexpr int kDeepest = 256;
-
 // Links and what is neither file nor folder have no content of their own to sync.
 int syncTree(SystemCalls& system, int folder, const std::string& name, int depth) {
   struct stat status {};
   if (::fstatat(folder, name.c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0) return errno;
   if (!S_ISREG(status.st_mode) && !S_ISDIR(status.st_mode)) return 0;
-  if (depth > kDeepest) return ENAMETOOLONG;
+  if (depth > kDeepestFolder) return ENAMETOOLONG;
   const Descriptor item(system.openAt(folder, name.c_str(), O_RDONLY | O_NONBLOCK | O_NOFOLLOW, 0));
   if (!item) return errno;
   if (S_ISREG(status.st_mode)) return system.sync(item.number()) == 0 ? 0 : errno;
@@ -44,7 +41,7 @@ int removeTemporaries(SystemCalls& system, int folder, int depth, std::size_t& r
       continue;
     }
     const Descriptor child(system.openAt(folder, name.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW, 0));
-    if (!child || depth == kDeepest) continue;  // a file, a link, or nothing that this library made
+    if (!child || depth == kDeepestFolder) continue;  // a file, a link, or nothing that this library made
     if (const int error = removeTemporaries(system, child.number(), depth + 1, removed)) return error;
   }
   return 0;

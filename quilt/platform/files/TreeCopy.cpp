@@ -21,8 +21,6 @@ namespace {
 // Small enough that progress and a stop answer are prompt on a slow disk.
 constexpr std::size_t kKernelStretch = std::size_t{8} << 20;
 constexpr std::size_t kBufferSize = std::size_t{1} << 20;
-// Each level keeps two descriptors open.
-constexpr int kDeepest = 256;
 constexpr mode_t kPermissions = S_ISVTX | S_IRWXU | S_IRWXG | S_IRWXO;
 
 // Whether `folder` or a folder above it is the one with that identity.
@@ -80,7 +78,7 @@ int TreeCopy::copyItemKind(int fromFolder, const std::filesystem::path& source, 
   if (!from || ::fstat(from.number(), &status) != 0) return errno;
   if (S_ISREG(status.st_mode)) return copyFile(from.number(), status, toFolder, name);
   if (!S_ISDIR(status.st_mode)) return ENODEV;
-  if (depth > kDeepest) return ENAMETOOLONG;
+  if (depth > kDeepestFolder) return ENAMETOOLONG;
   if (depth == 0) {
     bool inside = false;
     if (const int error = liesInside(_system, toFolder, status, inside)) return error;

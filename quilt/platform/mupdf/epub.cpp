@@ -9,7 +9,7 @@ namespace quilt::platform::mupdf {
 namespace {
 
 constexpr std::size_t kMaximumXML = 8 << 20;  // bytes of a container or package file, unpacked
-constexpr const char* kDamaged = "The book is damaged";
+constexpr const char* kDamagedBook = "The book is damaged";
 
 /// The packed files of a book.
 class Book {
@@ -17,7 +17,7 @@ class Book {
   explicit Book(const std::filesystem::path& path) : _path(path) {}
 
   Result<void> open() {
-    return _context.run(kDamaged, _path, [&](fz_context* c) {
+    return _context.run(kDamagedBook, _path, [&](fz_context* c) {
       _stream.object = fz_open_file(c, _path.c_str());
       _archive.object = fz_open_zip_archive_with_stream(c, _stream.object);
     });
@@ -26,7 +26,7 @@ class Book {
   bool has(const char* name) {
     bool found = false;
     const Result<void> asked = _context.run(
-        kDamaged, _path, [&](fz_context* c) { found = fz_has_archive_entry(c, _archive.object, name) != 0; });
+        kDamagedBook, _path, [&](fz_context* c) { found = fz_has_archive_entry(c, _archive.object, name) != 0; });
     return asked && found;
   }
 
@@ -34,7 +34,7 @@ class Book {
   Result<void> read(const std::string& name, MupdfContext::Owner<fz_xml>& xml) {
     MupdfContext::Owner<fz_stream> entry(_context, fz_drop_stream);
     MupdfContext::Owner<fz_buffer> buffer(_context, fz_drop_buffer);
-    return _context.run(kDamaged, _path, [&](fz_context* c) {
+    return _context.run(kDamagedBook, _path, [&](fz_context* c) {
       entry.object = fz_open_archive_entry(c, _archive.object, name.c_str());
       buffer.object = fz_new_buffer(c, 1 << 16);
       unsigned char part[4096];

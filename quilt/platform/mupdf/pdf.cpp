@@ -11,13 +11,14 @@ namespace quilt::platform::mupdf {
 namespace {
 
 constexpr int kMaximumText = 64 << 10;
-constexpr const char* kDamaged = "The document is damaged";
+constexpr const char* kDamagedDocument = "The document is damaged";
 
 std::optional<std::string> metadata(MupdfContext& context, pdf_document* document, const char* key) {
   std::string text(kMaximumText, '\0');
   int length = 0;
-  const Result<void> read = context.run(
-      kDamaged, {}, [&](fz_context* c) { length = pdf_lookup_metadata(c, document, key, text.data(), kMaximumText); });
+  const Result<void> read = context.run(kDamagedDocument, {}, [&](fz_context* c) {
+    length = pdf_lookup_metadata(c, document, key, text.data(), kMaximumText);
+  });
   if (!read || length <= 1) return std::nullopt;
   text.resize(text.find('\0'));
   return trimmed(text);
@@ -34,7 +35,7 @@ std::string described(fz_xml* root, const char* element) {
 void readDescription(MupdfContext& context, pdf_document* document, MediaFacts& facts) {
   MupdfContext::Owner<fz_buffer> buffer(context, fz_drop_buffer);
   MupdfContext::Owner<fz_xml> xml(context, fz_drop_xml);
-  const Result<void> read = context.run(kDamaged, {}, [&](fz_context* c) {
+  const Result<void> read = context.run(kDamagedDocument, {}, [&](fz_context* c) {
     pdf_obj* object = pdf_dict_getp(c, pdf_trailer(c, document), "Root/Metadata");
     if (!pdf_is_stream(c, object)) return;
     buffer.object = pdf_load_stream(c, object);
@@ -54,7 +55,7 @@ Result<MediaFacts> inspectPDF(const std::filesystem::path& path) {
   MupdfContext::Owner<fz_stream> stream(context, fz_drop_stream);
   MupdfContext::Owner<pdf_document> document(context, pdf_drop_document);
   bool needsPassword = false;
-  Result<void> opened = context.run(kDamaged, path, [&](fz_context* c) {
+  Result<void> opened = context.run(kDamagedDocument, path, [&](fz_context* c) {
     stream.object = fz_open_file(c, path.c_str());
     document.object = pdf_open_document_with_stream(c, stream.object);
     needsPassword = pdf_needs_password(c, document.object) != 0;
@@ -64,7 +65,7 @@ Result<MediaFacts> inspectPDF(const std::filesystem::path& path) {
 
   int pages = 0;
   fz_rect box = fz_empty_rect;
-  Result<void> read = context.run(kDamaged, path, [&](fz_context* c) {
+  Result<void> read = context.run(kDamagedDocument, path, [&](fz_context* c) {
     pages = pdf_count_pages(c, document.object);
     if (pages < 1) fz_throw(c, FZ_ERROR_GENERIC, "it has no pages");
     fz_matrix matrix;

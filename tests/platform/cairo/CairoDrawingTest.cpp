@@ -21,11 +21,11 @@ Pixel at(const Bitmap& bitmap, std::size_t x, std::size_t y) {
   return {pixel[0], pixel[1], pixel[2], pixel[3]};
 }
 
-constexpr Pixel kRed{255, 0, 0, 255};
-constexpr Pixel kBlue{0, 0, 255, 255};
+constexpr Pixel kRedPixel{255, 0, 0, 255};
+constexpr Pixel kBluePixel{0, 0, 255, 255};
 constexpr Pixel kBlackPixel{0, 0, 0, 255};
 constexpr Pixel kNothing{0, 0, 0, 0};
-constexpr Color kWhite{1, 1, 1, 1};
+constexpr Color kWhiteColor{1, 1, 1, 1};
 
 std::unique_ptr<Canvas> canvas(double width, double height) {
   auto made = CairoDrawing().makeCanvas({width, height});
@@ -38,7 +38,8 @@ Bitmap twoColours(std::size_t width, std::size_t height) {
   Bitmap image{width, height, {}};
   for (std::size_t y = 0; y < height; ++y)
     for (std::size_t x = 0; x < width; ++x)
-      for (const int part : y < height / 2 ? kRed : kBlue) image.pixels.push_back(static_cast<std::uint8_t>(part));
+      for (const int part : y < height / 2 ? kRedPixel : kBluePixel)
+        image.pixels.push_back(static_cast<std::uint8_t>(part));
   return image;
 }
 
@@ -48,7 +49,7 @@ TEST(CairoDrawingTest, ACanvasBeginsTransparentAndCanBeFilled) {
   made->fill({1, 0, 0, 1});
   EXPECT_EQ(made->bitmap().width, 3u);
   EXPECT_EQ(made->bitmap().height, 2u);
-  EXPECT_EQ(at(made->bitmap(), 2, 1), kRed);
+  EXPECT_EQ(at(made->bitmap(), 2, 1), kRedPixel);
 }
 
 TEST(CairoDrawingTest, SizesAreRoundedAndAbsurdOnesRefused) {
@@ -61,15 +62,15 @@ TEST(CairoDrawingTest, SizesAreRoundedAndAbsurdOnesRefused) {
 TEST(CairoDrawingTest, AnImageIsDrawnUpright) {
   const auto made = canvas(8, 8);
   made->drawImage(twoColours(4, 4), {0, 0, 4, 4}, {0, 0, 8, 8});
-  EXPECT_EQ(at(made->bitmap(), 4, 7), kRed) << "its upper half is above";
-  EXPECT_EQ(at(made->bitmap(), 4, 0), kBlue);
+  EXPECT_EQ(at(made->bitmap(), 4, 7), kRedPixel) << "its upper half is above";
+  EXPECT_EQ(at(made->bitmap(), 4, 0), kBluePixel);
 }
 
 TEST(CairoDrawingTest, APartIsCountedFromTheLowerLeft) {
   const auto made = canvas(8, 8);
   made->drawImage(twoColours(4, 4), {0, 0, 4, 2}, {2, 4, 4, 4});
-  EXPECT_EQ(at(made->bitmap(), 2, 4), kBlue) << "the lower half alone";
-  EXPECT_EQ(at(made->bitmap(), 5, 7), kBlue);
+  EXPECT_EQ(at(made->bitmap(), 2, 4), kBluePixel) << "the lower half alone";
+  EXPECT_EQ(at(made->bitmap(), 5, 7), kBluePixel);
   EXPECT_EQ(at(made->bitmap(), 1, 4), kNothing);
   EXPECT_EQ(at(made->bitmap(), 2, 3), kNothing);
 }
@@ -96,7 +97,7 @@ TEST(CairoDrawingTest, TransparencyIsKeptAndComposed) {
 
 TEST(CairoDrawingTest, AnOutlineLiesHalfInside) {
   const auto made = canvas(10, 10);
-  made->fill(kWhite);
+  made->fill(kWhiteColor);
   made->strokeRect({0, 0, 10, 10}, kBlack, 2);
   const Bitmap drawn = made->bitmap();
   EXPECT_EQ(at(drawn, 0, 5), kBlackPixel);
@@ -114,14 +115,14 @@ TEST(CairoDrawingTest, CornersAreRounded) {
   EXPECT_NEAR(at(drawn, 20, 9)[3], 128, 12) << "half of the outline";
   made->drawImage(twoColours(4, 4), {0, 0, 4, 4}, {10, 10, 20, 20}, std::nullopt, 8);
   EXPECT_EQ(at(made->bitmap(), 10, 10)[3], 0) << "an image is cut to them";
-  EXPECT_EQ(at(made->bitmap(), 20, 12), kBlue);
+  EXPECT_EQ(at(made->bitmap(), 20, 12), kBluePixel);
 }
 
 TEST(CairoDrawingTest, AShadowSurroundsTheShapeEvenlyAndFades) {
   const auto made = canvas(100, 100);
   made->fillRoundedRect({30, 30, 40, 40}, 0, {1, 0, 0, 1}, 0.001, Shadow{20, kBlack});
   const Bitmap drawn = made->bitmap();
-  EXPECT_EQ(at(drawn, 50, 50), kRed);
+  EXPECT_EQ(at(drawn, 50, 50), kRedPixel);
   const int near = at(drawn, 50, 28)[3];
   const int far = at(drawn, 50, 20)[3];
   EXPECT_NEAR(near, 107, 12) << "just outside of a long edge not quite half of it is left";

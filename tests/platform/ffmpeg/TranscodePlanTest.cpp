@@ -10,20 +10,20 @@ std::string text(PictureSize size) { return std::to_string(size.width) + "x" + s
 std::string text(AVRational base) { return std::to_string(base.num) + "/" + std::to_string(base.den); }
 
 TEST(TranscodePlanTest, PicturesAreFittedAndSidesAreEven) {
-  EXPECT_EQ(text(fittedSize({1920, 1080}, kHighDefinition)), "1280x720");
-  EXPECT_EQ(text(fittedSize({1920, 1080}, kStandardDefinition)), "640x360");
-  EXPECT_EQ(text(fittedSize({1080, 1920}, kHighDefinition)), "406x720");
-  EXPECT_EQ(text(fittedSize({1440, 1080}, kHighDefinition)), "960x720");
-  EXPECT_EQ(text(fittedSize({768, 576}, kStandardDefinition)), "640x480");
-  EXPECT_EQ(text(fittedSize({854, 480}, kStandardDefinition)), "640x360");
-  EXPECT_EQ(text(fittedSize({3840, 1600}, kHighDefinition)), "1280x534");
+  EXPECT_EQ(text(fittedSize({1920, 1080}, kHighDefinitionBox)), "1280x720");
+  EXPECT_EQ(text(fittedSize({1920, 1080}, kStandardDefinitionBox)), "640x360");
+  EXPECT_EQ(text(fittedSize({1080, 1920}, kHighDefinitionBox)), "406x720");
+  EXPECT_EQ(text(fittedSize({1440, 1080}, kHighDefinitionBox)), "960x720");
+  EXPECT_EQ(text(fittedSize({768, 576}, kStandardDefinitionBox)), "640x480");
+  EXPECT_EQ(text(fittedSize({854, 480}, kStandardDefinitionBox)), "640x360");
+  EXPECT_EQ(text(fittedSize({3840, 1600}, kHighDefinitionBox)), "1280x534");
 }
 
 TEST(TranscodePlanTest, PicturesAreNeverEnlarged) {
-  EXPECT_EQ(text(fittedSize({320, 240}, kHighDefinition)), "320x240");
-  EXPECT_EQ(text(fittedSize({641, 481}, kHighDefinition)), "640x480");
-  EXPECT_EQ(text(fittedSize({319, 1}, kHighDefinition)), "318x2") << "but for a side of one";
-  EXPECT_EQ(text(fittedSize({20000, 10}, kHighDefinition)), "1280x2");
+  EXPECT_EQ(text(fittedSize({320, 240}, kHighDefinitionBox)), "320x240");
+  EXPECT_EQ(text(fittedSize({641, 481}, kHighDefinitionBox)), "640x480");
+  EXPECT_EQ(text(fittedSize({319, 1}, kHighDefinitionBox)), "318x2") << "but for a side of one";
+  EXPECT_EQ(text(fittedSize({20000, 10}, kHighDefinitionBox)), "1280x2");
 }
 
 TEST(TranscodePlanTest, TicksAreFineAndExact) {
@@ -55,7 +55,7 @@ class CopyingPictures : public ::testing::Test {
     traits.isTimedWell = true;
     return traits;
   }
-  static bool isCopied(const VideoTraits& traits, PictureSize box = kStandardDefinition) {
+  static bool isCopied(const VideoTraits& traits, PictureSize box = kStandardDefinitionBox) {
     return planVideo(traits, box).isCopied;
   }
   template <class T, class Value>
@@ -75,7 +75,7 @@ TEST_F(CopyingPictures, IsForWhatFits) {
   VideoTraits larger = common();
   larger.stored = {642, 480};
   EXPECT_FALSE(isCopied(larger));
-  EXPECT_TRUE(isCopied(larger, kHighDefinition));
+  EXPECT_TRUE(isCopied(larger, kHighDefinitionBox));
 }
 
 TEST_F(CopyingPictures, IsNotForWhatSomePlayersShowWrongly) {
@@ -101,12 +101,12 @@ TEST(TranscodePlanTest, TheShownSizeDecides) {
   traits.codec = AV_CODEC_ID_MPEG2VIDEO;
   traits.stored = {720, 576};
   traits.pixelShape = {16, 15};
-  EXPECT_EQ(text(planVideo(traits, kHighDefinition).size), "768x576");
+  EXPECT_EQ(text(planVideo(traits, kHighDefinitionBox).size), "768x576");
   traits.orientation.transpose = true;
-  EXPECT_EQ(text(planVideo(traits, kHighDefinition).size), "540x720");
+  EXPECT_EQ(text(planVideo(traits, kHighDefinitionBox).size), "540x720");
   traits.orientation.transpose = false;
   traits.pixelShape = {0, 0};
-  EXPECT_EQ(text(planVideo(traits, kHighDefinition).size), "720x576");
+  EXPECT_EQ(text(planVideo(traits, kHighDefinitionBox).size), "720x576");
 }
 
 class PlanningSound : public ::testing::Test {

@@ -23,7 +23,7 @@ class NamedImage final : public ImageWrapper {
   [[nodiscard]] Result<Bitmap> bitmap() const override { return Bitmap{}; }
 };
 
-const Error kNothing{ErrorKind::NotFound, "Nothing.", {}};
+const Error kNoAnswer{ErrorKind::NotFound, "Nothing.", {}};
 
 /// A set of services in which every file's extension is its type.
 struct Stage final : Images, MovieToolkit, TypeIdentifiers, Resources, MediaInspector {
@@ -42,7 +42,7 @@ struct Stage final : Images, MovieToolkit, TypeIdentifiers, Resources, MediaInsp
     [[nodiscard]] const std::vector<Chapter>& chapters() const override { return _chapters; }
     [[nodiscard]] std::optional<double> keyFrameTimeAtOrBefore(double) override { return _stage.keyFrame; }
     [[nodiscard]] Result<std::shared_ptr<ImageWrapper>> frameAtTime(double time) override {
-      if (!_stage.hasFrames) return kNothing;
+      if (!_stage.hasFrames) return kNoAnswer;
       return std::shared_ptr<ImageWrapper>(
           std::make_shared<NamedImage>("frame at " + std::to_string(time).substr(0, 4)));
     }
@@ -62,9 +62,9 @@ struct Stage final : Images, MovieToolkit, TypeIdentifiers, Resources, MediaInsp
       std::span<const unsigned char> data) const override {
     return std::shared_ptr<ImageWrapper>(std::make_shared<NamedImage>(std::string(data.begin(), data.end())));
   }
-  [[nodiscard]] Result<std::shared_ptr<ImageWrapper>> imageWithBitmap(Bitmap) const override { return kNothing; }
+  [[nodiscard]] Result<std::shared_ptr<ImageWrapper>> imageWithBitmap(Bitmap) const override { return kNoAnswer; }
   [[nodiscard]] Result<std::unique_ptr<Movie>> openMovie(const std::filesystem::path&) const override {
-    if (!opens) return kNothing;
+    if (!opens) return kNoAnswer;
     return std::unique_ptr<Movie>(std::make_unique<StagedMovie>(*this));
   }
   [[nodiscard]] std::optional<std::string> preferredIdentifier(const std::filesystem::path& path) const override {

@@ -15,7 +15,7 @@ using support::namesIn;
 using support::ScratchFolder;
 using ::testing::UnorderedElementsAre;
 using Which = FailNthFileManager::Which;
-using Repeat = FailNthFileManager::Repeat;
+using FileRepeat = FailNthFileManager::Repeat;
 
 class FailNthFileManagerTest : public ::testing::Test {
  protected:
@@ -38,7 +38,7 @@ TEST_F(FailNthFileManagerTest, FailsOnceWithoutCarryingOut) {
 }
 
 TEST_F(FailNthFileManagerTest, FailsForEverAfter) {
-  files.failNth(2, ErrorKind::InputOutput, Repeat::ForEver);
+  files.failNth(2, ErrorKind::InputOutput, FileRepeat::ForEver);
   EXPECT_TRUE(save("a"));
   EXPECT_FALSE(save("b"));
   EXPECT_FALSE(save("c"));
@@ -52,7 +52,7 @@ TEST_F(FailNthFileManagerTest, CountsReadsOnlyWhenAsked) {
   EXPECT_TRUE(files.readFile(scratch / "a", 10));
   EXPECT_TRUE(files.fileExistsAtPath(scratch / "a"));
   EXPECT_EQ(0U, files.operations());
-  files.failNth(1, ErrorKind::InputOutput, Repeat::ForEver, Which::All);
+  files.failNth(1, ErrorKind::InputOutput, FileRepeat::ForEver, Which::All);
   EXPECT_FALSE(files.readFile(scratch / "a", 10));
   EXPECT_FALSE(files.contentsOfDirectoryAtPath(scratch.path()));
   EXPECT_FALSE(files.attributesOfItemAtPath(scratch / "a"));
@@ -61,7 +61,7 @@ TEST_F(FailNthFileManagerTest, CountsReadsOnlyWhenAsked) {
 
 TEST_F(FailNthFileManagerTest, EveryChangeCanFail) {
   EXPECT_TRUE(save("a"));
-  files.failNth(1, ErrorKind::InputOutput, Repeat::ForEver);
+  files.failNth(1, ErrorKind::InputOutput, FileRepeat::ForEver);
   EXPECT_FALSE(files.createDirectoryAtPath(scratch / "b"));
   EXPECT_FALSE(files.copyItem(scratch / "a", scratch / "b"));
   EXPECT_FALSE(files.moveItem(scratch / "a", scratch / "b"));

@@ -71,7 +71,7 @@ TEST(RandomUuidGeneratorTest, AChildProcessMakesOthersThanItsParent) {
   }
   const std::string ours = generator.generateUUID();
   std::string theirs(36, '\0');
-  EXPECT_EQ(36, read(ends[0], theirs.data(), theirs.size()));
+  EXPECT_EQ(36, ::read(ends[0], theirs.data(), theirs.size()));
   waitpid(child, nullptr, 0);
   close(ends[0]);
   close(ends[1]);
