@@ -71,18 +71,7 @@ std::vector<ItemModel::Row> ItemModel::currentRows() const {
 void ItemModel::setRows(std::vector<Row> rows) {
   for (Row& row : rows) {
     const auto known = std::find(_rows.begin(), _rows.end(), row);
-    row.watch = known != _rows.end()
-                    ? known->watch
-                    : std::make_shared<Watch>(row.object,
-                                              std::initializer_list<std::string_view>{
-                                                  "title", "creationDate", "isProcessing", "posterImageVersion"},
-                                              [this, object = row.object.get()] {
-                                                const auto found = std::find_if(
-                                                    _rows.begin(), _rows.end(),
-                                                    [object](const Row& one) { return one.object.get() == object; });
-                                                if (found != _rows.end())
-                                                  renew(static_cast<int>(found - _rows.begin()));
-                                              });
+    row.watch = known != _rows.end() ? known->watch : watch(row.object);
   }
   const auto differs = std::mismatch(_rows.begin(), _rows.end(), rows.begin(), rows.end());
   const auto first = static_cast<int>(differs.first - _rows.begin());
@@ -117,7 +106,15 @@ void ItemModel::setRows(std::vector<Row> rows) {
   }
 }
 
-void ItemModel::renew(int row) { emit dataChanged(index(row), index(row)); }
+std::shared_ptr<Watch> ItemModel::watch(const std::shared_ptr<quilt::platform::Object>& object) {
+  const auto renew = [this, shown = object.get()] {
+    for (int row = 0; row < rowCount(); ++row)
+      if (_rows[static_cast<std::size_t>(row)].object.get() == shown) emit dataChanged(index(row), index(row));
+  };
+  return std::make_shared<Watch>(
+      object, std::initializer_list<std::string_view>{"title", "creationDate", "isProcessing", "posterImageVersion"},
+      renew);
+}
 
 std::shared_ptr<QuiltDocument> ItemModel::documentAt(const QModelIndex& index) const {
   if (!index.isValid() || _document) return nullptr;

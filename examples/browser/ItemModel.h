@@ -63,7 +63,8 @@ class ItemModel : public QAbstractListModel {
   void follow(const std::shared_ptr<quilt::platform::Object>& owner, std::string_view key);
   [[nodiscard]] std::vector<Row> currentRows() const;
   void setRows(std::vector<Row> rows);
-  void renew(int row);
+  /// Paints the object's row again when the object changes.
+  std::shared_ptr<Watch> watch(const std::shared_ptr<quilt::platform::Object>& object);
   [[nodiscard]] QString titleOf(const Row& row) const;
 
   Posters& _posters;

@@ -18,7 +18,7 @@ int main(int count, char** arguments) {
   const QStringList words = QApplication::arguments();
   const QString folder = words.size() > 1 ? QDir(words[1]).absolutePath() : QDir::home().filePath("Quilt");
   browser::LibraryWindow window(quilt::QuiltCollectionsController::defaultController());
-  window.resize(1140, 720);
+  window.resize(1140, 744);
   window.show();
   window.load(browser::toPath(folder));
   return QApplication::exec();

@@ -133,7 +133,7 @@ class BrowserTest : public quilt::support::ModelFixture {
   void openWindow() {
     controller = quilt::QuiltCollectionsController::init();
     window = std::make_unique<LibraryWindow>(controller);
-    window->resize(1140, 720);
+    window->resize(1140, 744);
     window->show();
     window->load(library());
   }
