@@ -3,6 +3,7 @@
 
 #include <string>
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Result.h"
 
 namespace quilt {
@@ -17,7 +18,8 @@ std::string dataScript(QuiltDocument& document, bool hasPoster);
 platform::Result<void> writeDataScript(QuiltDocument& document, const std::string& script);
 
 /// Has the files that finalizing derives from the document's texts, the script and the store metadata, say what the
-/// document says now. Makes neither for a document that was never finalized.
-platform::Result<void> refreshFinalizedTexts(QuiltDocument& document);
+/// document says now. Makes neither for a document that was never finalized. Shown to the bridge, which is a library of
+/// its own.
+QUILT_EXPORT platform::Result<void> refreshFinalizedTexts(QuiltDocument& document);
 
 }  // namespace quilt
