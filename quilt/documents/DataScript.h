@@ -12,13 +12,14 @@ class QuiltDocument;
 
 /// The script that the theme's page reads ("controllers/data.js"): the document's record without the theme's path, and
 /// what the page has to know besides. With a poster, it tells where that lies. Any thread.
-QUILT_EXPORT std::string dataScript(QuiltDocument& document, bool hasPoster);
+std::string dataScript(QuiltDocument& document, bool hasPoster);
 
 /// Writes a script to its place in the package.
-QUILT_EXPORT platform::Result<void> writeDataScript(QuiltDocument& document, const std::string& script);
+platform::Result<void> writeDataScript(QuiltDocument& document, const std::string& script);
 
 /// Has the files that finalizing derives from the document's texts, the script and the store metadata, say what the
-/// document says now. Makes neither for a document that was never finalized.
+/// document says now. Makes neither for a document that was never finalized. Shown to the bridge, which is a library of
+/// its own.
 QUILT_EXPORT platform::Result<void> refreshFinalizedTexts(QuiltDocument& document);
 
 }  // namespace quilt

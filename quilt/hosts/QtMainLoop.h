@@ -35,6 +35,7 @@ class QtMainLoop {
 
   /// Turns Qt's loop until `isDone` answers true; it is asked after every turn. Any thread ends a turn with wake().
   void runUntil(const std::function<bool()>& isDone) const { _loop->runUntil(isDone); }
+  /// Ends the turn of runUntil() that waits now, or the next one. Any thread.
   void wake() const { _loop->wake(); }
 
  private:
