@@ -66,7 +66,7 @@ ExitCode Output::finish(const std::optional<Failure>& failure) {
   if (_json && !_isPublished) printDocument(failure);
   if (failure) {
     for (const Failure& cause : failure->causes) _messages.error(cause.message);
-    _messages.error(failure->message);
+    if (!failure->message.empty()) _messages.error(failure->message);
   }
   if (failure) return failure->code;
   if (_writeError == 0) return ExitCode::Done;

@@ -94,8 +94,14 @@ class Check {
       const bool isWritten = preview.boolean("IsFlattened").value_or(false);
       if (isWritten && preview.string("Filename")) checkFile(preview, "Filename", folder / "previews");
     });
-    if (const Dictionary* samples = source.dictionary("AudioSamples"); samples && samples->string("SampleFilename"))
-      checkFile(*samples, "SampleFilename", folder / "audiosamples");
+    if (const Dictionary* samples = source.dictionary("AudioSamples")) checkSamples(*samples, folder / "audiosamples");
+  }
+
+  /// A record that was read and written again no longer names the file; the model finds it by its identity.
+  void checkSamples(const Dictionary& samples, const Path& folder) {
+    if (samples.string("SampleFilename")) return checkFile(samples, "SampleFilename", folder);
+    const std::string uuid = samples.string("UUID").value_or("");
+    if (platform::isPlainComponent(uuid)) _referenced.insert(folder / (uuid + ".asc"));
   }
 
   void checkFile(const Dictionary& record, const char* key, const Path& folder) {

@@ -15,6 +15,9 @@ namespace {
 using platform::MediaFacts;
 using platform::services;
 
+// What inspection tells of a PDF's pages, which is told of every document here.
+constexpr const char* kPagesDetail = "Pages";
+
 /// Everything the library sees in a file.
 struct Sight {
   Path path;
@@ -24,8 +27,15 @@ struct Sight {
   std::string category;
   std::vector<std::string> tags;
   bool importable = false;
+  std::optional<std::size_t> pages;  ///< of a document
   MediaFacts facts;
 };
+
+// Office documents are converted to be counted, which takes seconds.
+std::size_t pageCount(const Path& file) {
+  platform::FDYPreviewPrepareDocument(file, [] { return !Interrupt::isRequested(); });
+  return Interrupt::isRequested() ? 0 : platform::FDYPreviewDocumentPagesCount(file);
+}
 
 // Throws a Failure, with the reason, when the file cannot be used.
 Sight look(const std::string& name) {
@@ -48,6 +58,7 @@ Sight look(const std::string& name) {
   if (const auto derivative = QuiltMediaDerivative::initWithURL(Url::fileUrl(sight.path)))
     sight.tags = derivative->compatibilityTags().value_or(std::vector<std::string>());
   sight.importable = QuiltDocument::canImportFromPath(sight.path);
+  if (sight.category == kQuiltMediaContentCategoryDocument) sight.pages = pageCount(sight.path);
   return sight;
 }
 
@@ -70,6 +81,7 @@ Json json(const Sight& sight) {
             {"width", facts.width},
             {"height", facts.height},
             {"duration", facts.duration},
+            {"pages", sight.pages ? Json(*sight.pages) : Json()},
             {"information", orNull(facts.metadataInformation)},
             {"author", orNull(facts.metadataAuthor)},
             {"chapters", Json::array()},
@@ -102,7 +114,9 @@ std::string lines(const Sight& sight) {
   summary.add("Title", facts.metadataTitle.value_or(""));
   summary.add("Information", facts.metadataInformation.value_or(""));
   summary.add("Author", facts.metadataAuthor.value_or(""));
-  for (const auto& [name, text] : facts.details) summary.add(name, text);
+  if (sight.pages) summary.add("Pages", std::to_string(*sight.pages));
+  for (const auto& [name, text] : facts.details)
+    if (name != kPagesDetail) summary.add(name, text);
   for (const platform::Chapter& chapter : facts.chapters)
     summary.add("Chapter", padded(durationText(chapter.start), 8) + chapter.name);
   return escaped(sight.path.native()) + "\n" + summary.text();
@@ -115,15 +129,17 @@ void ActingDelegate::perform(const InfoRequest& request) {
   std::vector<Failure> failures;
   std::size_t done = 0;
   for (const std::string& file : request.files) {
-    if (Interrupt::isRequested())
-      throw Interrupt::failure(fmt::format("{} of {} files were looked at", done, request.files.size()));
+    std::optional<Sight> sight;
     try {
-      const Sight sight = look(file);
-      _context.output.item(json(sight), lines(sight));
-      ++done;
+      if (!Interrupt::isRequested()) sight = look(file);
     } catch (const Failure& failure) {
       failures.push_back(failure);
     }
+    if (Interrupt::isRequested())
+      throw Interrupt::failure(fmt::format("{} of {} files were looked at", done, request.files.size()));
+    if (!sight) continue;
+    _context.output.item(json(*sight), lines(*sight));
+    ++done;
   }
   throwIfAny(failures, done, "files cannot be used");
 }

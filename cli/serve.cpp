@@ -100,7 +100,12 @@ void ActingDelegate::perform(const ServeRequest& request) {
     _context.messages.warning("There is no \"xdg-open\" to open the address with; open it in a browser");
   _context.messages.note("Serving " + inQuotes(found.document->title, found.document->uuid) + " until Ctrl-C");
   waitForInterrupt();
-  throw Interrupt::failure("Every edit is saved");
+  if (!(*bridge)->settle())
+    throw explain(
+        "The last edits of the document " + inQuotes(found.document->title, found.document->uuid) + " cannot be saved",
+        _context.log, document->propertiesPath(), document->path());
+  _context.messages.note("Stopped. Every edit is saved");
+  throw Failure(Interrupt::exitCode(), "");  // which is how serving ends, and no mishap
 }
 
 void PreviewDelegate::perform(const ServeRequest& request) {

@@ -1,5 +1,10 @@
 # SPDX-License-Identifier: Apache-2.0
-# Debian ships MuPDF as a static library; what it needs in turn is linked here.
+# Debian ships MuPDF as a static library; what it needs in turn is linked here. Installed beside QuiltConfig.cmake too: who
+# links the static platform library needs the same.
+
+if(TARGET MuPDF::MuPDF)
+  return()
+endif()
 
 find_library(MUPDF_LIBRARY mupdf REQUIRED)
 find_library(MUPDF_THIRD_LIBRARY mupdf-third)

@@ -9,6 +9,11 @@ endif()
 function(quilt_configure_target target)
   target_include_directories(${target} PUBLIC ${PROJECT_SOURCE_DIR})
   target_compile_options(${target} PRIVATE ${QUILT_WARNINGS})
+  quilt_sanitize(${target})
+endfunction()
+
+# Has the target, and everything linked with it, watched by the sanitizers that the build was configured with.
+function(quilt_sanitize target)
   if(QUILT_SANITIZE STREQUAL "address")
     target_compile_options(${target} PUBLIC -fsanitize=address,undefined -fno-sanitize-recover=all -fno-omit-frame-pointer)
     target_link_options(${target} PUBLIC -fsanitize=address,undefined)

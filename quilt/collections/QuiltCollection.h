@@ -6,6 +6,7 @@
 #include <set>
 
 #include "quilt/documents/QuiltDocument.h"
+#include "quilt/platform/base/Export.h"
 
 namespace quilt {
 
@@ -16,7 +17,7 @@ class QuiltCollectionsController;
 ///
 /// A collection saves itself: setting title, description, author, copyright, keywords, category, advisoryLabel,
 /// preferredTheme or lastPublishURL rewrites "collection.plist" at once, on the setting thread, unless it is loading.
-class QuiltCollection : public platform::Object {
+class QUILT_EXPORT QuiltCollection : public platform::Object {
  public:
   // Construction
   /// A detached collection: fresh identity, made now, no folder.
@@ -26,23 +27,31 @@ class QuiltCollection : public platform::Object {
   static std::shared_ptr<QuiltCollection> initWithPath(const Path& path);
 
   // Properties
+  /// Names the folder in its library.
   std::string uuid() const { return _uuid.get(); }
   void setUuid(std::string uuid) { _uuid.set(std::move(uuid)); }
+  /// The folder; empty while detached. Setting moves nothing on disk.
   Path path() const { return _path.get(); }
   void setPath(Path path) { _path.set(std::move(path)); }
+  /// When it was made; init() says now.
   std::optional<Date> creationDate() const { return _creationDate.get(); }
   void setCreationDate(std::optional<Date> date) { _creationDate.set(date); }
   /// The later of the stored stamp and the latest document's; changes with the document list.
   std::optional<Date> modifiedDate() const;
   /// Sets the stored stamp.
   void setModifiedDate(std::optional<Date> date) { _modifiedDate.set(date); }
+  /// @{
+  /// What people read, UTF-8; none: not given. Setting saves, as above.
   Text title() const { return _title.get(); }
   void setTitle(Text title) { _title.set(std::move(title)); }
   Text description() const { return _description.get(); }
   void setDescription(Text description) { _description.set(std::move(description)); }
+  /// @}
   /// New documents take it.
   Text author() const { return _author.get(); }
   void setAuthor(Text author) { _author.set(std::move(author)); }
+  /// @{
+  /// More of the same, for the documents of the collection as a whole.
   Text copyright() const { return _copyright.get(); }
   void setCopyright(Text copyright) { _copyright.set(std::move(copyright)); }
   Text keywords() const { return _keywords.get(); }
@@ -51,17 +60,21 @@ class QuiltCollection : public platform::Object {
   void setCategory(Text category) { _category.set(std::move(category)); }
   Text advisoryLabel() const { return _advisoryLabel.get(); }
   void setAdvisoryLabel(Text advisoryLabel) { _advisoryLabel.set(std::move(advisoryLabel)); }
+  /// @}
   /// New documents take it.
   std::shared_ptr<QuiltTheme> preferredTheme() const { return _preferredTheme.get(); }
   void setPreferredTheme(std::shared_ptr<QuiltTheme> theme) { _preferredTheme.set(std::move(theme)); }
+  /// Where a host last published it; none: nowhere.
   Text lastPublishURL() const { return _lastPublishURL.get(); }
   void setLastPublishURL(Text url) { _lastPublishURL.set(std::move(url)); }
+  /// The owner, which sets and clears it; null while detached. Never keeps it alive.
   std::shared_ptr<QuiltCollectionsController> collectionControllerOwner() const {
     return _collectionControllerOwner.get();
   }
   void setCollectionControllerOwner(const std::shared_ptr<QuiltCollectionsController>& owner) {
     _collectionControllerOwner.set(owner);
   }
+  /// Whether the collection is being read; it does not save itself meanwhile. A host does not set it.
   bool isLoading() const { return _isLoading.get(); }
   void setIsLoading(bool isLoading) { _isLoading.set(isLoading); }
 
@@ -74,42 +87,56 @@ class QuiltCollection : public platform::Object {
   Path posterImagePath() const;
 
   // Loading and saving
+  /// @{
+  /// "collection.plist" and "poster.png" in the folder, there or not; empty while detached.
   Path _collectionFilepath() const;
   Path _posterImageFilepath() const;
+  /// @}
   /// Reads the collection file. Never rewrites it.
   bool loadDictionary();
   /// Opens every document in the folder; what does not open is passed over.
   bool _loadDocuments();
+  /// The record as it is written, with the entries that a newer version left in it.
   Dictionary dictionary() const;
   /// Stamps and saves; true without saving while loading. False after a critical line.
   bool update();
   /// Whether modifiedDate and creationDate are a second or more apart.
   bool hasBeenModified() const;
+  /// Makes the collection count as never modified, as far as its documents do, and saves.
   void resetModifiedDate();
+  /// Drops the caches of every document. Files stay.
   void invalidateCaches();
   /// {"documents"}.
   static std::set<std::string> keyPathsForValuesAffectingModifiedDate();
 
   // Documents
+  /// A copy of the list. Setting replaces the list and leaves packages and back-pointers as they are.
   std::vector<std::shared_ptr<QuiltDocument>> documents() const { return _documents.copy(); }
   void setDocuments(std::vector<std::shared_ptr<QuiltDocument>> documents) { _documents.assign(std::move(documents)); }
+  /// @{
+  /// How many there are; one of them, null when the index is not below the count.
   std::size_t documentsCount() const { return _documents.count(); }
   std::shared_ptr<QuiltDocument> documentAtIndex(std::size_t index) const { return _documents.at(index); }
+  /// @}
+  /// Null when none has it.
   std::shared_ptr<QuiltDocument> documentWithUUID(const std::string& uuid) const;
   /// Calls the block on each with the lock held; stops at the first false and answers false.
   bool performBlockOnDocuments(const std::function<bool(const std::shared_ptr<QuiltDocument>&)>& block) const;
   /// At most `count`, newest first.
   std::vector<std::shared_ptr<QuiltDocument>> lastCreatedDocuments(std::size_t count) const;
+  /// Attaches and appends it. Its package is not moved. Null is ignored.
   void addDocument(const std::shared_ptr<QuiltDocument>& document);
   /// Takes the document out of the list; with `andDelete` also deletes its package. A package that cannot be deleted,
   /// or that lies outside the collection's folder, stays, with a warning.
   void removeDocument(const std::shared_ptr<QuiltDocument>& document, bool andDelete);
+  /// removeDocument() for each that is there now.
   void removeAllDocumentsAndDelete(bool andDelete);
   /// Takes out the classic documents that hold no media and deletes their packages. A package whose record names media
   /// that did not load is damaged, not empty: it stays on disk.
   void removeAllBrokenDocuments();
   /// Makes and saves an empty document with the collection's author and theme. Null after a critical line.
   std::shared_ptr<QuiltDocument> newDocumentWithType(const Text& type);
+  /// @{
   /// Makes a document of a file: inspects it, adds it as the one item, and copies it into the package, which is named
   /// by `withUUID` (a fresh one for none). A file of a type that cannot be imported gives an empty document. Null,
   /// after a critical line, on failure or when the block answers false; the package is then gone, unless it was there
@@ -117,6 +144,7 @@ class QuiltCollection : public platform::Object {
   std::shared_ptr<QuiltDocument> importDocumentFromPath(const Path& path, const Text& withUUID,
                                                         const ProgressionBlock& withProgressionBlock);
   std::shared_ptr<QuiltDocument> importDocumentFromPath(const Path& path, const ProgressionBlock& withProgressionBlock);
+  /// @}
 
  protected:
   QuiltCollection();

@@ -5,6 +5,7 @@
 
 #include "quilt/media/QuiltMedia.h"
 #include "quilt/platform/base/ChildList.h"
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/MainThread.h"
 #include "quilt/platform/base/Property.h"
 #include "quilt/sources/ModelTypes.h"
@@ -15,16 +16,22 @@ namespace quilt {
 
 class QuiltCollection;
 
-/// Document types, compared by string equality.
-inline constexpr const char* kQuiltDocumentTypeInteractive = "Interactive";  ///< a package built from a theme
+/// @{
+/// Document types, compared by string equality: a package built from a theme; one movie; one sound; one PDF; one EPUB;
+/// one file of another kind.
+inline constexpr const char* kQuiltDocumentTypeInteractive = "Interactive";
 inline constexpr const char* kQuiltDocumentTypeClassicMovie = "Movie";
 inline constexpr const char* kQuiltDocumentTypeClassicAudio = "Audio";
 inline constexpr const char* kQuiltDocumentTypeFilePDF = "PDF";
 inline constexpr const char* kQuiltDocumentTypeFileEPUB = "EPUB";
 inline constexpr const char* kQuiltDocumentTypeStaticFile = "Static";
+/// @}
 
+/// @{
+/// The extension of a package's folder, without its dot, and the properties file in it.
 inline constexpr const char* kQuiltDocumentExtension = "qpk";
 inline constexpr const char* kQuiltDocumentPropertiesFilename = "properties.plist";
+/// @}
 
 /// One document: a package folder with a properties file, a media folder and what finalizing writes. Owned by its
 /// collection, or free-standing. Any thread may call it; the media list has a recursive lock.
@@ -32,9 +39,10 @@ inline constexpr const char* kQuiltDocumentPropertiesFilename = "properties.plis
 /// A document saves itself: setting title, description, author, keywords, category, advisoryLabel, jukeboxOrder, theme,
 /// creationDate or lastPublishURL rewrites the properties file at once, on the setting thread, unless the document is
 /// processing. While a long operation or a load runs, isProcessing is true and saving is refused.
-class QuiltDocument : public platform::Object, public ImageBrowserItem, public platform::PasteboardItem {
+class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserItem, public platform::PasteboardItem {
  public:
   // Construction
+  /// A free-standing document: a fresh identity and nothing else.
   static std::shared_ptr<QuiltDocument> init();
   /// Opens the package, or makes an empty one when nothing is there (its properties file comes with the first save).
   /// Null when it cannot be opened or made; the reason is logged, but for a wrong format version.
@@ -43,18 +51,27 @@ class QuiltDocument : public platform::Object, public ImageBrowserItem, public p
   static Text uuidForDocumentAtPath(const Path& path);
 
   // Which files may be imported as a new document
+  /// @{
+  /// Type identifiers: of PDF and EPUB files, of movies and audio, of all these.
   static const std::vector<std::string>& allSupportedStaticDocumentImportUTIs();
   static const std::vector<std::string>& allSupportedClassicImportUTIs();
   static const std::vector<std::string>& allSupportedImportUTIs();
+  /// @}
+  /// Whether the file's type is among allSupportedImportUTIs(). Reads its first bytes at most.
   static bool canImportFromPath(const Path& path);
 
   // Properties
+  /// Names the package in its collection.
   std::string uuid() const { return _uuid.get(); }
   void setUuid(std::string uuid) { _uuid.set(std::move(uuid)); }
+  /// The package folder; empty while the document has none. Setting moves nothing on disk.
   Path path() const { return _path.get(); }
   void setPath(Path path) { _path.set(std::move(path)); }
+  /// The extension of the package's folder, as initWithPath() found it; none otherwise.
   Text uti() const { return _uti.get(); }
   void setUti(Text uti) { _uti.set(std::move(uti)); }
+  /// @{
+  /// What people and stores read, UTF-8; none: not given. Setting saves, as above.
   Text title() const { return _title.get(); }
   void setTitle(Text title) { _title.set(std::move(title)); }
   Text description() const { return _description.get(); }
@@ -67,21 +84,29 @@ class QuiltDocument : public platform::Object, public ImageBrowserItem, public p
   void setCategory(Text category) { _category.set(std::move(category)); }
   Text advisoryLabel() const { return _advisoryLabel.get(); }
   void setAdvisoryLabel(Text advisoryLabel) { _advisoryLabel.set(std::move(advisoryLabel)); }
+  /// @}
+  /// The place among its collection's documents in a store.
   std::int64_t jukeboxOrder() const { return _jukeboxOrder.get(); }
   void setJukeboxOrder(std::int64_t order) { _jukeboxOrder.set(order); }
+  /// When it was made; none when no one said.
   std::optional<Date> creationDate() const { return _creationDate.get(); }
   void setCreationDate(std::optional<Date> date) { _creationDate.set(date); }
   /// The time of the last save.
   std::optional<Date> modifiedDate() const { return _modifiedDate.get(); }
   void setModifiedDate(std::optional<Date> date) { _modifiedDate.set(date); }
+  /// Where a host last published it; none: nowhere.
   Text lastPublishURL() const { return _lastPublishURL.get(); }
   void setLastPublishURL(Text url) { _lastPublishURL.set(std::move(url)); }
+  /// The theme that was chosen, null without one. Setting alone copies nothing: see applyTheme().
   std::shared_ptr<QuiltTheme> theme() const { return _theme.get(); }
   void setTheme(std::shared_ptr<QuiltTheme> theme) { _theme.set(std::move(theme)); }
+  /// One of the document types; none for a document without one. Saved with the next save.
   Text type() const { return _type.get(); }
   void setType(Text type) { _type.set(std::move(type)); }
+  /// Whether a load, a save or a long operation runs. A host does not set it.
   bool isProcessing() const { return _isProcessing.get(); }
   void setIsProcessing(bool isProcessing) { _isProcessing.set(isProcessing); }
+  /// The owner, which sets and clears it; null while detached. Never keeps it alive.
   std::shared_ptr<QuiltCollection> collectionOwner() const { return _collectionOwner.get(); }
   void setCollectionOwner(const std::shared_ptr<QuiltCollection>& owner) { _collectionOwner.set(owner); }
 
@@ -92,7 +117,10 @@ class QuiltDocument : public platform::Object, public ImageBrowserItem, public p
   /// False for every document: compare the type to learn whether one is interactive.
   bool isInteractive() const { return false; }
 
-  // Places in the package; empty without a path
+  // Places in the package
+  /// @{
+  /// Where the document keeps its properties, its items, its poster, the data and the words for the theme, the artwork
+  /// and metadata for stores, and the thumbnail. Empty without a path; what is there depends on what was done.
   Path propertiesPath() const;
   Path mediaFolderPath() const;
   Path posterImagePath() const;
@@ -101,8 +129,10 @@ class QuiltDocument : public platform::Object, public ImageBrowserItem, public p
   Path jukeboxArtworkPath() const;
   Path jukeboxMetadataPath() const;
   Path glanceThumbnailPath() const;
+  /// @}
 
   // Loading and saving
+  /// loadDictionaryAtPath() with the package's own properties file.
   bool loadDictionary();
   /// Adds the file's media to those held. A file whose "Media" is no array is damaged and does not load.
   bool loadDictionaryAtPath(const Path& path);
@@ -121,29 +151,45 @@ class QuiltDocument : public platform::Object, public ImageBrowserItem, public p
   void reload();
   /// Whether modifiedDate and creationDate are a second or more apart.
   bool hasBeenModified() const;
+  /// Makes the document count as never modified, and saves unless it is processing.
   void resetModifiedDate();
+  /// Drops the cached poster and every cache of the items. Files stay.
   void invalidateCaches();
+  /// What the document's own observations call: saves when the key is one that saves and nothing else is under way.
   void observeValueForKeyPath(std::string_view keyPath, platform::Object& ofObject, platform::ChangePhase change,
                               void* context);
 
   // Media
+  /// A copy of the list. Setting replaces the list and leaves files and back-pointers as they are.
   std::vector<std::shared_ptr<QuiltMedia>> media() const { return _media.copy(); }
   void setMedia(std::vector<std::shared_ptr<QuiltMedia>> media) { _media.assign(std::move(media)); }
+  /// @{
+  /// How many there are; one of them, null when the index is not below the count.
   std::size_t mediaCount() const { return _media.count(); }
   std::shared_ptr<QuiltMedia> mediaAtIndex(std::size_t index) const { return _media.at(index); }
+  /// @}
+  /// Null when none has it.
   std::shared_ptr<QuiltMedia> mediaWithUUID(const std::string& uuid) const;
   /// Calls the block on each with the lock held; stops at the first false and answers false.
   bool performBlockOnMedia(const std::function<bool(const std::shared_ptr<QuiltMedia>&)>& block) const;
+  /// @{
+  /// Attaches it and puts it at the end, or before the index; saves unless the document is processing. Null is ignored.
+  /// An index beyond the count changes nothing and logs a critical line.
   void addMedia(const std::shared_ptr<QuiltMedia>& media);
   void addMedia(const std::shared_ptr<QuiltMedia>& media, std::size_t atIndex);
+  /// @}
+  /// Moves a group, in its order, to a position counted before the move, and saves likewise. An index outside the list
+  /// changes nothing and logs a critical line.
   void moveMediaAtIndexes(const IndexSet& indexes, std::size_t toIndex);
   /// Deletes the item's folder and removes it from the list.
   void removeMedia(const std::shared_ptr<QuiltMedia>& media);
+  /// removeMedia() for each that is there now.
   void removeAllMedia();
   /// Removes the items without sources.
   void removeAllEmptyMedia();
   /// Removes the items of which a source, or a montage's commentary, has lost its file.
   void removeAllBrokenMedia();
+  /// Removes the extras that have lost their file, of every item.
   void removeAllBrokenMediaExtra();
   /// Seconds, over all items.
   double duration() const;
@@ -152,6 +198,7 @@ class QuiltDocument : public platform::Object, public ImageBrowserItem, public p
   /// Cached, else "poster.png", else the built-in placeholder. Null, after a warning, when "poster.png" is no image.
   std::shared_ptr<ImageWrapper> posterImage();
   void setPosterImage(std::shared_ptr<ImageWrapper> image) { _posterImage.set(std::move(image)); }
+  /// Rises whenever the poster changes, so that a host shows it anew; 1 for a new document.
   std::uint64_t posterImageVersion() const { return _posterImageVersion.get(); }
   void setPosterImageVersion(std::uint64_t version) { _posterImageVersion.set(version); }
   /// Keeps the image in standard definition and writes it to "poster.png"; null only caches the placeholder.
@@ -160,8 +207,11 @@ class QuiltDocument : public platform::Object, public ImageBrowserItem, public p
   bool glanceUpdate();
 
   // Pasteboard: the UUID alone, under the drag type
+  /// The one type under which a document travels.
   static std::string dragTypeIdentifier() { return kQuiltDocumentDragType; }
+  /// The drag type alone.
   static std::vector<std::string> readableTypesForPasteboard(const platform::Pasteboard& pasteboard);
+  /// The UUID is a text.
   static unsigned readingOptionsForType(const std::string&, const platform::Pasteboard&) {
     return platform::kPasteboardReadingAsString;
   }
@@ -189,6 +239,8 @@ class QuiltDocument : public platform::Object, public ImageBrowserItem, public p
   // Themes
   /// Copies the theme's template into the package after clearing the previous one's files.
   bool applyTheme(const std::shared_ptr<QuiltTheme>& theme, const ProgressionBlock& withProgressionBlock);
+  /// Deletes what a theme copied into the package. False, after a critical line, when the package cannot be listed;
+  /// what cannot be deleted stays, with a warning.
   bool removeTheme();
   /// Succeeds without writing anything.
   bool generateLocalizationControllerFromTheme(const std::shared_ptr<QuiltTheme>& theme);
@@ -205,6 +257,7 @@ class QuiltDocument : public platform::Object, public ImageBrowserItem, public p
   bool flattenWithProgressionBlock(const ProgressionBlock& withProgressionBlock);
   /// The formats that every item offers, in the first item's order.
   std::vector<std::string> availableFormats() const;
+  /// Has every item make the format; false at the first that cannot, or when the block answers false.
   bool convertToFormat(const std::string& format, const ProgressionBlock& withProgressionBlock);
   /// Builds a finished copy, as a folder or zipped, in the folder `path` under a unique name made from the title. The
   /// path of what was made, or empty. Flattens, converts and finalizes this document on the way.

@@ -1,10 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "quilt/collections/QuiltCollection.h"
+#include "quilt/documents/DataScript.h"
 #include "quilt/documents/QuiltDocument.h"
 #include "quilt/platform/base/FDYLogger.h"
-#include "quilt/platform/base/Paths.h"
 #include "quilt/platform/interfaces/Services.h"
-#include "quilt/sources/ModelFiles.h"
 
 namespace quilt {
 
@@ -12,25 +10,6 @@ using platform::FDYLogger;
 using platform::integerPercentage;
 using platform::report;
 using platform::services;
-
-namespace {
-
-/// What the template learns of the collection: the pairs up to the first that has no value.
-Dictionary ownerRecord(const std::shared_ptr<QuiltCollection>& collection) {
-  Dictionary record;
-  if (!collection) return record;
-  record.append("UUID", collection->uuid());
-  const Text title = collection->title();
-  if (!title) return record;
-  record.append("Title", *title);
-  const Text description = collection->description();
-  if (!description) return record;
-  record.append("Description", *description);
-  if (const auto date = collection->creationDate()) record.append("CreationDate", *date);
-  return record;
-}
-
-}  // namespace
 
 bool QuiltDocument::finalizeWithProgressionBlock(const ProgressionBlock& withProgressionBlock) {
   constexpr const char* busy = "Failed to finalize document at path \"%@\": \"Document is already being processed\"";
@@ -104,22 +83,14 @@ bool QuiltDocument::finalizeInteractive() {
   }
   if (!applyTheme(chosen, [](double) { return true; })) return false;
 
-  Dictionary data = dictionary();
-  data.remove("ThemePath");
-  if (const auto poster = posterImage()) {
-    data.set("PosterImagePath", platform::pathRelativeTo(posterImagePath(), path()).native());
-    if (!poster->saveAsPNGAtURL(Url::fileUrl(jukeboxArtworkPath()))) {
-      FDYLogger::logDebug("Failed to finalize document at path \"%@\": Failed to copy Jukebox Artwork into place.",
-                          path());
-      return false;
-    }
+  const auto poster = posterImage();
+  const std::string script = dataScript(*this, poster != nullptr);
+  if (poster && !poster->saveAsPNGAtURL(Url::fileUrl(jukeboxArtworkPath()))) {
+    FDYLogger::logDebug("Failed to finalize document at path \"%@\": Failed to copy Jukebox Artwork into place.",
+                        path());
+    return false;
   }
-  data.set("CollectionOwner", ownerRecord(collectionOwner()));
-
-  const std::string script = platform::formatMessage("var appData = %@;", {services().json->toJSON(data)});
-  auto written = createDirectoryInPackage(dataControllerPath().parent_path(), shared(this));
-  if (written) written = services().files->writeAtomically(dataControllerPath(), script);
-  if (!written) {
+  if (const auto written = writeDataScript(*this, script); !written) {
     FDYLogger::logDebug("Failed to finalize document at path \"%@\" with data controller: \"%@\"", path(),
                         written.error());
     return false;

@@ -4,6 +4,7 @@
 #include "quilt/documents/QuiltDocument.h"
 #include "quilt/platform/base/Paths.h"
 #include "quilt/platform/interfaces/Services.h"
+#include "quilt/sources/ModelFiles.h"
 #include "quilt/sources/RecordNames.h"
 
 namespace quilt {
@@ -32,8 +33,6 @@ Array recordsOf(const List& list) {
   });
   return records;
 }
-
-Path below(const Path& folder, const std::string& name) { return folder.empty() ? Path() : folder / name; }
 
 }  // namespace
 
@@ -104,14 +103,10 @@ Text QuiltMedia::contentCategory() const {
   return category;
 }
 
-Path QuiltMedia::path() const {
-  const auto document = documentOwner();
-  return document ? below(document->mediaFolderPath(), uuid()) : Path();
-}
-
-Path QuiltMedia::sourcesFolderPath() const { return below(path(), "sources"); }
-Path QuiltMedia::extrasFolderPath() const { return below(path(), "extras"); }
-Path QuiltMedia::posterImagePath() const { return below(path(), "poster.jpg"); }
+Path QuiltMedia::path() const { return folderOf(*this); }
+Path QuiltMedia::sourcesFolderPath() const { return pathBelow(folderOf(*this), {"sources"}); }
+Path QuiltMedia::extrasFolderPath() const { return pathBelow(folderOf(*this), {"extras"}); }
+Path QuiltMedia::posterImagePath() const { return pathBelow(folderOf(*this), {"poster.jpg"}); }
 
 double QuiltMedia::duration() const {
   const auto guard = _sources.lock();

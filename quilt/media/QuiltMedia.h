@@ -3,6 +3,7 @@
 
 #include "quilt/media/QuiltMediaExtra.h"
 #include "quilt/platform/base/ChildList.h"
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Property.h"
 #include "quilt/sources/ModelTypes.h"
 #include "quilt/sources/QuiltMediaSource.h"
@@ -15,9 +16,10 @@ class QuiltDocument;
 /// One item of a document: a movie, audio, an image, a document file, a web page, a montage of stills or two sources
 /// shown together. Owned by its document; any thread may call it; sources and extras have a recursive lock each, never
 /// held together.
-class QuiltMedia : public platform::Object, public ImageBrowserItem, public platform::PasteboardItem {
+class QUILT_EXPORT QuiltMedia : public platform::Object, public ImageBrowserItem, public platform::PasteboardItem {
  public:
   // Construction
+  /// A fresh identity and nothing in it.
   static std::shared_ptr<QuiltMedia> init();
   /// Reads a record. Null, after a warning, when its identity is no plain folder name. Children whose records yield
   /// nothing are skipped.
@@ -25,27 +27,36 @@ class QuiltMedia : public platform::Object, public ImageBrowserItem, public plat
                                                         const std::shared_ptr<QuiltDocument>& andDocument);
 
   // Properties
+  /// Names the item's folder in the package, so it is a plain folder name.
   std::string uuid() const { return _uuid.get(); }
   void setUuid(std::string uuid) { _uuid.set(std::move(uuid)); }
+  /// @{
+  /// For people, UTF-8; none: not given. Setting saves nothing by itself.
   Text title() const { return _title.get(); }
   void setTitle(Text title) { _title.set(std::move(title)); }
   Text description() const { return _description.get(); }
   void setDescription(Text description) { _description.set(std::move(description)); }
+  /// @}
   /// The category that was set; else, once, that of the only source; else none.
   Text contentCategory() const;
   void setContentCategory(Text contentCategory) { _contentCategory.set(std::move(contentCategory)); }
+  /// The owner, which sets and clears it; null while detached. Never keeps it alive.
   std::shared_ptr<QuiltDocument> documentOwner() const { return _documentOwner.get(); }
   void setDocumentOwner(const std::shared_ptr<QuiltDocument>& owner) { _documentOwner.set(owner); }
 
   // Places in the package; empty while the item is not in a document
+  /// @{
+  /// The item's folder, the folders of its children and the poster's file. Empty while the item is not in a document.
   Path path() const;
   Path sourcesFolderPath() const;
   Path extrasFolderPath() const;
   Path posterImagePath() const;
+  /// @}
 
   // Derived values
   /// Seconds.
   double duration() const;
+  /// Of everything of the children in the package.
   double totalSizeInMegaBytes() const;
 
   // Poster image
@@ -56,17 +67,22 @@ class QuiltMedia : public platform::Object, public ImageBrowserItem, public plat
   /// Rises whenever the poster is drawn anew or invalidated; 1 for a new item.
   std::uint64_t posterImageVersion() const { return _posterImageVersion.get(); }
   void setPosterImageVersion(std::uint64_t version) { _posterImageVersion.set(version); }
+  /// @{
   /// Pixels; the integer 0 without a poster, else a real.
   platform::PropertyList posterImageWidth();
   platform::PropertyList posterImageHeight();
+  /// @}
   /// Drops the cached poster, raises the version and deletes the file.
   void invalidatePosterImage();
   /// Drops the cached poster and every cache of the children. The file and the version stay.
   void invalidateCaches();
 
   // Pasteboard: the UUID alone, under the drag type
+  /// The one type under which an item travels.
   static std::string dragTypeIdentifier() { return kQuiltMediaDragType; }
+  /// The drag type alone.
   static std::vector<std::string> readableTypesForPasteboard(const platform::Pasteboard& pasteboard);
+  /// The UUID is a text.
   static unsigned readingOptionsForType(const std::string&, const platform::Pasteboard&) {
     return platform::kPasteboardReadingAsString;
   }
@@ -89,44 +105,73 @@ class QuiltMedia : public platform::Object, public ImageBrowserItem, public plat
   // Quick preview
   /// The first source's main file; none for an item that is composed of several.
   std::optional<Url> previewItemURL() const;
+  /// Thumbnails of items are drawn as icons.
   static Dictionary glanceThumbnailOptions();
 
   // Sources
+  /// A copy of the list. Setting replaces the list and leaves files and back-pointers as they are.
   std::vector<std::shared_ptr<QuiltMediaSource>> sources() const { return _sources.copy(); }
   void setSources(std::vector<std::shared_ptr<QuiltMediaSource>> sources) { _sources.assign(std::move(sources)); }
+  /// @{
+  /// How many there are; one of them, null when the index is not below the count.
   std::size_t sourcesCount() const { return _sources.count(); }
   std::shared_ptr<QuiltMediaSource> sourceAtIndex(std::size_t index) const { return _sources.at(index); }
+  /// @}
+  /// Null when none has it.
   std::shared_ptr<QuiltMediaSource> sourceWithUUID(const std::string& uuid) const;
   /// Calls the block on each with the lock held; stops at the first false and answers false.
   bool performBlockOnSources(const std::function<bool(const std::shared_ptr<QuiltMediaSource>&)>& block) const;
+  /// @{
+  /// Attaches it and puts it at the end, or before the index; saves the document unless that is processing. Null is
+  /// ignored. An index beyond the count changes nothing and logs a critical line.
   void addSource(const std::shared_ptr<QuiltMediaSource>& source);
   void addSource(const std::shared_ptr<QuiltMediaSource>& source, std::size_t atIndex);
+  /// @}
+  /// Moves a group, in its order, to a position counted before the move, and saves likewise. An index outside the list
+  /// changes nothing and logs a critical line.
   void moveSourcesAtIndexes(const IndexSet& indexes, std::size_t toIndex);
   /// Deletes the source's folder and removes it from the list.
   void removeSource(const std::shared_ptr<QuiltMediaSource>& source);
+  /// removeSource() for each that is there now.
   void removeAllSources();
+  /// How many previews the sources have together, made or not. Opens their files.
   std::size_t totalSourcesPreviewsCount() const;
   /// The preview at this place when those of all sources are numbered in source order; null past the last.
   std::shared_ptr<QuiltMediaPreview> sourcePreviewAtIndex(std::size_t index) const;
 
   // Extras
+  /// A copy of the list. Setting replaces the list and leaves files and back-pointers as they are.
   std::vector<std::shared_ptr<QuiltMediaExtra>> extras() const { return _extras.copy(); }
   void setExtras(std::vector<std::shared_ptr<QuiltMediaExtra>> extras) { _extras.assign(std::move(extras)); }
+  /// @{
+  /// How many there are; one of them, null when the index is not below the count.
   std::size_t extraCount() const { return _extras.count(); }
   std::shared_ptr<QuiltMediaExtra> extraAtIndex(std::size_t index) const { return _extras.at(index); }
+  /// @}
+  /// Calls the block on each with the lock held; stops at the first false and answers false.
   bool performBlockOnExtra(const std::function<bool(const std::shared_ptr<QuiltMediaExtra>&)>& block) const;
+  /// @{
+  /// Attaches it and puts it at the end, or before the index; saves the document unless that is processing. Null is
+  /// ignored. An index beyond the count changes nothing and logs a critical line.
   void addExtra(const std::shared_ptr<QuiltMediaExtra>& extra);
   void addExtra(const std::shared_ptr<QuiltMediaExtra>& extra, std::size_t atIndex);
+  /// @}
+  /// Moves a group, in its order, to a position counted before the move, and saves likewise. An index outside the list
+  /// changes nothing and logs a critical line.
   void moveExtraAtIndexes(const IndexSet& indexes, std::size_t toIndex);
+  /// Deletes the extra's folder and removes it from the list.
   void removeExtra(const std::shared_ptr<QuiltMediaExtra>& extra);
+  /// removeExtra() for each that is there now.
   void removeAllExtras();
 
   // Audio commentary
+  /// The voice over a montage; null without one.
   std::shared_ptr<QuiltMediaSource> audioCommentarySource() const { return _audioCommentarySource.get(); }
   /// Replaces the commentary; files stay, nothing is saved.
   void setAudioCommentarySource(const std::shared_ptr<QuiltMediaSource>& source);
 
   // Long operations, on the calling thread; the block gets 0 to 100
+  /// Whether every child's files lie in the package.
   bool isFlattened() const;
   /// Copies every child's files into the item's folder.
   bool flattenWithProgressionBlock(const ProgressionBlock& withProgressionBlock);

@@ -2,6 +2,7 @@
 #include "quilt/media/QuiltMediaExtra.h"
 
 #include "quilt/media/QuiltMedia.h"
+#include "quilt/sources/ModelFiles.h"
 
 namespace quilt {
 
@@ -27,8 +28,7 @@ std::shared_ptr<QuiltMediaExtra> QuiltMediaExtra::initWithDictionary(const Dicti
 
 Path QuiltMediaExtra::path() const {
   const auto media = mediaOwner();
-  const Path folder = media ? media->extrasFolderPath() : Path();
-  return folder.empty() ? Path() : folder / uuid();
+  return media ? pathBelow(folderOf(*media), {"extras", uuid()}) : Path();
 }
 
 }  // namespace quilt

@@ -74,10 +74,11 @@ class BuildDiagnostics final : public Diagnostics {
 #endif
 #if QUILT_WITH_MUPDF
     list.push_back({"PDF and EPUB pages", true, MupdfInspector::version(), ""});
+    list.push_back(OfficeDocuments::capability());
 #else
     list.push_back(leftOut("PDF and EPUB pages", "-DQUILT_WITH_MUPDF"));
+    list.push_back(leftOut("Office documents (LibreOffice)", "-DQUILT_WITH_MUPDF"));
 #endif
-    list.push_back(OfficeDocuments::capability());
 #if QUILT_WITH_ZIP
     list.push_back({"Zip archives", true, ZipArchive::version(), ""});
 #else

@@ -12,7 +12,11 @@ struct EmbeddedFile {
   std::span<const unsigned char> bytes;
 };
 
-/// Every compiled-in file, sorted by path.
+/// The compiled-in artwork and strings, sorted by path.
 std::span<const EmbeddedFile> embeddedFiles();
+
+/// The compiled-in scripts for pages and clients, sorted by path. A library of their own: who serves them needs no
+/// artwork.
+std::span<const EmbeddedFile> embeddedScripts();
 
 }  // namespace quilt::resources

@@ -6,6 +6,7 @@
 #include "quilt/collections/QuiltCollection.h"
 #include "quilt/documents/QuiltDocument.h"
 #include "quilt/media/QuiltMedia.h"
+#include "quilt/scripting/AccessorTable.h"
 #include "quilt/sources/QuiltMediaPreview.h"
 
 namespace quilt::scripting {

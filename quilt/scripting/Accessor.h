@@ -1,19 +1,15 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <concepts>
 #include <cstdint>
-#include <filesystem>
 #include <memory>
-#include <optional>
 #include <span>
 #include <string>
 #include <string_view>
-#include <type_traits>
-#include <utility>
 #include <variant>
 #include <vector>
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Object.h"
 #include "quilt/platform/base/Result.h"
 
@@ -24,130 +20,42 @@ namespace quilt::scripting {
 using Value = std::variant<std::monostate, std::string, std::int64_t, double, std::vector<std::string>,
                            std::shared_ptr<platform::Object>>;
 
+/// What a method takes: nothing, a text or none, or an index.
 enum class Argument { None, Text, Index };
+/// What a method answers; all but a number may be none.
 enum class Answer { Nothing, Text, Number, Texts, Object };
 
 /// One method that a script may call. It writes one debug line and goes through the object's own operation.
 struct Accessor {
-  std::string_view name;  ///< as scripts say it, with a colon when it takes an argument: "cvSetTitle:"
-  Argument argument;
-  Answer answer;
-  std::string_view summary;
-  Value (*perform)(platform::Object& receiver, const Value& argument);
+  std::string_view name;     ///< as scripts say it, with a colon when it takes an argument: "cvSetTitle:"
+  Argument argument;         ///< what it takes
+  Answer answer;             ///< what it answers
+  std::string_view summary;  ///< one sentence for people who write scripts
+  Value (*perform)(platform::Object& receiver,
+                   const Value& argument);  ///< the receiver is of the class; the argument fits
 };
 
 /// One class that scripts may reach.
 struct ExposedClass {
-  std::string_view name;  ///< "QuiltDocument"
-  std::span<const Accessor> accessors;
-  bool (*isInstance)(const platform::Object& object);
+  std::string_view name;                               ///< "QuiltDocument"
+  std::span<const Accessor> accessors;                 ///< every method, in the order of the documentation
+  bool (*isInstance)(const platform::Object& object);  ///< also true for derived classes
 };
 
 /// The six classes.
-std::span<const ExposedClass> exposedClasses();
+QUILT_EXPORT std::span<const ExposedClass> exposedClasses();
 
 /// The class whose accessors the object has: an extra's is the source's. Null for an object that scripts cannot reach.
-const ExposedClass* exposedClassOf(const platform::Object& object);
+QUILT_EXPORT const ExposedClass* exposedClassOf(const platform::Object& object);
 
 /// What the object answers to a script host that asks whether a method is kept from scripts: every name is, but those
 /// of the object's accessors.
-bool isExcludedFromScripts(const platform::Object& object, std::string_view name);
+QUILT_EXPORT bool isExcludedFromScripts(const platform::Object& object, std::string_view name);
 
 /// Calls an accessor. Unsupported for a name that is excluded, Damaged for arguments of the wrong count or kind; then
 /// nothing is done and nothing is logged. A setter takes a text or none, an index accessor an integer. What changes the
 /// model saves it as the setter does. Any thread that may call the receiver's class.
-platform::Result<Value> perform(platform::Object& receiver, std::string_view name, std::span<const Value> arguments);
-
-// ---- For the tables of the classes
-
-namespace table {
-
-inline Value valueOf(std::string text) { return text; }
-inline Value valueOf(const std::filesystem::path& path) { return path.empty() ? Value() : Value(path.native()); }
-inline Value valueOf(std::int32_t number) { return std::int64_t{number}; }
-inline Value valueOf(double number) { return number; }
-inline Value valueOf(std::vector<std::string> texts) { return texts; }
-template <std::derived_from<platform::Object> T>
-Value valueOf(const std::shared_ptr<T>& object) {
-  return object ? Value(std::static_pointer_cast<platform::Object>(object)) : Value();
-}
-template <class T>
-Value valueOf(std::optional<T> value) {
-  return value ? valueOf(*std::move(value)) : Value();
-}
-
-template <class T>
-constexpr Answer answerOf() {
-  if constexpr (std::is_same_v<T, std::string> || std::is_same_v<T, std::optional<std::string>> ||
-                std::is_same_v<T, std::filesystem::path>) {
-    return Answer::Text;
-  } else if constexpr (std::is_arithmetic_v<T>) {
-    return Answer::Number;
-  } else if constexpr (std::is_same_v<T, std::optional<std::vector<std::string>>>) {
-    return Answer::Texts;
-  } else {
-    return Answer::Object;
-  }
-}
-
-template <class T>
-T& as(platform::Object& object) {
-  return static_cast<T&>(object);
-}
-
-/// `get` takes the receiver and logs before it answers.
-template <class T, class Get>
-Accessor getter(std::string_view name, std::string_view summary, Get) {
-  using Result = std::remove_cvref_t<std::invoke_result_t<Get, T&>>;
-  return {name, Argument::None, answerOf<Result>(), summary,
-          [](platform::Object& receiver, const Value&) { return valueOf(Get{}(as<T>(receiver))); }};
-}
-
-/// `get` takes the receiver and the index as the script gave it.
-template <class T, class Get>
-Accessor indexGetter(std::string_view name, std::string_view summary, Get) {
-  return {name, Argument::Index, Answer::Object, summary, [](platform::Object& receiver, const Value& argument) {
-            return valueOf(Get{}(as<T>(receiver), std::get<std::int64_t>(argument)));
-          }};
-}
-
-/// `act` takes the receiver and the index, and answers nothing.
-template <class T, class Act>
-Accessor indexAction(std::string_view name, std::string_view summary, Act) {
-  return {name, Argument::Index, Answer::Nothing, summary, [](platform::Object& receiver, const Value& argument) {
-            Act{}(as<T>(receiver), std::get<std::int64_t>(argument));
-            return Value();
-          }};
-}
-
-/// `set` takes the receiver and the new text or none, and logs before it sets.
-template <class T, class Set>
-Accessor setter(std::string_view name, std::string_view summary, Set) {
-  return {name, Argument::Text, Answer::Nothing, summary, [](platform::Object& receiver, const Value& argument) {
-            const auto* text = std::get_if<std::string>(&argument);
-            Set{}(as<T>(receiver), text ? std::optional(*text) : std::nullopt);
-            return Value();
-          }};
-}
-
-/// A count as scripts get it.
-inline std::int32_t countOf(std::size_t count) { return static_cast<std::int32_t>(count); }
-/// An index as the lists take it; a negative one is beyond every list.
-inline std::size_t positionOf(std::int64_t index) { return static_cast<std::size_t>(index); }
-
-/// The identity of an object that may be missing.
-template <class T>
-std::optional<std::string> identityOf(const std::shared_ptr<T>& object) {
-  return object ? std::optional(object->uuid()) : std::nullopt;
-}
-
-std::span<const Accessor> ofCollection();
-std::span<const Accessor> ofDocument();
-std::span<const Accessor> ofMedia();
-std::span<const Accessor> ofSource();
-std::span<const Accessor> ofDerivative();
-std::span<const Accessor> ofPreview();
-
-}  // namespace table
+QUILT_EXPORT platform::Result<Value> perform(platform::Object& receiver, std::string_view name,
+                                             std::span<const Value> arguments);
 
 }  // namespace quilt::scripting

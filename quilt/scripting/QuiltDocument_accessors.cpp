@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "quilt/documents/QuiltDocument.h"
 #include "quilt/platform/base/FDYLogger.h"
-#include "quilt/scripting/Accessor.h"
+#include "quilt/scripting/AccessorTable.h"
 #include "quilt/scripting/CreationDate.h"
 #include "quilt/sources/ModelFiles.h"
 

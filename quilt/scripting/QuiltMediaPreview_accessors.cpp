@@ -2,7 +2,7 @@
 #include "quilt/sources/QuiltMediaPreview.h"
 
 #include "quilt/platform/base/FDYLogger.h"
-#include "quilt/scripting/Accessor.h"
+#include "quilt/scripting/AccessorTable.h"
 
 namespace quilt::scripting::table {
 

@@ -2,7 +2,7 @@
 #include "quilt/sources/QuiltMediaSource.h"
 
 #include "quilt/platform/base/FDYLogger.h"
-#include "quilt/scripting/Accessor.h"
+#include "quilt/scripting/AccessorTable.h"
 
 namespace quilt::scripting::table {
 
@@ -33,12 +33,12 @@ std::span<const Accessor> ofSource() {
                                          source.description());
                      return source.description();
                    }),
-      setter<Self>("cvSetDescription:", "Changes the description.",
-                   [](Self& source, const Text& description) {
-                     FDYLogger::logDebug("Conveyor is setting source \"%@\" description to \"%@\"", source.uuid(),
-                                         description);
-                     source.setDescription(description);
-                   }),
+      setter<Self>(
+          "cvSetDescription:", "Changes the description, until the record is read again: it keeps the title instead.",
+          [](Self& source, const Text& description) {
+            FDYLogger::logDebug("Conveyor is setting source \"%@\" description to \"%@\"", source.uuid(), description);
+            source.setDescription(description);
+          }),
       getter<Self>("cvTimeCode", "Seconds from the start of its item; 0 when it has no time code.",
                    [](const Self& source) {
                      const double timecode = source.timecode();

@@ -2,8 +2,10 @@
 #include "quilt/sources/ModelFiles.h"
 
 #include <algorithm>
+#include <utility>
 
 #include "quilt/documents/QuiltDocument.h"
+#include "quilt/media/QuiltMedia.h"
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/interfaces/Services.h"
 #include "quilt/sources/copyfile_callback.h"
@@ -11,6 +13,30 @@
 namespace quilt {
 
 using platform::services;
+
+namespace {
+
+// The text stays empty: what lies in no document has no place.
+void descend(std::string& folder, std::string_view name) {
+  if (folder.empty()) return;
+  if (folder.back() != '/') folder += '/';
+  folder += name;
+}
+
+}  // namespace
+
+std::string folderOf(const QuiltMedia& media) {
+  const auto document = media.documentOwner();
+  std::string folder = document ? document->path().native() : std::string();
+  descend(folder, "media");
+  descend(folder, media.uuid());
+  return folder;
+}
+
+Path pathBelow(std::string folder, std::initializer_list<std::string_view> names) {
+  for (const std::string_view name : names) descend(folder, name);
+  return Path(std::move(folder));
+}
 
 platform::Result<void> createDirectoryIfMissing(const Path& path) {
   if (services().files->fileExistsAtPath(path)) return {};

@@ -1,7 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <initializer_list>
 #include <string>
+#include <string_view>
 
 #include "quilt/platform/base/Result.h"
 #include "quilt/sources/ModelTypes.h"
@@ -9,8 +11,16 @@
 namespace quilt {
 
 class QuiltDocument;
+class QuiltMedia;
 
 /// The file routines that several classes of the model share. Any thread.
+
+/// The folder of an item as text; empty outside a document. A path keeps each component as a text of its own, so that
+/// building one step by step down to a file would be most of the cost of a record.
+std::string folderOf(const QuiltMedia& media);
+
+/// `name` below `folder`; nothing without a folder.
+Path pathBelow(std::string folder, std::initializer_list<std::string_view> names);
 
 /// Makes the folder with its parents unless something is there.
 platform::Result<void> createDirectoryIfMissing(const Path& path);

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Property.h"
 #include "quilt/platform/base/RecursiveMonitor.h"
 #include "quilt/sources/ModelTypes.h"
@@ -11,7 +12,7 @@ class QuiltMediaSource;
 
 /// The points of a source's sound, from which a host draws a waveform. Owned by its source; its monitor is the lock of
 /// the source's samples.
-class QuiltMediaAudioSamples : public platform::Object {
+class QUILT_EXPORT QuiltMediaAudioSamples : public platform::Object {
  public:
   /// No identity, nothing set.
   static std::shared_ptr<QuiltMediaAudioSamples> init();
@@ -28,15 +29,20 @@ class QuiltMediaAudioSamples : public platform::Object {
   /// The identity of the derivative that the samples were made from.
   Text uuid() const { return _uuid.get(); }
   void setUuid(Text uuid) { _uuid.set(std::move(uuid)); }
+  /// The samples file; none until it was extracted or read from a record.
   std::optional<Url> sampleURL() const { return _sampleURL.get(); }
   void setSampleURL(std::optional<Url> url) { _sampleURL.set(std::move(url)); }
+  /// The sound file that the samples are taken from.
   std::optional<Url> sourceURL() const { return _sourceURL.get(); }
   void setSourceURL(std::optional<Url> url) { _sourceURL.set(std::move(url)); }
+  /// Whether the samples file lies in the package.
   bool isFlattened() const { return _isFlattened.get(); }
   void setIsFlattened(bool isFlattened) { _isFlattened.set(isFlattened); }
+  /// The owner, which sets and clears it; null while detached. Never keeps it alive.
   std::shared_ptr<QuiltMediaSource> sourceOwner() const { return _sourceOwner.get(); }
   void setSourceOwner(const std::shared_ptr<QuiltMediaSource>& owner) { _sourceOwner.set(owner); }
 
+  /// Holds the samples still for the life of what it answers.
   platform::MonitorLock lock() const { return platform::MonitorLock(_monitor); }
 
   /// Where the samples file lies in the package: identity and "asc"; empty without a place in a document.
@@ -47,8 +53,10 @@ class QuiltMediaAudioSamples : public platform::Object {
   bool flatten(const ContinueBlock& goesOn = {});
   /// 0 unless flattened.
   double totalSizeInMegaBytes() const;
+  /// There are none; here because every child of a source has it.
   void invalidateCaches() {}
 
+  /// The record as it is written, with the entries that a newer version left in it.
   Dictionary dictionary() const;
 
  protected:

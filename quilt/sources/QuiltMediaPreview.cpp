@@ -101,10 +101,11 @@ std::shared_ptr<ImageWrapper> QuiltMediaPreview::image() {
 
 Path QuiltMediaPreview::path() const {
   const auto source = sourceOwner();
-  const Path folder = source ? source->previewsFolderPath() : Path();
-  if (folder.empty()) return {};
+  if (!source) return {};
   const std::size_t position = index();
-  return folder / platform::withExtension(position == kNoIndex ? uuid() : std::to_string(position), "jpg");
+  return pathBelow(
+      source->path().native(),
+      {"previews", platform::withExtension(position == kNoIndex ? uuid() : std::to_string(position), "jpg")});
 }
 
 bool QuiltMediaPreview::hasPicture() const {

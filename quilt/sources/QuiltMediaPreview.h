@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Property.h"
 #include "quilt/sources/ModelTypes.h"
 
@@ -10,8 +11,9 @@ class QuiltMediaSource;
 
 /// One still of a source: a movie's chapter or poster frame, a document's page, the picture of an image. Owned by its
 /// source; any thread may call it. Holds its image once that was asked for.
-class QuiltMediaPreview : public platform::Object {
+class QUILT_EXPORT QuiltMediaPreview : public platform::Object {
  public:
+  /// A fresh identity, no picture, no index and no timecode.
   static std::shared_ptr<QuiltMediaPreview> init();
   /// A preview of the image fitted into high definition. Null for an absent image.
   static std::shared_ptr<QuiltMediaPreview> initWithImageWrapper(const std::shared_ptr<ImageWrapper>& imageWrapper);
@@ -19,6 +21,7 @@ class QuiltMediaPreview : public platform::Object {
   static std::shared_ptr<QuiltMediaPreview> initWithDictionary(const Dictionary& dictionary,
                                                                const std::shared_ptr<QuiltMediaSource>& andMediaSource);
 
+  /// Names the file of a preview without an index, so it is a plain file name.
   std::string uuid() const { return _uuid.get(); }
   void setUuid(std::string uuid) { _uuid.set(std::move(uuid)); }
   /// A movie chapter's name, or a page's first line.
@@ -40,10 +43,13 @@ class QuiltMediaPreview : public platform::Object {
   /// Pixels; none until the image was asked for.
   std::optional<double> width() const { return _width.get(); }
   void setWidth(std::optional<double> width) { _width.set(width); }
+  /// Pixels; none until the image was asked for.
   std::optional<double> height() const { return _height.get(); }
   void setHeight(std::optional<double> height) { _height.set(height); }
+  /// Whether the picture was written into the package.
   bool isFlattened() const { return _isFlattened.get(); }
   void setIsFlattened(bool isFlattened) { _isFlattened.set(isFlattened); }
+  /// The owner, which sets and clears it; null while detached. Never keeps it alive.
   std::shared_ptr<QuiltMediaSource> sourceOwner() const { return _sourceOwner.get(); }
   void setSourceOwner(const std::shared_ptr<QuiltMediaSource>& owner) { _sourceOwner.set(owner); }
 
@@ -55,8 +61,10 @@ class QuiltMediaPreview : public platform::Object {
   bool flatten();
   /// 0 unless flattened.
   double totalSizeInMegaBytes() const;
+  /// There are none; here because every child of a source has it.
   void invalidateCaches() {}
 
+  /// The record as it is written, with the entries that a newer version left in it.
   Dictionary dictionary() const;
 
  protected:

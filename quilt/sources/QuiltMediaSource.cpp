@@ -8,6 +8,7 @@
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/interfaces/Services.h"
 #include "quilt/sources/DocumentSave.h"
+#include "quilt/sources/ModelFiles.h"
 #include "quilt/sources/RecordNames.h"
 
 namespace quilt {
@@ -144,19 +145,12 @@ void QuiltMediaSource::updateDocumentUnlessProcessing() const { requestSave(docu
 
 Path QuiltMediaSource::path() const {
   const auto media = mediaOwner();
-  const Path folder = media ? media->sourcesFolderPath() : Path();
-  return folder.empty() ? Path() : folder / uuid();
+  return media ? pathBelow(folderOf(*media), {"sources", uuid()}) : Path();
 }
 
-namespace {
-
-Path below(const Path& folder, const char* name) { return folder.empty() ? Path() : folder / name; }
-
-}  // namespace
-
-Path QuiltMediaSource::derivativesFolderPath() const { return below(path(), "derivatives"); }
-Path QuiltMediaSource::previewsFolderPath() const { return below(path(), "previews"); }
-Path QuiltMediaSource::audioSamplesFolderPath() const { return below(path(), "audiosamples"); }
+Path QuiltMediaSource::derivativesFolderPath() const { return pathBelow(path().native(), {"derivatives"}); }
+Path QuiltMediaSource::previewsFolderPath() const { return pathBelow(path().native(), {"previews"}); }
+Path QuiltMediaSource::audioSamplesFolderPath() const { return pathBelow(path().native(), {"audiosamples"}); }
 
 // ---- Derived values
 

@@ -2,6 +2,7 @@
 #pragma once
 
 #include "quilt/platform/base/ChildList.h"
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Property.h"
 #include "quilt/sources/ModelTypes.h"
 #include "quilt/sources/QuiltMediaAudioSamples.h"
@@ -13,6 +14,7 @@ namespace quilt {
 class QuiltDocument;
 class QuiltMedia;
 
+/// @{
 /// Content categories, compared by string equality. The first five are a source's; the last two exist for media items
 /// only.
 inline constexpr const char* kQuiltMediaContentCategoryMovie = "Movie";
@@ -22,28 +24,36 @@ inline constexpr const char* kQuiltMediaContentCategoryDocument = "Document";
 inline constexpr const char* kQuiltMediaContentCategoryWeb = "Web";
 inline constexpr const char* kQuiltMediaContentCategoryMontage = "Montage";
 inline constexpr const char* kQuiltMediaContentCategoryDualSource = "DualSource";
+/// @}
 
 /// One piece of content of a media item: its encoded files (derivatives), its stills (previews), its audio samples.
 /// Owned by the item as a source, an extra or the audio commentary. Any thread may call it; each of the three
 /// collections has its own recursive lock.
-class QuiltMediaSource : public platform::Object {
+class QUILT_EXPORT QuiltMediaSource : public platform::Object {
  public:
   // Construction
+  /// A fresh identity, no content and no timecode.
   static std::shared_ptr<QuiltMediaSource> init();
+  /// @{
   /// A source whose first derivative is the file (or link), left where it is. Null when no derivative accepts it.
   static std::shared_ptr<QuiltMediaSource> initWithURL(const Url& url);
   static std::shared_ptr<QuiltMediaSource> initWithPath(const Path& path);
+  /// @}
   /// Reads a record. Null, after a warning, when its identity is no plain folder name.
   static std::shared_ptr<QuiltMediaSource> initWithDictionary(const Dictionary& dictionary,
                                                               const std::shared_ptr<QuiltMedia>& andMedia);
 
   // Properties
+  /// Names the source's folder in the package, so it is a plain folder name.
   std::string uuid() const { return _uuid.get(); }
   void setUuid(std::string uuid) { _uuid.set(std::move(uuid)); }
+  /// @{
+  /// For people, UTF-8; none: not given. Setting saves nothing by itself.
   Text title() const { return _title.get(); }
   void setTitle(Text title) { _title.set(std::move(title)); }
   Text description() const { return _description.get(); }
   void setDescription(Text description) { _description.set(std::move(description)); }
+  /// @}
   /// Position of the source inside its item in seconds; kNoTimecode for none.
   double timecode() const { return _timecode.get(); }
   void setTimecode(double timecode) { _timecode.set(timecode); }
@@ -51,15 +61,18 @@ class QuiltMediaSource : public platform::Object {
   bool dirty() const { return _dirty.get(); }
   /// True removes everything but the main derivative, which becomes the "Desktop" one, each time it is set.
   void setDirty(bool dirty);
+  /// The owner, which sets and clears it; null while detached. Never keeps it alive.
   std::shared_ptr<QuiltMedia> mediaOwner() const { return _mediaOwner.get(); }
   void setMediaOwner(const std::shared_ptr<QuiltMedia>& owner) { _mediaOwner.set(owner); }
 
   // Derived values
   /// The category of the main derivative's content, or none.
   Text contentCategory() const;
+  /// The category that a type identifier belongs to; none for none and for a type of no category.
   static Text contentCategoryForContentType(const Text& contentType);
   /// Seconds; 0 for what does not play.
   double duration() const;
+  /// Of everything in the package: derivatives, previews and samples.
   double totalSizeInMegaBytes() const;
   /// The main derivative's picture, cached. Null after a warning.
   std::shared_ptr<ImageWrapper> thumbnailImage();
@@ -67,27 +80,38 @@ class QuiltMediaSource : public platform::Object {
   /// The first preview in standard definition, cached. Null without one.
   std::shared_ptr<ImageWrapper> posterImage();
   void setPosterImage(std::shared_ptr<ImageWrapper> image) { _posterImage.set(std::move(image)); }
+  /// The main derivative's file or link; none without one.
   std::optional<Url> previewItemURL() const;
+  /// The line under a quick preview.
   Text previewItemTitle() const { return title(); }
   /// No display state is kept.
   std::optional<std::string> previewItemDisplayState() const { return std::nullopt; }
 
   // Places in the package; empty while the source is not in a document
+  /// @{
+  /// The source's folder in the package, and the folders in it. Empty while the source is not in a document.
   virtual Path path() const;
   Path derivativesFolderPath() const;
   Path previewsFolderPath() const;
   Path audioSamplesFolderPath() const;
+  /// @}
 
   // Derivatives
+  /// A copy of the list. Setting replaces the list and leaves files and back-pointers as they are.
   std::vector<std::shared_ptr<QuiltMediaDerivative>> derivatives() const { return _derivatives.copy(); }
   void setDerivatives(std::vector<std::shared_ptr<QuiltMediaDerivative>> derivatives);
+  /// @{
+  /// How many there are; one of them, null when the index is not below the count.
   std::size_t derivativeCount() const { return _derivatives.count(); }
   std::shared_ptr<QuiltMediaDerivative> derivativeAtIndex(std::size_t index) const { return _derivatives.at(index); }
+  /// @}
   /// Calls the block on each with the lock held; stops at the first false and answers false.
   bool performBlockOnDerivatives(const std::function<bool(const std::shared_ptr<QuiltMediaDerivative>&)>& block) const;
+  /// Attaches and appends it, and saves the document unless that is processing. Null is ignored.
   void addDerivative(const std::shared_ptr<QuiltMediaDerivative>& derivative);
   /// Deletes the derivative's file when it lies in the package, and removes it.
   void removeDerivative(const std::shared_ptr<QuiltMediaDerivative>& derivative);
+  /// removeDerivative() for each that is there now.
   void removeAllDerivatives();
   /// The first with the tag, or null.
   std::shared_ptr<QuiltMediaDerivative> derivativeWithFormat(const std::string& format) const;
@@ -99,24 +123,29 @@ class QuiltMediaSource : public platform::Object {
   static const std::vector<std::string>& compatibilityTagsInOrderOfQuality();
 
   // Previews, made lazily by index
+  /// A copy of the list, in the order of making. Setting replaces it, as setDerivatives() does.
   std::vector<std::shared_ptr<QuiltMediaPreview>> previews() const { return _previews.copy(); }
   void setPreviews(std::vector<std::shared_ptr<QuiltMediaPreview>> previews);
   /// How many previews the content has: chapters or a poster frame, pages, or one picture. Opens the file.
   std::size_t previewCount() const;
   /// The preview for the index, made when it is not there yet. Null past the last, and after a warning on failure.
   std::shared_ptr<QuiltMediaPreview> previewAtIndex(std::size_t index);
-  /// Makes every preview, reporting each. False, after a critical line, when the block answers false.
+  /// Makes every preview, reporting each. False, after a critical line, when the block answers false. While an office
+  /// document is converted, for seconds, 0 is reported with a null preview, so that a cancel is heard.
   bool previewWithProgressionBlock(const ObjectProgressionBlock<QuiltMediaPreview>& withProgressionBlock);
   /// Writes the previews that were made since the source was flattened into the package.
   void flattenPreviews();
   /// Whether every preview that the content has was made.
   bool isPreviewed() const;
+  /// Attaches and appends it, and saves the document unless that is processing. Null is ignored.
   void addPreview(const std::shared_ptr<QuiltMediaPreview>& preview);
   /// Deletes the preview's file and removes it.
   void removePreview(const std::shared_ptr<QuiltMediaPreview>& preview);
+  /// removePreview() for each that is there now.
   void removeAllPreviews();
 
   // Audio samples
+  /// Null when there are none.
   std::shared_ptr<QuiltMediaAudioSamples> audioSamples() const { return _audioSamples.get(); }
   void setAudioSamples(std::shared_ptr<QuiltMediaAudioSamples> samples) { _audioSamples.set(std::move(samples)); }
   /// Extracts the main derivative's samples into the package and attaches them. False when there is no main derivative
@@ -126,12 +155,17 @@ class QuiltMediaSource : public platform::Object {
   void addAudioSamples(const std::shared_ptr<QuiltMediaAudioSamples>& samples, const ContinueBlock& goesOn = {});
   /// Deletes the samples file and leaves the source without samples.
   void removeAudioSamples(const std::shared_ptr<QuiltMediaAudioSamples>& samples);
+  /// removeAudioSamples() for those that are there.
   void removeAllAudioSamples();
 
   // Invalidation
+  /// @{
+  /// Drops the cached thumbnail, the cached poster, or these and the caches of every child. They are made again when
+  /// asked for; files stay.
   void invalidateThumbnailImage() { _thumbnailImage.set(nullptr); }
   void invalidatePosterImage() { _posterImage.set(nullptr); }
   void invalidateCaches();
+  /// @}
   /// Removes every derivative but the main one, all previews and samples, and drops the caches.
   void invalidateAll();
 
@@ -153,6 +187,7 @@ class QuiltMediaSource : public platform::Object {
   Path exportToPath(const Path& path, const std::string& withFormat, const ProgressionBlock& withProgressionBlock);
 
   // Record
+  /// The record as it is written, with the entries that a newer version left in it.
   Dictionary dictionary() const;
 
  protected:

@@ -5,6 +5,7 @@
 #include "quilt/sources/DocumentSave.h"
 #include "quilt/sources/ModelFiles.h"
 #include "quilt/sources/QuiltMediaSource.h"
+#include "quilt/sources/RepeatedReport.h"
 
 namespace quilt {
 
@@ -86,11 +87,11 @@ struct QuiltMediaSource::PreviewContent {
   std::shared_ptr<QuiltMediaDerivative> main;
   std::unique_ptr<Movie> movie;
 
-  explicit PreviewContent(const QuiltMediaSource& source)
+  explicit PreviewContent(const QuiltMediaSource& source, const ContinueBlock& goesOn = {})
       : category(source.contentCategory()), main(source.mainDerivative()) {
     if (isMovie()) movie = openMovie(*main);
     // Here rather than on the main thread, which would stand still while an office document is converted.
-    if (isDocument()) platform::FDYPreviewPrepareDocument(file());
+    if (isDocument()) platform::FDYPreviewPrepareDocument(file(), goesOn);
   }
 
   [[nodiscard]] bool isMovie() const { return category == kQuiltMediaContentCategoryMovie; }
@@ -168,7 +169,15 @@ bool QuiltMediaSource::previewWithProgressionBlock(
     FDYLogger::logCritical("Failed to preview media at URL \"%@\" has been cancelled", previewItemURL());
     return false;
   }
-  const PreviewContent content(*this);
+  const ProgressionBlock beforeTheFirst = [&](double percentage) {
+    return platform::report<QuiltMediaPreview>(withProgressionBlock, nullptr, percentage);
+  };
+  RepeatedReport waiting(beforeTheFirst);
+  const PreviewContent content(*this, waiting.continueBlock());
+  if (waiting.wasCancelled()) {
+    FDYLogger::logCritical("Previewing media at URL \"%@\" has been cancelled", previewItemURL());
+    return false;
+  }
   const std::size_t count = content.count();
   if (count == 0) {
     platform::report<QuiltMediaPreview>(withProgressionBlock, nullptr, 100);

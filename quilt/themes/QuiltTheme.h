@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Property.h"
 #include "quilt/platform/interfaces/Bundles.h"
 #include "quilt/sources/ModelTypes.h"
@@ -8,11 +9,12 @@
 
 namespace quilt {
 
+/// The extension of a theme bundle's folder, without its dot.
 inline constexpr const char* kQuiltThemeExtension = "qth";
 
 /// One theme bundle: an HTML template and a preview image. Immutable in practice once made; shared by the documents and
 /// collections that refer to it. Any thread.
-class QuiltTheme : public platform::Object, public ImageBrowserItem {
+class QUILT_EXPORT QuiltTheme : public platform::Object, public ImageBrowserItem {
  public:
   /// Validates the bundle. Null, after one warning, when it is no theme of a supported version.
   static std::shared_ptr<QuiltTheme> initWithPath(const Path& path);
@@ -23,14 +25,20 @@ class QuiltTheme : public platform::Object, public ImageBrowserItem {
   /// Whether the theme ships with the system or with the application, told from its path alone.
   bool isKestrel() const { return _isKestrel.get(); }
   void setIsKestrel(bool isKestrel) { _isKestrel.set(isKestrel); }
+  /// The opened bundle; null only before the theme is made.
   std::shared_ptr<platform::Bundle> bundle() const { return _bundle.get(); }
   void setBundle(std::shared_ptr<platform::Bundle> bundle) { _bundle.set(std::move(bundle)); }
+  /// @{
+  /// What the bundle's metadata says: a reversed domain name, the name for people, the version. None when it does not
+  /// say.
   Text identifier() const { return _identifier.get(); }
   void setIdentifier(Text identifier) { _identifier.set(std::move(identifier)); }
   Text localizedName() const { return _localizedName.get(); }
   void setLocalizedName(Text name) { _localizedName.set(std::move(name)); }
   Text version() const { return _version.get(); }
   void setVersion(Text version) { _version.set(std::move(version)); }
+  /// @}
+  /// A picture of what the theme looks like, from the bundle; null when that has none.
   std::shared_ptr<ImageWrapper> previewImage() const { return _previewImage.get(); }
   void setPreviewImage(std::shared_ptr<ImageWrapper> image) { _previewImage.set(std::move(image)); }
 

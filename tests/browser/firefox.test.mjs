@@ -6,6 +6,7 @@ import {join} from 'node:path';
 import {after, before, describe, test} from 'node:test';
 import {fileUrl} from './browser.mjs';
 import {launchFirefox} from './firefox.mjs';
+import {Served, whyNoProgram} from './served.mjs';
 import {fixtures, kShots} from './support.mjs';
 
 const kProgram = process.env.FIREFOX || '/usr/bin/firefox-esr';
@@ -48,6 +49,31 @@ describe('in Firefox', {skip: existsSync(kProgram) ? false : `${kProgram} is not
     await new Promise((resolve) => setTimeout(resolve, 3500));
     const apart = await firefox.evaluate(() => { const [first, second] = document.querySelectorAll('video'); return Math.abs(first.currentTime - second.currentTime); });
     assert.ok(apart <= 0.08, `${apart} s`);
+  });
+
+  test('a served document is edited in its page, and shows what is edited elsewhere', {skip: whyNoProgram}, async () => {
+    const media = (name) => join(process.env.QUILT_BROWSER_BUILD, 'media', name);
+    const served = new Served(join(process.env.QUILT_BROWSER_BUILD, 'served-firefox'), media, (files) => ({
+      title: 'In Firefox', media: [{source: files('sea.png'), title: 'The sea'}, {source: files('still-1.jpg'), title: 'Dusk'}]}));
+    const before = firefox.complaints.length;
+    try {
+      await firefox.goto(await served.start());
+      await firefox.until(() => document.documentElement.classList.contains('editing') && !!document.querySelector('.hero .of-title .pencil'));
+      await firefox.click('.hero .of-title .pencil');
+      await firefox.until(() => document.activeElement.localName === 'textarea' && document.activeElement.value === 'In Firefox');
+      for (const key of 'Typed') await firefox.press(key);
+      await firefox.screenshot(join(kShots, 'live-firefox.png'));
+      await firefox.press('\uE007');
+      await firefox.until(() => !document.querySelector('textarea') && document.querySelector('.hero h1').textContent === 'Typed');
+      assert.equal(served.record.Title, 'Typed');
+      assert.equal(await firefox.evaluate(() => document.activeElement.className), 'pencil', 'the focus is back');
+      await (await served.client()).cvSetTitle('By the host');
+      await firefox.until(() => document.querySelector('.hero h1').textContent === 'By the host');
+      assert.deepEqual(firefox.complaints.slice(before), []);
+    } finally {
+      await firefox.goto('about:blank');
+      await served.stop();
+    }
   });
 
   test('keys and a reload work as elsewhere', async () => {

@@ -3,6 +3,7 @@
 
 #include "cli/Options.h"
 #include "cli/version.h"
+#include "tests/support/DocumentFixtures.h"
 #include "tests/support/MediaFixtures.h"
 #include "tests/support/QuiltProgram.h"
 
@@ -47,6 +48,18 @@ TEST_F(PlainCommandsTest, InfoCarriesAllThatTheLibrarySees) {
   EXPECT_THAT(run.out, HasSubstr("320 × 240"));
   EXPECT_THAT(run.out, HasSubstr("0:01    Two"));
   EXPECT_FALSE(std::filesystem::exists(library()));
+}
+
+TEST_F(PlainCommandsTest, InfoCountsThePagesOfDocuments) {
+  const std::filesystem::path pdf = folder() / "a.pdf";
+  write(pdf, makePages(3));
+  makeBook(folder() / "a.epub", {"<h1>Loomings</h1>", "<h1>The Carpet-Bag</h1>"});
+  const json seen = quiltJson({"info", pdf, folder() / "a.epub", makeMedia(m4aSound())})["result"];
+  EXPECT_EQ(3, seen[0]["pages"]);
+  EXPECT_EQ(2, seen[1]["pages"]);
+  EXPECT_TRUE(seen[2]["pages"].is_null());
+  const Ended run = quilt({"info", folder() / "a.epub"});
+  EXPECT_THAT(run.out, HasSubstr("  Pages      2\n"));
 }
 
 TEST_F(PlainCommandsTest, InfoSaysWhyAFileCannotBeUsed) {

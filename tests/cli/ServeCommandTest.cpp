@@ -10,6 +10,7 @@
 namespace quilt::support {
 namespace {
 
+using ::testing::AllOf;
 using ::testing::HasSubstr;
 using ::testing::MatchesRegex;
 using ::testing::Not;
@@ -40,6 +41,17 @@ class ServeCommandTest : public QuiltProgramTest {
     client.send("GET " + address.substr(path) + " HTTP/1.1\r\nHost: " + address.substr(7, path - 7) + "\r\n\r\n");
     return client.read();
   }
+  static std::string tokenOf(const std::string& address) {
+    const std::size_t begin = address.find('/', 7) + 1;
+    return address.substr(begin, address.find('/', begin) - begin);
+  }
+  /// What any user of the machine sees of all that runs.
+  static std::string argumentsOfEveryProcess() {
+    std::string all;
+    for (const auto& entry : std::filesystem::directory_iterator("/proc"))
+      if (std::isdigit(entry.path().filename().native().front()) != 0) all += read(entry.path() / "cmdline");
+    return all;
+  }
   [[nodiscard]] std::filesystem::path package() const {
     return nlohmann::json(quiltJson({"show", "Talk"})["result"]["path"]).get<std::string>();
   }
@@ -54,12 +66,17 @@ TEST_F(ServeCommandTest, PrintsTheAddressAndServesUntilCtrlC) {
   EXPECT_EQ(200, page.status);
   EXPECT_THAT(page.body, HasSubstr("<script src=\"../conveyor.js\"></script>"));
   EXPECT_THAT(get(address + "controllers/data.js").body, StartsWith("var appData = {"));
-  EXPECT_EQ(6, quilt({"set", "Talk", "title=Other"}).exit) << "it is the library's writer";
+  EXPECT_THAT(argumentsOfEveryProcess(), AllOf(HasSubstr("serve"), Not(HasSubstr(tokenOf(address)))));
+  const Ended refused = quilt({"set", "Talk", "title=Other"});
+  EXPECT_EQ(6, refused.exit) << "it is the library's writer";
+  EXPECT_THAT(refused.err, HasSubstr("process "));
   program->signal(SIGINT);
   const Ended run = program->wait();
   EXPECT_EQ(130, run.exit);
   EXPECT_EQ(address + "\n", run.out);
-  EXPECT_THAT(run.err, Not(HasSubstr(address.substr(address.rfind(':'))))) << "the secret is in the result alone";
+  EXPECT_THAT(run.err, Not(HasSubstr(tokenOf(address)))) << "the secret is in the result alone";
+  EXPECT_THAT(run.err, HasSubstr("quilt: Stopped. Every edit is saved"));
+  EXPECT_THAT(run.err, Not(HasSubstr("error"))) << "that is how serving ends";
   EXPECT_EQ(0, quilt({"set", "Talk", "title=Other"}).exit);
 }
 

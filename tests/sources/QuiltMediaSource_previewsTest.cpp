@@ -32,7 +32,11 @@ class ToldGlance final : public platform::Glance {
   std::vector<DocumentPage> pages;
   mutable std::vector<std::size_t> asked;
   mutable std::vector<bool> wasOnMainThread;
+  bool preparesForEver = false;
 
+  void prepareDocument(const Path&, const ContinueBlock& goesOn) const override {
+    while (preparesForEver && goesOn()) std::this_thread::sleep_for(std::chrono::milliseconds(5));
+  }
   std::shared_ptr<ImageWrapper> thumbnailImageForURL(const Url&) const override { return nullptr; }
   std::size_t documentPagesCount(const Path&) const override {
     wasOnMainThread.push_back(platform::MainThread::isCurrent());
@@ -119,6 +123,23 @@ TEST_F(QuiltMediaSourcePreviewsTest, APreviewWithoutAPlaceHasNoPictureAndSaysNot
 }
 
 // ---- Documents
+
+TEST_F(QuiltMediaSourcePreviewsTest, ADocumentThatTakesLongToPrepareRepeatsTheStartUntilItIsCancelled) {
+  const Installed<ToldGlance> glance(&Services::glance);
+  glance->preparesForEver = true;
+  const auto source = documentSource();
+  takeLines();
+  std::vector<double> reported;
+  EXPECT_FALSE(source->previewWithProgressionBlock([&](const auto& preview, double percentage) {
+    EXPECT_EQ(preview, nullptr);
+    reported.push_back(percentage);
+    return reported.size() < 2;
+  }));
+  EXPECT_EQ(reported, (std::vector<double>{0, 0}));
+  EXPECT_EQ(takeProblems(), Lines{critical("Previewing media at URL \"" + source->previewItemURL()->absoluteString() +
+                                           "\" has been cancelled")});
+  EXPECT_THAT(glance->wasOnMainThread, IsEmpty());
+}
 
 TEST_F(QuiltMediaSourcePreviewsTest, ADocumentHasAPreviewForEachPageWithItsText) {
   const Installed<ToldGlance> glance(&Services::glance);

@@ -29,7 +29,8 @@ Result<std::unique_ptr<Movie>> AbsentMovieToolkit::openMovie(const std::filesyst
   return _absence.error(path);
 }
 
-Result<std::shared_ptr<PagedDocument>> AbsentDocumentToolkit::openDocument(const std::filesystem::path& path) const {
+Result<std::shared_ptr<PagedDocument>> AbsentDocumentToolkit::openDocument(const std::filesystem::path& path,
+                                                                           const ContinueBlock& /*goesOn*/) const {
   return _absence.error(path);
 }
 

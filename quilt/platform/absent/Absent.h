@@ -58,7 +58,8 @@ class AbsentMovieToolkit final : public MovieToolkit {
 
 class AbsentDocumentToolkit final : public DocumentToolkit {
  public:
-  Result<std::shared_ptr<PagedDocument>> openDocument(const std::filesystem::path& path) const override;
+  Result<std::shared_ptr<PagedDocument>> openDocument(const std::filesystem::path& path,
+                                                      const ContinueBlock& goesOn = {}) const override;
 
  private:
   Absence _absence{"Showing of document pages"};

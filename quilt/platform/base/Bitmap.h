@@ -10,9 +10,9 @@ namespace quilt::platform {
 /// Decoded pixels: sRGB, 8 bits a channel, red green blue alpha, alpha not premultiplied, rows from the top,
 /// no padding: pixels.size() is width × height × 4.
 struct Bitmap {
-  std::size_t width = 0;
-  std::size_t height = 0;
-  std::vector<std::uint8_t> pixels;
+  std::size_t width = 0;             ///< pixels
+  std::size_t height = 0;            ///< pixels
+  std::vector<std::uint8_t> pixels;  ///< four bytes each
 };
 
 }  // namespace quilt::platform

@@ -24,6 +24,7 @@ namespace quilt::platform {
 template <class Child, class Owner>
 class ChildList {
  public:
+  /// How a child is held: shared with whoever else uses it.
   using Pointer = std::shared_ptr<Child>;
   /// Sets a child's back-pointer; null for children without one.
   using SetOwner = void (Child::*)(const std::shared_ptr<Owner>&);
@@ -34,8 +35,10 @@ class ChildList {
   ChildList(const ChildList&) = delete;
   ChildList& operator=(const ChildList&) = delete;
 
+  /// Holds the list still for the life of what it answers. Recursive.
   [[nodiscard]] MonitorLock lock() const { return MonitorLock(_monitor); }
 
+  /// How many children there are now; another thread may change that unless the lock is held.
   [[nodiscard]] std::size_t count() const {
     const MonitorLock guard = lock();
     return _children.size();
@@ -83,6 +86,7 @@ class ChildList {
     change([&] { _children.insert(at(_children, index), child); });
   }
 
+  /// insert() at the end.
   void append(const Pointer& child) {
     const MonitorLock guard = lock();
     insert(child, _children.size());

@@ -22,7 +22,7 @@ enum class ErrorKind {
 
 /// An error as every layer passes it on: worded once, by whoever detected it.
 struct Error {
-  ErrorKind kind;
+  ErrorKind kind;              ///< what to act on
   std::string text;            ///< one sentence for people, without the file's name
   std::filesystem::path file;  ///< the file concerned; empty when there is none
 };

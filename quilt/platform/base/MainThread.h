@@ -3,23 +3,27 @@
 
 #include <functional>
 
+#include "quilt/platform/base/Export.h"
+
 namespace quilt::platform {
 
 /// Who is running: one address for each thread, valid while the thread lives.
 using ThreadIdentity = const void*;
-ThreadIdentity currentThreadIdentity();
+/// The calling thread's.
+QUILT_EXPORT ThreadIdentity currentThreadIdentity();
 
 /// The main thread and the blocks that other threads have queued for it.
 ///
 /// The main thread is the one on which the process started, until another calls adopt(). It runs queued blocks whenever
 /// the host's loop calls runQueuedBlocks(), and while it waits for a RecursiveMonitor. A thread that queues a block
 /// waits for it, so a host must keep its loop turning, or join its workers from a loop that does.
-class MainThread {
+class QUILT_EXPORT MainThread {
  public:
   MainThread() = delete;
 
   /// Makes the calling thread the main thread. Only while no other thread uses the library.
   static void adopt();
+  /// Whether the caller runs on the main thread.
   static bool isCurrent();
 
   /// Runs the block on the main thread and returns after it has run: at once when called there, otherwise queued.
@@ -44,6 +48,6 @@ class MainThread {
 };
 
 /// MainThread::performBlock, under the name that model objects use.
-void performBlockOnMainThread(const std::function<void()>& block);
+QUILT_EXPORT void performBlockOnMainThread(const std::function<void()>& block);
 
 }  // namespace quilt::platform

@@ -7,6 +7,7 @@
 #include <string_view>
 #include <vector>
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Observation.h"
 
 namespace quilt::platform {
@@ -16,7 +17,7 @@ namespace quilt::platform {
 /// Properties (see Property) may be read and set on any thread. Observers of a key hear of each change, also when the
 /// new value equals the old.
 /// Whoever calls an operation keeps the object alive until it returns; an observer may drop its own hold meanwhile.
-class Object : public std::enable_shared_from_this<Object> {
+class QUILT_EXPORT Object : public std::enable_shared_from_this<Object> {
  public:
   Object() = default;
   Object(const Object&) = delete;
@@ -27,9 +28,11 @@ class Object : public std::enable_shared_from_this<Object> {
   Observation observe(std::string_view key, ChangeObserver observer,
                       ObservationOptions options = ObservationOptions::None);
 
+  /// @{
   /// Announces a change of `key`, and of every key that depends on it, to their observers.
   void willChangeValueForKey(std::string_view key) { announce(key, ChangePhase::Will); }
   void didChangeValueForKey(std::string_view key) { announce(key, ChangePhase::Did); }
+  /// @}
 
   /// Whether anyone observes the key or a key that depends on it.
   [[nodiscard]] bool isObserved(std::string_view key) const;
@@ -45,6 +48,7 @@ class Object : public std::enable_shared_from_this<Object> {
   /// The keys whose values are computed from that of `key`.
   [[nodiscard]] virtual std::vector<std::string_view> keysDependingOn(std::string_view key) const;
 
+  /// A shared pointer to this object, for its own operations to hand on. Not in constructors.
   template <class T>
   [[nodiscard]] std::shared_ptr<T> shared(T* self) {
     return std::static_pointer_cast<T>(self->shared_from_this());

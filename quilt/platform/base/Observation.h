@@ -5,6 +5,8 @@
 #include <memory>
 #include <string_view>
 
+#include "quilt/platform/base/Export.h"
+
 namespace quilt::platform {
 
 class Object;
@@ -20,10 +22,11 @@ enum class ObservationOptions {
   Prior,  ///< before and after each change
 };
 
+/// What an observer is told.
 struct ChangeNotice {
   Object& object;        ///< the object that changes
   std::string_view key;  ///< the observed key
-  ChangePhase phase;
+  ChangePhase phase;     ///< before or after the change
 };
 
 /// Called on the thread that changes the value: the setting thread for a property, the main thread for a list.
@@ -31,14 +34,20 @@ using ChangeObserver = std::function<void(const ChangeNotice&)>;
 
 /// An observation that ends with the handle. After reset() or destruction the observer is not running on any other
 /// thread and will not run again; it may end itself from inside its own notice. The observed object may die first.
-class [[nodiscard]] Observation {
+class QUILT_EXPORT [[nodiscard]] Observation {
  public:
+  /// Observes nothing.
   Observation() = default;
+  /// @{
+  /// Takes the observation over; what this handle observed before ends.
   Observation(Observation&&) noexcept = default;
   Observation& operator=(Observation&& other) noexcept;
+  /// @}
   ~Observation() { reset(); }
 
+  /// Ends the observation, after waiting for an observer that runs on another thread.
   void reset();
+  /// Whether there is an observation that was not ended by this handle.
   explicit operator bool() const { return _entry != nullptr; }
 
  private:

@@ -6,6 +6,7 @@
 #include <utility>
 #include <vector>
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/PropertyList.h"
 
 namespace quilt::platform {
@@ -14,8 +15,9 @@ class PasteboardItem;
 
 /// What is being copied or dragged: property lists by type, in memory. A host carries them over to its toolkit's
 /// clipboard. One thread at a time.
-class Pasteboard {
+class QUILT_EXPORT Pasteboard {
  public:
+  /// Forgets what was written.
   void clearContents() { _items.clear(); }
   /// Appends what the object writes of itself, one property list for each of its types.
   void writeObject(const PasteboardItem& object);
@@ -36,7 +38,7 @@ inline constexpr unsigned kPasteboardNoOptions = 0;
 inline constexpr unsigned kPasteboardReadingAsString = 1;
 
 /// An object that can be put on a pasteboard.
-class PasteboardItem {
+class QUILT_EXPORT PasteboardItem {
  public:
   virtual ~PasteboardItem() = default;
 
@@ -44,6 +46,7 @@ class PasteboardItem {
   [[nodiscard]] virtual std::vector<std::string> writableTypesForPasteboard(const Pasteboard& pasteboard) const = 0;
   /// kPasteboardNoOptions, or flags.
   [[nodiscard]] virtual unsigned writingOptionsForType(const std::string& type, const Pasteboard& pasteboard) const = 0;
+  /// What the object is under one of its writable types.
   [[nodiscard]] virtual PropertyList pasteboardPropertyListForType(const std::string& type) const = 0;
 };
 

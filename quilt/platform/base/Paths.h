@@ -5,24 +5,26 @@
 #include <string>
 #include <string_view>
 
+#include "quilt/platform/base/Export.h"
+
 namespace quilt::platform {
 
 /// Whether a name from a record may become one component of a path: not empty, not "." or "..", no "/" and no NUL, at
 /// most 255 bytes.
-bool isPlainComponent(std::string_view name);
+QUILT_EXPORT bool isPlainComponent(std::string_view name);
 
 /// `path` expressed relative to the folder `base`, by their components alone: "/a/b/c" to "/a" gives "b/c"; a path
 /// outside climbs with "..". An empty `base` or `path` gives `path` unchanged.
-std::filesystem::path pathRelativeTo(const std::filesystem::path& path, const std::filesystem::path& base);
+QUILT_EXPORT std::filesystem::path pathRelativeTo(const std::filesystem::path& path, const std::filesystem::path& base);
 
 /// Expands a leading "~" (the user's home folder), removes "." and ".." components and doubled or trailing separators,
 /// all by the text alone.
-std::filesystem::path standardizedPath(const std::filesystem::path& path);
+QUILT_EXPORT std::filesystem::path standardizedPath(const std::filesystem::path& path);
 
 /// The extension without its dot; empty when there is none.
-std::string pathExtension(const std::filesystem::path& path);
+QUILT_EXPORT std::string pathExtension(const std::filesystem::path& path);
 
 /// `base` with "." and the extension appended; `base` alone when the extension is empty.
-std::string withExtension(std::string_view base, std::string_view extension);
+QUILT_EXPORT std::string withExtension(std::string_view base, std::string_view extension);
 
 }  // namespace quilt::platform

@@ -18,8 +18,10 @@ using ObjectProgressionBlock = std::function<bool(const std::shared_ptr<T>& obje
 /// block is never called and always goes on.
 using ContinueBlock = std::function<bool()>;
 
+/// Tells the block, and answers what it answers; true without one.
 inline bool report(const ProgressionBlock& block, double percentage) { return !block || block(percentage); }
 
+/// The same for the two-argument form.
 template <class T>
 bool report(const ObjectProgressionBlock<T>& block, const std::shared_ptr<T>& object, double percentage) {
   return !block || block(object, percentage);

@@ -20,11 +20,13 @@ class Property {
   Property(const Property&) = delete;
   Property& operator=(const Property&) = delete;
 
+  /// A copy of the value.
   [[nodiscard]] T get() const {
     const std::lock_guard guard(_owner._mutex);
     return _value;
   }
 
+  /// Sets the value between its announcements.
   void set(T value) {
     _owner.willChangeValueForKey(_key);
     store(std::move(value));
@@ -59,9 +61,12 @@ class Property {
 template <class T>
 class WeakProperty {
  public:
+  /// `key` is a literal: it is kept by reference. Null at first.
   WeakProperty(Object& owner, std::string_view key) : _reference(owner, key) {}
 
+  /// The owner, kept alive while the answer is held; null when there is none, or none any more.
   [[nodiscard]] std::shared_ptr<T> get() const { return _reference.get().lock(); }
+  /// Points to an owner, or with null to none; announced as Property::set announces.
   void set(const std::shared_ptr<T>& value) { _reference.set(value); }
 
  private:

@@ -5,6 +5,7 @@
 #include <cstddef>
 #include <mutex>
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/MainThread.h"
 
 namespace quilt::platform {
@@ -17,15 +18,19 @@ namespace quilt::platform {
 /// - When the main thread has to wait for it, it runs the blocks queued for it meanwhile.
 ///
 /// Meets the standard's Lockable requirements; use it with std::unique_lock.
-class RecursiveMonitor {
+class QUILT_EXPORT RecursiveMonitor {
  public:
   RecursiveMonitor() = default;
   RecursiveMonitor(const RecursiveMonitor&) = delete;
   RecursiveMonitor& operator=(const RecursiveMonitor&) = delete;
 
+  /// @{
+  /// Enters, waiting as long as it takes; enters when that is possible at once, and answers whether; leaves, once for
+  /// each time entered.
   void lock();
   bool try_lock();
   void unlock();
+  /// @}
 
  private:
   bool enterIfPossible();
@@ -37,6 +42,7 @@ class RecursiveMonitor {
   bool _mainThreadWaits = false;
 };
 
+/// Holds a monitor for its own life.
 using MonitorLock = std::unique_lock<RecursiveMonitor>;
 
 }  // namespace quilt::platform

@@ -6,10 +6,12 @@
 #include <string>
 #include <string_view>
 
+#include "quilt/platform/base/Export.h"
+
 namespace quilt::platform {
 
 /// The address of a file or of a web page. A value; never empty.
-class Url {
+class QUILT_EXPORT Url {
  public:
   /// The URL of a local file: "file://" and the absolute path, percent-encoded byte by byte, so that any name survives.
   /// A relative path is taken from the working folder.
@@ -19,12 +21,15 @@ class Url {
   /// names another host or holds an encoded NUL.
   static std::optional<Url> parse(std::string_view text);
 
+  /// Whether it is the URL of a local file.
   [[nodiscard]] bool isFileUrl() const { return _isFile; }
+  /// The URL as text, percent-encoded as it was given or made.
   [[nodiscard]] const std::string& absoluteString() const { return _text; }
 
   /// The path part, percent-decoded: for a file URL the file's path.
   [[nodiscard]] std::filesystem::path relativePath() const;
 
+  /// Equal when their texts are.
   bool operator==(const Url&) const = default;
 
  private:

@@ -89,8 +89,8 @@ std::shared_ptr<ImageWrapper> GlanceServices::pictureOfPage(const std::filesyste
   return nullptr;
 }
 
-void GlanceServices::prepareDocument(const std::filesystem::path& path) const {
-  if (isDocument(path)) (void)_documents->open(path);
+void GlanceServices::prepareDocument(const std::filesystem::path& path, const ContinueBlock& goesOn) const {
+  if (isDocument(path)) (void)_documents->open(path, goesOn);
 }
 
 std::size_t GlanceServices::documentPagesCount(const std::filesystem::path& path) const {

@@ -19,7 +19,7 @@ class GlanceServices final : public Glance {
   GlanceServices();
 
   [[nodiscard]] std::shared_ptr<ImageWrapper> thumbnailImageForURL(const Url& url) const override;
-  void prepareDocument(const std::filesystem::path& path) const override;
+  void prepareDocument(const std::filesystem::path& path, const ContinueBlock& goesOn = {}) const override;
   [[nodiscard]] std::size_t documentPagesCount(const std::filesystem::path& path) const override;
   [[nodiscard]] std::optional<DocumentPage> documentPageAtIndex(const std::filesystem::path& path,
                                                                 std::size_t index) const override;

@@ -34,7 +34,7 @@ void OpenDocuments::closeOthers() {
   }
 }
 
-Result<OpenDocuments::Found> OpenDocuments::open(const std::filesystem::path& path) {
+Result<OpenDocuments::Found> OpenDocuments::open(const std::filesystem::path& path, const ContinueBlock& goesOn) {
   const Result<FileAttributes> attributes = services().files->attributesOfItemAtPath(path);
   if (!attributes) return attributes.error();
   const FileIdentity identity = attributes->identity;
@@ -45,7 +45,8 @@ Result<OpenDocuments::Found> OpenDocuments::open(const std::filesystem::path& pa
     if (known.failure) return Error{known.failure->kind, known.failure->text, path};
   }
   // Unlocked: it may take long, and two threads that open one document at once do no harm.
-  Result<std::shared_ptr<PagedDocument>> opened = services().documents->openDocument(path);
+  Result<std::shared_ptr<PagedDocument>> opened = services().documents->openDocument(path, goesOn);
+  if (!opened && opened.error().kind == ErrorKind::Cancelled) return opened.error();
   if (!opened) warn(path, identity, opened.error());
   const std::lock_guard lock(_mutex);
   Entry& known = entry(identity);

@@ -26,8 +26,8 @@ class OpenDocuments {
     std::shared_ptr<PagedDocument> document;
   };
 
-  /// Opens what is at the path.
-  Result<Found> open(const std::filesystem::path& path);
+  /// Opens what is at the path. Being cancelled by `goesOn` is no failure of the file's.
+  Result<Found> open(const std::filesystem::path& path, const ContinueBlock& goesOn = {});
   /// The document that was open under this identity. One that was moved away is found as long as it is kept open; a
   /// changed one is NotFound.
   Result<std::shared_ptr<PagedDocument>> reopen(const std::filesystem::path& path, const FileIdentity& identity);

@@ -6,16 +6,18 @@
 #include <string_view>
 #include <vector>
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/PropertyList.h"
 
 namespace quilt::platform {
 
 /// A folder with metadata ("Info.plist") and resources. The metadata lies in the folder or in its "Contents"; resources
 /// lie in "Resources" beside the metadata, else beside the metadata itself.
-class Bundle {
+class QUILT_EXPORT Bundle {
  public:
   virtual ~Bundle() = default;
 
+  /// The folder that was opened.
   [[nodiscard]] virtual const std::filesystem::path& path() const = 0;
   /// A metadata value, read from disk by each call. None when the file cannot be read or lacks the key.
   [[nodiscard]] virtual std::optional<PropertyList> infoDictionaryNoCacheValueForKey(std::string_view key) const = 0;
@@ -24,7 +26,7 @@ class Bundle {
 };
 
 /// Opens and finds bundles. Any thread.
-class Bundles {
+class QUILT_EXPORT Bundles {
  public:
   virtual ~Bundles() = default;
 
@@ -39,9 +41,11 @@ class Bundles {
       std::string_view withSearchPath, std::string_view andExtension, bool includingApplicationBundle) const = 0;
 };
 
+/// @{
 /// The metadata keys of a bundle.
 inline constexpr const char* kBundleIdentifierKey = "CFBundleIdentifier";
 inline constexpr const char* kBundleDisplayNameKey = "CFBundleDisplayName";
 inline constexpr const char* kBundleShortVersionKey = "CFBundleShortVersionString";
+/// @}
 
 }  // namespace quilt::platform

@@ -5,11 +5,12 @@
 #include <string_view>
 
 #include "quilt/platform/base/Date.h"
+#include "quilt/platform/base/Export.h"
 
 namespace quilt::platform {
 
 /// Dates for people. Any thread.
-class DateFormatter {
+class QUILT_EXPORT DateFormatter {
  public:
   virtual ~DateFormatter() = default;
 

@@ -7,7 +7,9 @@
 #include <string>
 
 #include "quilt/platform/base/Bitmap.h"
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Geometry.h"
+#include "quilt/platform/base/ProgressionBlock.h"
 #include "quilt/platform/base/Result.h"
 
 namespace quilt::platform {
@@ -15,7 +17,7 @@ namespace quilt::platform {
 /// One opened document. Any thread; calls on one document wait for each other. Pages are counted from 0. Each call
 /// fails when the page does not exist (NotFound) or cannot be made sense of (Damaged), and then leaves the document as
 /// it was.
-class PagedDocument {
+class QUILT_EXPORT PagedDocument {
  public:
   virtual ~PagedDocument() = default;
 
@@ -32,14 +34,15 @@ class PagedDocument {
 };
 
 /// Opens documents. Any thread.
-class DocumentToolkit {
+class QUILT_EXPORT DocumentToolkit {
  public:
   virtual ~DocumentToolkit() = default;
 
   /// Fails as NotFound without a file, as Damaged for what is no document or has no pages, as Unsupported for what is
-  /// protected by a password or against copying and for kinds that nothing here handles.
-  [[nodiscard]] virtual Result<std::shared_ptr<PagedDocument>> openDocument(
-      const std::filesystem::path& path) const = 0;
+  /// protected by a password or against copying and for kinds that nothing here handles. Where opening may take
+  /// seconds, `goesOn` is asked several times a second, and after its first false the answer is Cancelled.
+  [[nodiscard]] virtual Result<std::shared_ptr<PagedDocument>> openDocument(const std::filesystem::path& path,
+                                                                            const ContinueBlock& goesOn = {}) const = 0;
 };
 
 }  // namespace quilt::platform

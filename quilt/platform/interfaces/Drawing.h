@@ -5,6 +5,7 @@
 #include <optional>
 
 #include "quilt/platform/base/Bitmap.h"
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Geometry.h"
 #include "quilt/platform/base/Result.h"
 
@@ -12,26 +13,31 @@ namespace quilt::platform {
 
 /// sRGB, each part from 0 to 1.
 struct Color {
+  /// @{
+  /// From 0 to 1; alpha 1 is opaque.
   double red = 0;
   double green = 0;
   double blue = 0;
   double alpha = 1;
+  /// @}
 };
 
+/// Opaque black.
 inline constexpr Color kBlack{0, 0, 0, 1};
 
 /// A shadow that falls straight down: no offset, only blur.
 struct Shadow {
   double blurRadius = 0;  ///< pixels; a Gaussian of half this deviation
-  Color color;
+  Color color;            ///< with the alpha of its darkest place
 };
 
 /// An offscreen picture in the making: origin at the lower left, y growing upwards, images with their own upper edge
 /// upwards. What lies outside of it is cut off. One thread at a time.
-class Canvas {
+class QUILT_EXPORT Canvas {
  public:
   virtual ~Canvas() = default;
 
+  /// Lays the colour over the whole canvas.
   virtual void fill(Color color) = 0;
   /// Draws the part `from` of the image, in its pixels with the origin at its lower left, over what is there into `to`,
   /// scaled with high quality; its shadow first. With a corner radius the image is cut to a rounded `to`.
@@ -49,7 +55,7 @@ class Canvas {
 };
 
 /// Makes canvases. Any thread.
-class Drawing {
+class QUILT_EXPORT Drawing {
  public:
   virtual ~Drawing() = default;
 

@@ -4,13 +4,14 @@
 #include <filesystem>
 #include <string_view>
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/ProgressionBlock.h"
 #include "quilt/platform/base/Result.h"
 
 namespace quilt::platform {
 
 /// Zip archives.
-class FDYArchive {
+class QUILT_EXPORT FDYArchive {
  public:
   virtual ~FDYArchive() = default;
 

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/ProgressionBlock.h"
 #include "quilt/platform/base/Result.h"
 #include "quilt/platform/base/Url.h"
@@ -8,7 +9,7 @@
 namespace quilt::platform {
 
 /// Extracts the points that a host draws a waveform from.
-class FDYAudioPreview {
+class QUILT_EXPORT FDYAudioPreview {
  public:
   virtual ~FDYAudioPreview() = default;
 

@@ -3,6 +3,7 @@
 
 #include <functional>
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Result.h"
 #include "quilt/platform/base/Url.h"
 
@@ -13,7 +14,7 @@ using TranscoderProgressBlock = std::function<void(float progress, bool& stop)>;
 
 /// Makes the derivatives of movies and audio. Each operation runs on the calling thread and leaves nothing at the
 /// destination unless it succeeds.
-class FDYMediaTranscoder {
+class QUILT_EXPORT FDYMediaTranscoder {
  public:
   virtual ~FDYMediaTranscoder() = default;
 

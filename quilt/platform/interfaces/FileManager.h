@@ -9,34 +9,43 @@
 #include <vector>
 
 #include "quilt/platform/base/Date.h"
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Result.h"
 
 namespace quilt::platform {
 
+/// What is at a path: nothing, a plain file, a folder, or something else (a device, a socket).
 enum class FileKind { Missing, File, Folder, Other };
 
 /// What tells one state of a file from another without reading it.
 struct FileIdentity {
+  /// @{
+  /// Of the file system and the item in it; bytes.
   std::uint64_t device = 0;
   std::uint64_t inode = 0;
   std::uint64_t size = 0;
+  /// @}
   std::int64_t changed = 0;  ///< change time in nanoseconds since 1970
+  /// Equal when nothing tells them apart: the content is the same.
   bool operator==(const FileIdentity&) const = default;
 };
 
+/// What the file system says of an item, symbolic links followed.
 struct FileAttributes {
-  FileKind kind = FileKind::Missing;
-  std::uint64_t size = 0;  ///< bytes
-  Date modified;
-  FileIdentity identity;
+  FileKind kind = FileKind::Missing;  ///< what it is
+  std::uint64_t size = 0;             ///< bytes
+  Date modified;                      ///< when the content last changed
+  FileIdentity identity;              ///< of this state of it
 };
 
+/// Where a copy is.
 enum class CopyStage { Start, Progress, Finish, Error };
+/// Whether a copy goes on.
 enum class CopyAnswer { Continue, Quit };
 
 /// What a copy callback may ask about the copy under way.
 struct CopyState {
-  std::int64_t copiedBytes = 0;
+  std::int64_t copiedBytes = 0;  ///< of the file under way
 };
 
 /// Called while a file is copied: once with Start, with Progress after each stretch of data (never for an empty file),
@@ -46,7 +55,7 @@ using CopyCallback = CopyAnswer (*)(int what, CopyStage stage, const CopyState& 
                                     void* context);
 
 /// An exclusive lock on a file, given up by the destructor or the end of the process.
-class FileLock {
+class QUILT_EXPORT FileLock {
  public:
   virtual ~FileLock() = default;
 
@@ -56,12 +65,13 @@ class FileLock {
 
 /// The file system. Paths are absolute. Every operation may be called on any thread; none leaves a partial result
 /// under a final name. Errors carry the file and a sentence for people.
-class FileManager {
+class QUILT_EXPORT FileManager {
  public:
   virtual ~FileManager() = default;
 
   /// What is at the path, symbolic links followed; Missing also when a component cannot be searched.
   [[nodiscard]] virtual FileKind kindOfItemAtPath(const std::filesystem::path& path) const = 0;
+  /// Whether something is there, of whatever kind.
   [[nodiscard]] bool fileExistsAtPath(const std::filesystem::path& path) const {
     return kindOfItemAtPath(path) != FileKind::Missing;
   }
@@ -70,6 +80,7 @@ class FileManager {
   /// end. True also when nothing is there yet, as long as what is there is no link.
   [[nodiscard]] virtual bool isConfined(const std::filesystem::path& path, const std::filesystem::path& root) const = 0;
 
+  /// NotFound when nothing is there.
   [[nodiscard]] virtual Result<FileAttributes> attributesOfItemAtPath(const std::filesystem::path& path) const = 0;
 
   /// Makes a folder with its missing parents. A folder that is there already is no error.

@@ -3,12 +3,13 @@
 
 #include <string>
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/PropertyList.h"
 
 namespace quilt::platform {
 
 /// Property-list values as JSON text. Any thread.
-class JsonWriter {
+class QUILT_EXPORT JsonWriter {
  public:
   virtual ~JsonWriter() = default;
 

@@ -6,6 +6,7 @@
 #include <optional>
 #include <vector>
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Result.h"
 #include "quilt/platform/interfaces/FDYMedia.h"
 #include "quilt/platform/interfaces/ImageWrapper.h"
@@ -13,7 +14,7 @@
 namespace quilt::platform {
 
 /// One opened movie. Used by one thread at a time. Times are seconds from the start.
-class Movie {
+class QUILT_EXPORT Movie {
  public:
   virtual ~Movie() = default;
 
@@ -21,6 +22,7 @@ class Movie {
   [[nodiscard]] virtual std::optional<double> duration() const = 0;
   /// The time of the poster frame that the author chose; none when none is recorded.
   [[nodiscard]] virtual std::optional<double> posterTime() const = 0;
+  /// In order of time; empty when there are none.
   [[nodiscard]] virtual const std::vector<Chapter>& chapters() const = 0;
 
   /// The start of the key frame at or before the time; none when the file has no usable index there.
@@ -32,9 +34,10 @@ class Movie {
 };
 
 /// Opens movies. Any thread.
-class MovieToolkit {
+class QUILT_EXPORT MovieToolkit {
  public:
   virtual ~MovieToolkit() = default;
+  /// NotFound without a file, Damaged or Unsupported for what is no movie. The file stays open while the movie lives.
   [[nodiscard]] virtual Result<std::unique_ptr<Movie>> openMovie(const std::filesystem::path& path) const = 0;
 };
 

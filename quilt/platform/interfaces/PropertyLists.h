@@ -5,13 +5,14 @@
 #include <string>
 #include <string_view>
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/PropertyList.h"
 #include "quilt/platform/base/Result.h"
 
 namespace quilt::platform {
 
 /// Property lists as text and as files. Every operation may be called on any thread.
-class PropertyLists {
+class QUILT_EXPORT PropertyLists {
  public:
   virtual ~PropertyLists() = default;
 

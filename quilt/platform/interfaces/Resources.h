@@ -5,11 +5,13 @@
 #include <string>
 #include <string_view>
 
+#include "quilt/platform/base/Export.h"
+
 namespace quilt::platform {
 
 /// The library's own bundle: the strings of the table "Localizable" and the artwork used in drawing, compiled in.
 /// May be called on any thread.
-class Resources {
+class QUILT_EXPORT Resources {
  public:
   virtual ~Resources() = default;
 

@@ -3,11 +3,13 @@
 
 #include <functional>
 
+#include "quilt/platform/base/Export.h"
+
 namespace quilt::platform {
 
 /// The loop of the main thread. A host with a loop of its own (a toolkit's) installs an adapter that calls
 /// MainThread::runQueuedBlocks() when it is woken.
-class RunLoop {
+class QUILT_EXPORT RunLoop {
  public:
   virtual ~RunLoop() = default;
 

@@ -41,7 +41,9 @@ std::shared_ptr<ImageWrapper> FDYThumbnailImageForURL(const Url& url) {
   return services().glance->thumbnailImageForURL(url);
 }
 
-void FDYPreviewPrepareDocument(const std::filesystem::path& path) { services().glance->prepareDocument(path); }
+void FDYPreviewPrepareDocument(const std::filesystem::path& path, const ContinueBlock& goesOn) {
+  services().glance->prepareDocument(path, goesOn);
+}
 
 std::size_t FDYPreviewDocumentPagesCount(const std::filesystem::path& path) {
   return services().glance->documentPagesCount(path);

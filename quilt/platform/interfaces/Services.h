@@ -4,6 +4,7 @@
 #include <memory>
 #include <utility>
 
+#include "quilt/platform/base/Export.h"
 #include "quilt/platform/interfaces/Bundles.h"
 #include "quilt/platform/interfaces/Clock.h"
 #include "quilt/platform/interfaces/DateFormatter.h"
@@ -29,33 +30,33 @@ namespace quilt::platform {
 
 /// One implementation of every operation that the model requires of the world. All are present in an installed set.
 struct Services {
-  std::shared_ptr<FileManager> files;
-  std::shared_ptr<PropertyLists> propertyLists;
-  std::shared_ptr<UuidGenerator> uuids;
-  std::shared_ptr<Clock> clock;
-  std::shared_ptr<Resources> resources;
-  std::shared_ptr<TypeIdentifiers> types;
-  std::shared_ptr<MediaInspector> inspector;
-  std::shared_ptr<Images> images;
-  std::shared_ptr<Drawing> drawing;
-  std::shared_ptr<MovieToolkit> movies;
-  std::shared_ptr<FDYAudioPreview> audioPreview;
-  std::shared_ptr<FDYMediaTranscoder> transcoder;
-  std::shared_ptr<FDYArchive> archive;
-  std::shared_ptr<Glance> glance;
-  std::shared_ptr<Bundles> bundles;
-  std::shared_ptr<RunLoop> runLoop;
-  std::shared_ptr<Diagnostics> diagnostics;
-  std::shared_ptr<JsonWriter> json;
-  std::shared_ptr<DateFormatter> dates;
-  std::shared_ptr<DocumentToolkit> documents;
+  std::shared_ptr<FileManager> files;              ///< the file system
+  std::shared_ptr<PropertyLists> propertyLists;    ///< records as text and as files
+  std::shared_ptr<UuidGenerator> uuids;            ///< fresh identities
+  std::shared_ptr<Clock> clock;                    ///< the time of day
+  std::shared_ptr<Resources> resources;            ///< the library's strings and artwork
+  std::shared_ptr<TypeIdentifiers> types;          ///< which type a file is of
+  std::shared_ptr<MediaInspector> inspector;       ///< what is in a media file
+  std::shared_ptr<Images> images;                  ///< lazy images
+  std::shared_ptr<Drawing> drawing;                ///< offscreen canvases
+  std::shared_ptr<MovieToolkit> movies;            ///< frames and chapters
+  std::shared_ptr<FDYAudioPreview> audioPreview;   ///< waveform points
+  std::shared_ptr<FDYMediaTranscoder> transcoder;  ///< conversion between grades
+  std::shared_ptr<FDYArchive> archive;             ///< zip archives
+  std::shared_ptr<Glance> glance;                  ///< thumbnails and pages
+  std::shared_ptr<Bundles> bundles;                ///< theme bundles
+  std::shared_ptr<RunLoop> runLoop;                ///< the main thread's loop
+  std::shared_ptr<Diagnostics> diagnostics;        ///< what this build can do
+  std::shared_ptr<JsonWriter> json;                ///< the data script
+  std::shared_ptr<DateFormatter> dates;            ///< dates for people
+  std::shared_ptr<DocumentToolkit> documents;      ///< pages of documents
 };
 
 /// The process's set. Written by installServices and ScopedService only.
-const Services& services();
+QUILT_EXPORT const Services& services();
 
 /// Replaces the whole set. While no other thread uses the library.
-void installServices(Services set);
+QUILT_EXPORT void installServices(Services set);
 
 /// Replaces one service for the life of the object, while no other thread uses the library:
 ///
@@ -63,6 +64,7 @@ void installServices(Services set);
 template <class T>
 class [[nodiscard]] ScopedService {
  public:
+  /// Replaces the service now; null leaves the set without one.
   ScopedService(std::shared_ptr<T> Services::*member, std::shared_ptr<T> service)
       : _member(member), _previous(services().*member) {
     replace(std::move(service));

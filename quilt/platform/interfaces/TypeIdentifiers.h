@@ -7,10 +7,14 @@
 #include <string>
 #include <string_view>
 
+#include "quilt/platform/base/Export.h"
+
 namespace quilt::platform {
 
 /// The type identifiers that the model names. Public ones where one is in general use, else this library's own.
 namespace types {
+/// @{
+/// The families: what every item is, web addresses and folders, and the kinds of media.
 inline constexpr const char* kItem = "public.item";
 inline constexpr const char* kURL = "public.url";
 inline constexpr const char* kFolder = "public.folder";
@@ -19,7 +23,10 @@ inline constexpr const char* kMovie = "public.movie";
 inline constexpr const char* kVideo = "public.video";
 inline constexpr const char* kAudio = "public.audio";
 inline constexpr const char* kImage = "public.image";
+/// @}
 
+/// @{
+/// Sound.
 inline constexpr const char* kAIFF = "public.aiff-audio";
 inline constexpr const char* kAIFC = "public.aifc-audio";
 inline constexpr const char* kM4A = "org.quilt.m4a-audio";
@@ -27,7 +34,10 @@ inline constexpr const char* kMP3 = "public.mp3";
 inline constexpr const char* kMPEG4Audio = "public.mpeg-4-audio";
 inline constexpr const char* kProtectedMPEG4Audio = "org.quilt.protected-mpeg-4-audio";
 inline constexpr const char* kWAV = "org.quilt.waveform-audio";
+/// @}
 
+/// @{
+/// Movies.
 inline constexpr const char* kMovieContainer = "org.quilt.movie-container";
 inline constexpr const char* kMPEG4 = "public.mpeg-4";
 inline constexpr const char* kMPEG = "public.mpeg";
@@ -37,7 +47,10 @@ inline constexpr const char* k3GPP = "public.3gpp";
 inline constexpr const char* kAVI = "public.avi";
 inline constexpr const char* kMatroska = "org.matroska.mkv";
 inline constexpr const char* kWebM = "org.webmproject.webm";
+/// @}
 
+/// @{
+/// Images.
 inline constexpr const char* kJPEG = "public.jpeg";
 inline constexpr const char* kJPEG2000 = "public.jpeg-2000";
 inline constexpr const char* kTIFF = "public.tiff";
@@ -47,9 +60,12 @@ inline constexpr const char* kICNS = "org.quilt.icon-file";
 inline constexpr const char* kBMP = "com.microsoft.bmp";
 inline constexpr const char* kHEIC = "public.heic";
 inline constexpr const char* kSVG = "public.svg-image";
+/// @}
 
+/// @{
+/// Documents and texts.
 inline constexpr const char* kPDF = "com.adobe.pdf";
-inline constexpr const char* kEPUB = "org.quilt.epub";  // the platform's own identifier
+inline constexpr const char* kEPUB = "org.quilt.epub";  // this library's own, beside the public one
 inline constexpr const char* kEPUBContainer = "org.idpf.epub-container";
 inline constexpr const char* kTextDocument = "org.oasis-open.opendocument.text";
 inline constexpr const char* kFlatTextDocument = "org.oasis-open.opendocument.text-flat-xml";
@@ -62,10 +78,11 @@ inline constexpr const char* kPowerPointPpt = "com.microsoft.powerpoint.ppt";
 inline constexpr const char* kPowerPointOpenXML = "org.openxmlformats.presentationml.presentation";
 inline constexpr const char* kText = "public.plain-text";
 inline constexpr const char* kHTML = "public.html";
+/// @}
 }  // namespace types
 
 /// Which type a file is of, and how types relate. May be called on any thread.
-class TypeIdentifiers {
+class QUILT_EXPORT TypeIdentifiers {
  public:
   virtual ~TypeIdentifiers() = default;
 
@@ -103,6 +120,6 @@ inline bool isPagedDocument(const TypeIdentifiers& types, std::string_view ident
 }  // namespace types
 
 /// The installed service's preferredIdentifier.
-std::optional<std::string> FDYTypePreferredIdentifier(const std::filesystem::path& path);
+QUILT_EXPORT std::optional<std::string> FDYTypePreferredIdentifier(const std::filesystem::path& path);
 
 }  // namespace quilt::platform

@@ -3,10 +3,12 @@
 
 #include <string>
 
+#include "quilt/platform/base/Export.h"
+
 namespace quilt::platform {
 
 /// Fresh identities. May be called on any thread.
-class UuidGenerator {
+class QUILT_EXPORT UuidGenerator {
  public:
   virtual ~UuidGenerator() = default;
 
@@ -15,6 +17,6 @@ class UuidGenerator {
 };
 
 /// A UUID from the installed generator.
-std::string generateUUID();
+QUILT_EXPORT std::string generateUUID();
 
 }  // namespace quilt::platform

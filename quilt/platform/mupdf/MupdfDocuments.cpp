@@ -201,7 +201,8 @@ class MupdfDocument final : public PagedDocument {
 
 }  // namespace
 
-Result<std::shared_ptr<PagedDocument>> MupdfDocuments::openDocument(const std::filesystem::path& path) const {
+Result<std::shared_ptr<PagedDocument>> MupdfDocuments::openDocument(const std::filesystem::path& path,
+                                                                    const ContinueBlock& /*goesOn*/) const {
   const Result<DocumentKind> kind = mupdf::kindOfDocument(path);
   if (!kind) return kind.error();
   // The book's own description tells better than a failed layout why it cannot be shown.

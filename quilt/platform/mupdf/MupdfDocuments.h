@@ -11,7 +11,8 @@ namespace quilt::platform {
 /// Scripts are not run, and nothing outside the file is read.
 class MupdfDocuments final : public DocumentToolkit {
  public:
-  [[nodiscard]] Result<std::shared_ptr<PagedDocument>> openDocument(const std::filesystem::path& path) const override;
+  [[nodiscard]] Result<std::shared_ptr<PagedDocument>> openDocument(const std::filesystem::path& path,
+                                                                    const ContinueBlock& goesOn = {}) const override;
 };
 
 }  // namespace quilt::platform

@@ -79,14 +79,16 @@ void limit(__rlimit_resource resource, rlim_t value) {
   _exit(kNotStarted);
 }
 
-// The child's status, or none when the time is over.
-std::optional<int> wait(pid_t child, std::chrono::steady_clock::time_point deadline) {
+// The child's status, or none when the time is over or the caller wants no more.
+std::optional<int> wait(pid_t child, std::chrono::steady_clock::time_point deadline, bool& isCancelled,
+                        const ContinueBlock& goesOn) {
   for (int status = 0;;) {
     const pid_t ended = waitpid(child, &status, WNOHANG);
     if (ended == child) return status;
     // A host that ignores its children's ends never hears of them; what the child made tells then.
     if (ended < 0 && errno != EINTR) return 0;
-    if (std::chrono::steady_clock::now() > deadline) return std::nullopt;
+    isCancelled = goesOn && !goesOn();
+    if (isCancelled || std::chrono::steady_clock::now() > deadline) return std::nullopt;
     std::this_thread::sleep_for(kPause);
   }
 }
@@ -94,7 +96,8 @@ std::optional<int> wait(pid_t child, std::chrono::steady_clock::time_point deadl
 }  // namespace
 
 ChildResult runChild(const std::filesystem::path& program, const std::vector<std::string>& arguments,
-                     const std::vector<std::string>& environment, std::chrono::milliseconds timeout) {
+                     const std::vector<std::string>& environment, std::chrono::milliseconds timeout,
+                     const ContinueBlock& goesOn) {
   std::vector<std::string> all{program.native()};
   all.insert(all.end(), arguments.begin(), arguments.end());
   const std::string user = std::to_string(geteuid());
@@ -112,11 +115,12 @@ ChildResult runChild(const std::filesystem::path& program, const std::vector<std
   if (child == 0) become(prepared);
   setpgid(child, child);  // here as well: whichever comes first
 
-  const std::optional<int> status = wait(child, std::chrono::steady_clock::now() + timeout);
+  bool isCancelled = false;
+  const std::optional<int> status = wait(child, std::chrono::steady_clock::now() + timeout, isCancelled, goesOn);
   kill(-child, SIGKILL);
   if (!status) {
     waitpid(child, nullptr, 0);
-    return {ChildEnd::TimedOut, 0};
+    return {isCancelled ? ChildEnd::Cancelled : ChildEnd::TimedOut, 0};
   }
   if (!WIFEXITED(*status)) return {ChildEnd::Killed, 0};
   if (WEXITSTATUS(*status) == kNotStarted) return {ChildEnd::NotStarted, 0};

@@ -43,6 +43,13 @@ constexpr const char* kProfile = R"(<?xml version="1.0" encoding="UTF-8"?>
 </oor:items>
 )";
 
+// Between two questions whether to go on waiting for another conversion.
+constexpr std::chrono::milliseconds kTurn(50);
+
+Error cancelled(const fs::path& path) {
+  return {ErrorKind::Cancelled, "The conversion of the document was cancelled.", path};
+}
+
 bool isProgram(const fs::path& path) {
   std::error_code error;
   return fs::is_regular_file(path, error) && access(path.c_str(), X_OK) == 0;
@@ -128,12 +135,17 @@ OfficeDocuments::OfficeDocuments(std::shared_ptr<const DocumentToolkit> pdf)
 OfficeDocuments::OfficeDocuments(std::shared_ptr<const DocumentToolkit> pdf, Settings settings)
     : _pdf(std::move(pdf)), _settings(std::move(settings)), _cache(_settings.cache, _settings.maximumCache) {}
 
-Result<std::shared_ptr<PagedDocument>> OfficeDocuments::openDocument(const fs::path& path) const {
-  return isOfficeDocument(path) ? openConverted(path) : _pdf->openDocument(path);
+Result<std::shared_ptr<PagedDocument>> OfficeDocuments::openDocument(const fs::path& path,
+                                                                     const ContinueBlock& goesOn) const {
+  return isOfficeDocument(path) ? openConverted(path, goesOn) : _pdf->openDocument(path, goesOn);
 }
 
-Result<std::shared_ptr<PagedDocument>> OfficeDocuments::openConverted(const fs::path& path) const {
-  const std::lock_guard lock(_conversion);
+Result<std::shared_ptr<PagedDocument>> OfficeDocuments::openConverted(const fs::path& path,
+                                                                      const ContinueBlock& goesOn) const {
+  std::unique_lock lock(_conversion, std::defer_lock);
+  while (!lock.try_lock_for(kTurn)) {
+    if (goesOn && !goesOn()) return cancelled(path);
+  }
   const std::string extension = plainExtension(path);
   const Result<fs::path> kept = _cache.pathFor(path, extension);
   if (!kept) return kept.error();
@@ -141,14 +153,15 @@ Result<std::shared_ptr<PagedDocument>> OfficeDocuments::openConverted(const fs::
     // One that cannot be opened was damaged in the cache, and is made anew.
     if (Result<std::shared_ptr<PagedDocument>> opened = _pdf->openDocument(*kept)) return opened;
   }
-  const Result<fs::path> converted = convert(path, extension);
+  const Result<fs::path> converted = convert(path, extension, goesOn);
   if (!converted) return converted.error();
   Result<std::shared_ptr<PagedDocument>> opened = _pdf->openDocument(*converted);
   if (!opened) return Error{opened.error().kind, opened.error().text, path};
   return opened;
 }
 
-Result<fs::path> OfficeDocuments::convert(const fs::path& path, const std::string& extension) const {
+Result<fs::path> OfficeDocuments::convert(const fs::path& path, const std::string& extension,
+                                          const ContinueBlock& goesOn) const {
   if (_settings.program.empty()) {
     return Error{ErrorKind::NotFound, "LibreOffice, which office documents need, is not installed.", path};
   }
@@ -158,7 +171,7 @@ Result<fs::path> OfficeDocuments::convert(const fs::path& path, const std::strin
   Result<fs::path> pdf = Error{ErrorKind::InputOutput, "The document cannot be copied to be converted.", path};
   if (services().files->copyfile(path, copy, nullptr, nullptr) == 0) pdf = _cache.pathFor(copy, extension);
   if (pdf) {
-    Result<void> made = convertIn(*work, path, copy);
+    Result<void> made = convertIn(*work, path, copy, goesOn);
     if (made) made = _cache.put(*work / "out/document.pdf", *pdf);
     if (!made) pdf = made.error();
   }
@@ -167,7 +180,8 @@ Result<fs::path> OfficeDocuments::convert(const fs::path& path, const std::strin
   return pdf;
 }
 
-Result<void> OfficeDocuments::convertIn(const fs::path& work, const fs::path& path, const fs::path& copy) const {
+Result<void> OfficeDocuments::convertIn(const fs::path& work, const fs::path& path, const fs::path& copy,
+                                        const ContinueBlock& goesOn) const {
   const fs::path profile = work / "profile";
   for (const fs::path& folder : {profile / "user", work / "out"}) {
     if (const Result<void> made = services().files->createDirectoryAtPath(folder); !made) return made.error();
@@ -187,15 +201,17 @@ Result<void> OfficeDocuments::convertIn(const fs::path& work, const fs::path& pa
                                      (work / "out").native()};
   if (isWebPage(copy)) arguments.emplace_back("--infilter=HTML (StarWriter)");
   arguments.push_back(copy.native());
-  ChildResult result = office::runChild(_settings.program, arguments, environmentFor(work), _settings.timeout);
+  ChildResult result = office::runChild(_settings.program, arguments, environmentFor(work), _settings.timeout, goesOn);
   if (result.end == ChildEnd::Exited && result.status == kStartAgain) {
-    result = office::runChild(_settings.program, arguments, environmentFor(work), _settings.timeout);
+    result = office::runChild(_settings.program, arguments, environmentFor(work), _settings.timeout, goesOn);
   }
   switch (result.end) {
     case ChildEnd::NotStarted:
       return Error{ErrorKind::NotFound, "LibreOffice, which office documents need, cannot be started.", path};
     case ChildEnd::TimedOut:
       return Error{ErrorKind::Damaged, "LibreOffice took too long to convert the document.", path};
+    case ChildEnd::Cancelled:
+      return cancelled(path);
     case ChildEnd::Killed:
       return Error{ErrorKind::Damaged, "LibreOffice crashed on the document.", path};
     case ChildEnd::Exited:

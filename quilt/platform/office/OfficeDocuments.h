@@ -32,22 +32,25 @@ class OfficeDocuments final : public DocumentToolkit {
   explicit OfficeDocuments(std::shared_ptr<const DocumentToolkit> pdf);
   OfficeDocuments(std::shared_ptr<const DocumentToolkit> pdf, Settings settings);
 
-  [[nodiscard]] Result<std::shared_ptr<PagedDocument>> openDocument(const std::filesystem::path& path) const override;
+  [[nodiscard]] Result<std::shared_ptr<PagedDocument>> openDocument(const std::filesystem::path& path,
+                                                                    const ContinueBlock& goesOn = {}) const override;
 
   /// LibreOffice's own program beside the `soffice` on the PATH or where systems install it; empty when there is none.
   static std::filesystem::path findProgram();
   static Capability capability();
 
  private:
-  Result<std::shared_ptr<PagedDocument>> openConverted(const std::filesystem::path& path) const;
-  Result<std::filesystem::path> convert(const std::filesystem::path& path, const std::string& extension) const;
+  Result<std::shared_ptr<PagedDocument>> openConverted(const std::filesystem::path& path,
+                                                       const ContinueBlock& goesOn) const;
+  Result<std::filesystem::path> convert(const std::filesystem::path& path, const std::string& extension,
+                                        const ContinueBlock& goesOn) const;
   Result<void> convertIn(const std::filesystem::path& work, const std::filesystem::path& path,
-                         const std::filesystem::path& copy) const;
+                         const std::filesystem::path& copy, const ContinueBlock& goesOn) const;
 
   const std::shared_ptr<const DocumentToolkit> _pdf;
   const Settings _settings;
   const office::PageCache _cache;
-  mutable std::mutex _conversion;
+  mutable std::timed_mutex _conversion;
 };
 
 }  // namespace quilt::platform

@@ -10,16 +10,27 @@ namespace {
 
 bool isPlain(unsigned char c) { return (c >= 0x20 && c < 0x80) || c == '\n' || c == '\t' || c == '\r'; }
 
+constexpr std::uint64_t kOnes = 0x0101010101010101U;
+constexpr std::uint64_t kHighBits = 0x80 * kOnes;
+
+/// The high bit of each byte that is zero, and no other bit.
+std::uint64_t zeroBytes(std::uint64_t word) { return ~(((word & ~kHighBits) + ~kHighBits) | word) & kHighBits; }
+
+/// Whether none of the eight bytes but tabs and line ends has its high bit set or is below a space.
+bool isPlain(std::uint64_t word) {
+  if (((word | ((word - 0x20 * kOnes) & ~word)) & kHighBits) == 0) return true;  // as most are, without white space
+  const std::uint64_t white =
+      zeroBytes(word ^ '\t' * kOnes) | zeroBytes(word ^ '\n' * kOnes) | zeroBytes(word ^ '\r' * kOnes);
+  return (((word & kHighBits) | zeroBytes(word & 0xE0 * kOnes)) & ~white) == 0;
+}
+
 /// How many bytes at the front are ASCII that XML can hold.
 std::size_t plainPrefix(std::string_view text) {
-  constexpr std::uint64_t ones = 0x0101010101010101U;
   std::size_t length = 0;
   while (length < text.size()) {
-    // Eight at a time, as long as none has its high bit set or is below a space.
     if (std::uint64_t word = 0; length + sizeof word <= text.size()) {
       std::memcpy(&word, text.data() + length, sizeof word);
-      const std::uint64_t odd = (word | ((word - 0x20 * ones) & ~word)) & (0x80 * ones);
-      if (odd == 0) {
+      if (isPlain(word)) {
         length += sizeof word;
         continue;
       }

@@ -10,6 +10,7 @@ export class ConveyorError extends Error {
    * 'no-accessor', 'wrong-arguments': the call is not as the class offers it.
    * 'no-object', 'no-session': the object, or this client's session, is no more.
    * 'busy': nothing was done; 'too-slow': it was begun and may still be done.
+   * 'not-saved': it was done, but the document's record cannot be written.
    * 'too-many-objects', 'too-many-sessions': a limit of the bridge.
    * 'bad-address', 'refused', 'bad-request', 'failed': everything else.
    */
@@ -146,7 +147,7 @@ export interface QuiltMediaSource {
   cvSetTitle(text: string | null): Promise<null>;
   /** Its description. */
   cvDescription(): Promise<string | null>;
-  /** Changes the description. */
+  /** Changes the description, until the record is read again: it keeps the title instead. */
   cvSetDescription(text: string | null): Promise<null>;
   /** Seconds from the start of its item; 0 when it has no time code. */
   cvTimeCode(): Promise<number>;

@@ -8,6 +8,7 @@
 #include "quilt/scripting/bridge/Page.h"
 #include "quilt/scripting/bridge/Secret.h"
 #include "quilt/scripting/bridge/http/Files.h"
+#include "quilt/scripting/bridge/http/Server.h"
 
 namespace quilt::scripting {
 
@@ -17,11 +18,12 @@ constexpr std::string_view kPackage = "package/";
 constexpr std::string_view kCalls = "conveyor/";
 constexpr std::string_view kEvents = "conveyor/events";
 constexpr std::string_view kScript = "conveyor.js";
+constexpr std::string_view kData = "package/controllers/data.js";
 
 http::Response missing() { return http::plain(404, "There is nothing here.\n"); }
 
 http::Response script() {
-  for (const auto& file : resources::embeddedFiles())
+  for (const auto& file : resources::embeddedScripts())
     if (file.path == "scripting/conveyor.js")
       return {200,
               {{"Content-Type", "text/javascript; charset=utf-8"}, {"Cache-Control", "no-cache"}},
@@ -39,12 +41,14 @@ class Bridge::Implementation {
         _token(makeSecret()),
         _door(server->port(), _token),
         _package{document->path(), withConveyor},
+        _within(options.callTime),
         _sessions(options.sessions, options.objectsPerSession, options.sessionIdle),
-        _calls(_sessions, _mainThread, {{"document", document}, {"collection", document->collectionOwner()}},
+        _keeper(document),
+        _calls(_sessions, _mainThread, _keeper, {{"document", document}, {"collection", document->collectionOwner()}},
                options.callTime),
         _server(std::move(server)) {
     _server->open({[this](const http::RequestHead& head) { return _door.judge(head); },
-                   [this](const http::Request& request) { return answer(request); }, [this] { _sessions.expire(); }});
+                   [this](const http::Request& request) { return answer(request); }, [this] { tick(); }});
   }
   Implementation(const Implementation&) = delete;
   Implementation& operator=(const Implementation&) = delete;
@@ -52,6 +56,7 @@ class Bridge::Implementation {
   ~Implementation() {
     _mainThread.end();
     _sessions.closeAll();
+    _keeper.settle();
   }
 
   [[nodiscard]] std::uint16_t port() const { return _server->port(); }
@@ -59,8 +64,18 @@ class Bridge::Implementation {
     return "http://127.0.0.1:" + std::to_string(port()) + '/' + _token + '/' + std::string(kPackage);
   }
   [[nodiscard]] std::size_t sessionCount() const { return _sessions.count(); }
+  bool settle() { return _keeper.settle(); }
 
  private:
+  void tick() {
+    _sessions.expire();
+    if (_keeper.isDue()) _mainThread.post(settling());
+  }
+
+  std::function<void()> settling() {
+    return [&keeper = _keeper] { keeper.settle(); };
+  }
+
   http::Response answer(const http::Request& request) {
     const std::string_view path = _door.pathBehind(request.head).value_or("");
     if (request.head.method == "POST") {
@@ -72,6 +87,7 @@ class Bridge::Implementation {
       return _calls.events(request.head.parameter("session").value_or(""), _beat);
     }
     if (path == kScript) return script();
+    if (path == kData && _keeper.isPageOld()) (void)_mainThread.perform(settling(), _within);
     if (path.starts_with(kPackage)) return http::answerFile(_package, path.substr(kPackage.size()), request.head);
     return missing();
   }
@@ -80,7 +96,9 @@ class Bridge::Implementation {
   const std::string _token;
   const Door _door;
   const http::FileRoom _package;
+  const std::chrono::milliseconds _within;
   Sessions _sessions;
+  EditKeeper _keeper;
   MainThreadCalls _mainThread;
   Calls _calls;
   std::unique_ptr<http::Server> _server;  // last: its threads end before what they use
@@ -98,5 +116,6 @@ Bridge::~Bridge() = default;
 std::string Bridge::address() const { return _implementation->address(); }
 std::uint16_t Bridge::port() const { return _implementation->port(); }
 std::size_t Bridge::sessionCount() const { return _implementation->sessionCount(); }
+bool Bridge::settle() { return _implementation->settle(); }
 
 }  // namespace quilt::scripting

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "quilt/scripting/bridge/Calls.h"
 
+#include <algorithm>
 #include <charconv>
 #include <nlohmann/json.hpp>
 #include <optional>
@@ -97,6 +98,14 @@ std::optional<Json> jsonFrom(Session& session, const Value& value) {
   return std::visit(Writer{session}, value);
 }
 
+// Whether the accessor changes something: those that answer nothing do.
+bool isEdit(const platform::Object& object, std::string_view name) {
+  const auto& accessors = exposedClassOf(object)->accessors;
+  return std::any_of(accessors.begin(), accessors.end(), [name](const Accessor& accessor) {
+    return accessor.name == name && accessor.answer == Answer::Nothing;
+  });
+}
+
 Json tableOfClasses() {
   Json classes = Json::object();
   for (const ExposedClass& type : exposedClasses()) {
@@ -160,13 +169,24 @@ http::Response Calls::call(const std::string& body) {
   if (!arguments) return refusal(400, "wrong-arguments", "Arguments are texts, whole numbers and null");
 
   // Shared: the block may go on after this call has given up.
-  const auto result = std::make_shared<std::optional<platform::Result<Value>>>();
+  struct Outcome {
+    std::optional<platform::Result<Value>> result;
+    bool isSaved = true;
+  };
+  const auto done = std::make_shared<Outcome>();
   const auto outcome = _mainThread.perform(
-      [result, object, method = *method, arguments = *arguments] {
+      [done, object, method = *method, arguments = *arguments, &keeper = _keeper] {
         try {
-          *result = perform(*object, method, arguments);
+          const auto act = [&] {
+            done->result = perform(*object, method, arguments);
+            return done->result->hasValue();
+          };
+          if (isEdit(*object, method))
+            done->isSaved = keeper.keep(act);
+          else
+            act();
         } catch (const std::exception& error) {
-          *result = platform::Error{ErrorKind::InputOutput, error.what(), {}};
+          done->result = platform::Error{ErrorKind::InputOutput, error.what(), {}};
         }
       },
       _within);
@@ -178,11 +198,14 @@ http::Response Calls::call(const std::string& body) {
     case MainThreadCalls::Outcome::Done:
       break;
   }
-  const platform::Result<Value>& answer = **result;
+  const platform::Result<Value>& answer = *done->result;
   if (!answer) {
     if (answer.error().kind == ErrorKind::InputOutput) return refusal(500, "failed", "Something unexpected happened");
     return refusalOf(answer.error());
   }
+  if (!done->isSaved)
+    return refusal(500, "not-saved",
+                   "The change is made, but the document cannot be saved: its record cannot be written");
   auto value = jsonFrom(*session, *answer);
   if (!value) return tooManyObjects();
   return answering(200, {{"value", *std::move(value)}});

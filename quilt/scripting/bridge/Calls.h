@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "quilt/platform/base/Object.h"
+#include "quilt/scripting/bridge/EditKeeper.h"
 #include "quilt/scripting/bridge/MainThreadCalls.h"
 #include "quilt/scripting/bridge/Session.h"
 #include "quilt/scripting/bridge/http/Response.h"
@@ -20,8 +21,9 @@ class Calls {
   /// The objects that a client begins with, by name.
   using Roots = std::vector<std::pair<std::string, std::shared_ptr<platform::Object>>>;
 
-  Calls(Sessions& sessions, MainThreadCalls& mainThread, Roots roots, std::chrono::milliseconds within)
-      : _sessions(sessions), _mainThread(mainThread), _roots(std::move(roots)), _within(within) {}
+  Calls(Sessions& sessions, MainThreadCalls& mainThread, EditKeeper& keeper, Roots roots,
+        std::chrono::milliseconds within)
+      : _sessions(sessions), _mainThread(mainThread), _keeper(keeper), _roots(std::move(roots)), _within(within) {}
 
   /// What the client asks with a body: `name` is "open", "call" or "close".
   http::Response answer(std::string_view name, const std::string& body);
@@ -36,6 +38,7 @@ class Calls {
 
   Sessions& _sessions;
   MainThreadCalls& _mainThread;
+  EditKeeper& _keeper;
   const Roots _roots;
   const std::chrono::milliseconds _within;
 };

@@ -31,6 +31,15 @@ MainThreadCalls::Outcome MainThreadCalls::perform(std::function<void()> block, s
   return Outcome::NotBegun;
 }
 
+void MainThreadCalls::post(std::function<void()> block) {
+  {
+    const std::lock_guard guard(_mutex);
+    if (_isEnding) return;
+    _calls.push_back(std::make_shared<Call>(Call{std::move(block)}));
+  }
+  _changed.notify_all();
+}
+
 void MainThreadCalls::run(Call& call) {
   {
     const std::lock_guard guard(_mutex);

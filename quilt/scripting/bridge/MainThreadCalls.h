@@ -29,6 +29,9 @@ class MainThreadCalls {
   /// Not on the main thread. The block may outlive the call, and throws nothing.
   Outcome perform(std::function<void()> block, std::chrono::milliseconds within);
 
+  /// Does not wait for the block.
+  void post(std::function<void()> block);
+
   /// Begins no further block and lets those go who wait. When the main thread calls it, it runs what other threads have
   /// queued for it meanwhile. Once.
   void end();

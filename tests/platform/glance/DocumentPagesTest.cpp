@@ -21,9 +21,10 @@ class CountingToolkit final : public DocumentToolkit {
   explicit CountingToolkit(std::shared_ptr<DocumentToolkit> target) : _target(std::move(target)) {}
   mutable int opened = 0;
 
-  [[nodiscard]] Result<std::shared_ptr<PagedDocument>> openDocument(const Path& path) const override {
+  [[nodiscard]] Result<std::shared_ptr<PagedDocument>> openDocument(const Path& path,
+                                                                    const ContinueBlock& goesOn) const override {
     ++opened;
-    return _target->openDocument(path);
+    return _target->openDocument(path, goesOn);
   }
 
  private:

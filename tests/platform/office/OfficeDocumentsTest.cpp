@@ -4,6 +4,7 @@
 #include <gmock/gmock.h>
 #include <signal.h>
 
+#include <atomic>
 #include <thread>
 
 #include "quilt/platform/mupdf/MupdfDocuments.h"
@@ -212,6 +213,35 @@ TEST_F(OfficeDocumentsTest, WhatTakesTooLongIsKilledWithItsChildren) {
   for (int i = 0; i < 200 && !isGone(); ++i) std::this_thread::sleep_for(10ms);
   EXPECT_TRUE(isGone());
   EXPECT_THAT(namesIn(settings.cache), IsEmpty());
+}
+
+TEST_F(OfficeDocumentsTest, ACancelEndsAConversionAtOnceAndIsNoFailureOfTheDocument) {
+  program("sleep 60 & echo $! > child; wait");
+  const Path file = document();
+  const auto start = std::chrono::steady_clock::now();
+  const auto opened = toolkit().openDocument(file, [this] { return !std::filesystem::exists(folder() / "child"); });
+  ASSERT_FALSE(opened);
+  EXPECT_EQ(opened.error().kind, ErrorKind::Cancelled);
+  EXPECT_EQ(opened.error().file, file);
+  EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(30));
+  EXPECT_THAT(namesIn(settings.cache), IsEmpty());
+  convertsTo(support::makePages(3));
+  EXPECT_EQ(pageCount(file), 3U);
+}
+
+TEST_F(OfficeDocumentsThreadTest, WaitingForAnotherConversionCanBeCancelled) {
+  program("touch started; sleep 60 & wait");
+  const OfficeDocuments shared = toolkit();
+  std::atomic<bool> goesOn = true;
+  std::thread other(
+      [&] { EXPECT_FALSE(shared.openDocument(document("b.docx", "PK\3\4 others"), [&] { return goesOn.load(); })); });
+  while (!std::filesystem::exists(folder() / "started")) std::this_thread::sleep_for(std::chrono::milliseconds(2));
+  const auto opened = shared.openDocument(document(), [] { return false; });
+  goesOn = false;
+  other.join();
+  ASSERT_FALSE(opened);
+  EXPECT_EQ(opened.error().kind, ErrorKind::Cancelled);
+  EXPECT_EQ(runs(), 1U);
 }
 
 TEST_F(OfficeDocumentsTest, NoNameReachesAShellOrAnOption) {

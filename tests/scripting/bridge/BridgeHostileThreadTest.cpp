@@ -3,6 +3,7 @@
 
 #include <atomic>
 #include <chrono>
+#include <deque>
 #include <thread>
 
 #include "quilt/platform/base/MainThread.h"
@@ -164,6 +165,23 @@ TEST_F(BridgeHostileThreadTest, MoreThanTheyMayBeAreTurnedAway) {
   EXPECT_TRUE(support::waitUntil([&] { return ask("GET", path("package/clip.mp4")).status == 200; }));
 }
 
+TEST_F(BridgeHostileThreadTest, ThoseWhoBelongHereComeInWhileStrangersKeepComing) {
+  serve({});  // with few places, it is a matter of luck who has shown the token in time
+  std::atomic<bool> isDone = false;
+  std::vector<std::jthread> strangers;
+  for (int i = 0; i < 4; ++i)
+    strangers.emplace_back([&] {
+      std::deque<HttpClient> here;
+      while (!isDone) {
+        here.emplace_back(port());
+        if (here.size() > 20) here.pop_front();
+        std::this_thread::sleep_for(10ms);
+      }
+    });
+  for (int i = 0; i < 20; ++i) expectService();
+  isDone = true;
+}
+
 TEST_F(BridgeHostileThreadTest, DescriptorsDoNotGrow) {
   expectService();
   ASSERT_TRUE(support::waitUntil([&] { return descriptors() < 100; }));
@@ -178,6 +196,7 @@ TEST_F(BridgeHostileThreadTest, DescriptorsDoNotGrow) {
 }
 
 TEST_F(BridgeHostileThreadTest, TheModelStaysResponsive) {
+  serve({});
   std::atomic<bool> isDone = false;
   std::vector<std::thread> attackers;
   for (int i = 0; i < 3; ++i)

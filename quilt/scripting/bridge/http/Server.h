@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <chrono>
 #include <cstdint>
 #include <memory>
 
 #include "quilt/platform/base/Result.h"
+#include "quilt/scripting/bridge/http/Limits.h"
 #include "quilt/scripting/bridge/http/RequestHead.h"
 #include "quilt/scripting/bridge/http/Response.h"
 
@@ -14,19 +14,6 @@ namespace quilt::scripting::http {
 struct Request {
   RequestHead head;
   std::string body;
-};
-
-/// What no client can exceed. Times are absolute: dripping bytes gains nothing.
-struct Limits {
-  std::size_t connections = 64;
-  std::size_t headBytes = std::size_t{16} << 10;
-  std::size_t bodyBytes = std::size_t{1} << 20;
-  std::size_t requestsPerConnection = 1000;
-  std::chrono::milliseconds idle{5000};  ///< until the first byte of a request
-  std::chrono::milliseconds head{5000};  ///< from the first byte to the end of the head
-  std::chrono::milliseconds body{10000};
-  std::chrono::milliseconds stall{30000};  ///< how long a client may read nothing of what it is sent
-  std::chrono::milliseconds streamBeat{250};
 };
 
 /// A small HTTP/1.1 server on 127.0.0.1 for few and local clients: a thread a connection, everything bounded.

@@ -15,6 +15,14 @@
     const isLonely = () => pack.items.length === 1;
     const neighbour = (step) => (current ? pack.items[current.index + step] : null);
 
+    // For what lives beside the page: 'leave' before it shows something else, 'shown' after.
+    const tell = (name) => document.dispatchEvent(new CustomEvent('olive:' + name));
+
+    function nameWindow() {
+      const name = pack.title || say('untitledPackage');
+      document.title = !current ? name : current.title + (pack.title ? ' – ' + pack.title : '');
+    }
+
     // --- the head
 
     function makeHead() {
@@ -22,11 +30,11 @@
         make('a', {class: 'brand', href: '#', onclick: (event) => {
           event.preventDefault();
           goHome();
-        }}, Olive.icon('home'), make('span', {dir: 'auto', text: pack.title || say('untitledPackage')})),
+        }}, Olive.icon('home'), make('span', {dir: 'auto', 'data-title-of': pack.id, text: pack.title || say('untitledPackage')})),
         make('div', {class: 'head-tools'},
           make('button', {type: 'button', class: 'search-button', onclick: openSearch, 'aria-label': say('search')}, Olive.icon('search'), make('span', {text: say('search')}), make('kbd', {text: '/', 'aria-hidden': 'true'})),
           Olive.iconButton('print', say('print'), () => printAll(), {class: 'icon-button wide-only'}),
-          Olive.iconButton('settings', say('settings'), () => Olive.openSettings(memory, apply)),
+          Olive.iconButton('settings', say('settings'), () => Olive.openSettings(memory, apply), {class: 'icon-button settings-button'}),
           Olive.iconButton('help', say('help'), () => api.openHelp())));
       return head;
     }
@@ -36,7 +44,6 @@
       pack = Olive.readPackage(data);
       find = Olive.makeFinder(pack.items);
       printAll = Olive.preparePrinting(pack);
-      document.title = pack.title || say('untitledPackage');
       view = make('main', {id: 'main', tabindex: -1});
       app.replaceChildren(make('a', {class: 'skip', href: '#main', text: say('skip'), onclick: (event) => {
         event.preventDefault();
@@ -51,6 +58,7 @@
       root.dataset.motion = memory.choice('motion', true) ? 'on' : 'off';
       document.querySelector('meta[name=color-scheme]').content = appearance === 'light' ? 'light' : appearance === 'system' ? 'light dark' : 'dark';
       if (!isAnew) return;
+      tell('leave');
       note(true);
       close();
       if (before) before();
@@ -61,18 +69,21 @@
     // --- the opening page
 
     function showHome() {
+      tell('leave');
       close();
-      document.title = pack.title || say('untitledPackage');
+      nameWindow();
       view.className = 'home';
       view.replaceChildren(...Olive.makeHome(pack, memory));
+      tell('shown');
     }
 
     // --- the page of an item
 
     function showItem(item, start) {
+      tell('leave');
       close();
       current = item;
-      document.title = item.title + (pack.title ? ' – ' + pack.title : '');
+      nameWindow();
       const panels = [];
       const lists = {};
       stage = Olive.makeStage(item, {
@@ -98,6 +109,7 @@
         ...(panels.length ? [makePanels(panels)] : []));
       if (stage.player) watch(stage.player, lists.chapters);
       mediaSession(item);
+      tell('shown');
       scrollTo({top: 0, behavior: 'instant'});
       frame.focus({preventScroll: true});
       Olive.reveal(view.querySelector('.panel:not([hidden]) .row[aria-current]'));
@@ -107,11 +119,11 @@
       const [previous, next] = [neighbour(-1), neighbour(1)];
       const extras = item.extras.filter((extra) => extra.files.some((file) => file.address || file.link));
       const link = (other, label, icon) => other && make('a', {class: 'neighbour ' + label, href: Olive.address.to({item: other.id}), rel: label === 'nextItem' ? 'next' : 'prev'},
-        Olive.icon(icon), make('span', null, make('span', {class: 'meta', text: say(label)}), make('span', {class: 'row-title', dir: 'auto', text: other.title})));
+        Olive.icon(icon), make('span', null, make('span', {class: 'meta', text: say(label)}), make('span', {class: 'row-title', dir: 'auto', 'data-title-of': other.id, text: other.title})));
       return make('section', {class: 'about', 'aria-labelledby': 'item-title'},
         make('div', {class: 'about-head'},
           make('div', null,
-            make('h1', {id: 'item-title', dir: 'auto', text: item.title}),
+            make('h1', {id: 'item-title', dir: 'auto', 'data-title-of': item.id, text: item.title}),
             make('p', {class: 'meta'}, Olive.icon(item.category || 'warning'),
                  [Olive.kindOf(item), item.duration ? Olive.clock(item.duration) : '', item.pages.length ? say('pageCount', {n: item.pages.length}) : ''].filter(Boolean).join(' · '))),
           Olive.iconButton('link', say('copyLink'), copyLink)),
@@ -320,7 +332,19 @@
     build();
     apply(false);
     app.hidden = false;
+    // For the console, and for what lives beside the page.
+    Olive.app = {
+      memory,
+      get pack() { return pack; },
+      get item() { return current; },
+      get stage() { return stage; },
+      wordsChanged() {
+        find = Olive.makeFinder(pack.items);
+        nameWindow();
+        if (current) mediaSession(current);
+      },
+    };
     route();
-    Olive.app = {pack, get stage() { return stage; }};  // for the console
+    if (Olive.goLive) Olive.goLive(Olive.app);
   };
 })(window.Olive);

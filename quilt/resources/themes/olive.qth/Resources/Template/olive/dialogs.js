@@ -5,6 +5,7 @@
 (function (Olive) {
   const {make, say} = Olive;
 
+  Olive.openDialog = openDialog;
   function openDialog(name, title, content) {
     const heading = 'dialog-title';
     const dialog = make('dialog', {class: 'dialog ' + name, 'aria-labelledby': heading},

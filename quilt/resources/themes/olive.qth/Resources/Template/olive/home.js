@@ -29,7 +29,7 @@
       pack.poster && Olive.picture(pack.poster, {class: 'hero-picture', loading: 'eager'}),
       make('div', {class: 'hero-text'},
         pack.collection && make('p', {class: 'eyebrow', dir: 'auto', text: pack.collection}),
-        make('h1', {dir: 'auto', text: pack.title || say('untitledPackage')}),
+        make('h1', {dir: 'auto', 'data-title-of': pack.id, text: pack.title || say('untitledPackage')}),
         pack.author && make('p', {class: 'author', dir: 'auto', text: pack.author}),
         make('div', {class: 'lead'}, Olive.paragraphs(pack.description)),
         make('p', {class: 'facts'}, facts.filter(Boolean).map((fact) => make('span', null, make('bdi', {text: fact})))),

@@ -34,13 +34,13 @@
     make('li', {class: 'card', 'data-category': item.category}, make('a', {href: Olive.address.to({item: item.id})},
       thumbnail(item, memory),
       make('span', {class: 'card-text'},
-        make('span', {class: 'card-title', dir: 'auto', text: item.title}),
+        make('span', {class: 'card-title', dir: 'auto', 'data-title-of': item.id, text: item.title}),
         meta(item))))));
 
   Olive.makeContents = (items, current, memory) => make('ol', {class: listClass('rows', items)}, items.map((item) =>
     make('li', null, make('a', {class: 'row', href: Olive.address.to({item: item.id}), 'aria-current': item === current ? 'true' : null},
       thumbnail(item, memory),
-      make('span', {class: 'row-text'}, make('span', {class: 'row-title', dir: 'auto', text: item.title}), meta(item))))));
+      make('span', {class: 'row-text'}, make('span', {class: 'row-title', dir: 'auto', 'data-title-of': item.id, text: item.title}), meta(item))))));
 
   // Scrolls the list, and only the list, so that the entry is seen. Entries that were never drawn have estimated heights,
   // so it looks again once they are.
@@ -59,7 +59,7 @@
   Olive.makeChapters = function (chapters, onChoice) {
     const buttons = chapters.map((chapter) => make('button', {type: 'button', class: 'row', onclick: () => onChoice(chapter.start)},
       make('span', {class: 'thumb'}, chapter.picture ? Olive.picture(chapter.picture) : null),
-      make('span', {class: 'row-text'}, make('span', {class: 'row-title', dir: 'auto', text: chapter.title}),
+      make('span', {class: 'row-text'}, make('span', {class: 'row-title', dir: 'auto', 'data-title-of': chapter.source ? chapter.source.id : null, text: chapter.title}),
            make('span', {class: 'meta', text: Olive.clock(chapter.start)}))));
     let marked = -1;
     return {
@@ -93,17 +93,19 @@
     };
   };
 
+  Olive.titleOfPart = (part) => part.title || kindOf({category: part.category}) || say('file');
+
   Olive.makeExtras = (extras) => make('ul', {class: 'extras'}, extras.map((extra) => {
     const file = extra.files[0];
     const address = file && (file.address || file.link);
     if (!address) return null;
     const ending = (/\.(\w{1,5})$/.exec(file.name) || [])[1] || '';
-    const title = extra.title || kindOf({category: extra.category}) || say('file');
+    const title = Olive.titleOfPart(extra);
     const size = file.megaBytes > 0 ? Olive.fileSize(file.megaBytes) : '';
-    return make('li', null, make('a', {class: 'extra', href: address, target: '_blank', rel: 'noopener noreferrer',
+    return make('li', {'data-id': extra.id}, make('a', {class: 'extra', href: address, target: '_blank', rel: 'noopener noreferrer',
                                        download: file.address ? title.replace(/[\\/:*?"<>|]/g, '_') + (ending ? '.' + ending : '') : null},
       Olive.icon(file.address ? 'download' : 'open'),
-      make('span', {class: 'row-text'}, make('span', {class: 'row-title', dir: 'auto', text: title}),
+      make('span', {class: 'row-text'}, make('span', {class: 'row-title', dir: 'auto', 'data-title-of': extra.id, text: title}),
            make('span', {class: 'meta', text: file.address ? [ending.toUpperCase(), size].filter(Boolean).join(' · ') : say('needsInternet')}))));
   }));
 })(window.Olive);

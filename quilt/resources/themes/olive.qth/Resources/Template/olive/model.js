@@ -49,12 +49,11 @@
   }
 
   function readSource(record) {
-    const title = text(record.Title), description = text(record.Description);
     return {
+      record,
       id: text(record.UUID),
       category: text(record.ContentCategory),
-      title,
-      description: description === title ? '' : description,
+      ...wordsOfSource(record),
       start: time(record.Timecode),
       files: list(record.Derivatives).map(readFile),
       previews: list(record.Previews).map(readPreview).sort((a, b) => a.index - b.index),
@@ -62,7 +61,14 @@
     };
   }
 
+  function wordsOfSource(record) {
+    const title = text(record.Title), description = text(record.Description);
+    return {title, description: description === title ? '' : description};
+  }
+
   const longest = (source) => Math.max(0, ...source.files.map((file) => file.duration));
+
+  const titleOfStill = (source, index) => source.title || Olive.say('still', {n: index + 1});
 
   // The stills of a montage on its time line; those without a timecode share what time there is.
   function stillsOf(item) {
@@ -73,7 +79,7 @@
       const start = source.start === null ? next : source.start;
       next = start + each;
       return {
-        title: source.title || Olive.say('still', {n: i + 1}),
+        title: titleOfStill(source, i),
         start,
         picture: source.previews.length ? source.previews[0].picture : '',
         source,
@@ -94,16 +100,22 @@
     })).sort((a, b) => a.start - b.start);
   }
 
+  const wordsOfItem = (record, index, sources) => ({
+    title: text(record.Title) || (sources[0] && sources[0].title) || Olive.say('untitled', {n: index + 1}),
+    description: text(record.Description),
+  });
+  const wordsOfPackage = (data) => ({title: text(data.Title), description: text(data.Description), author: text(data.Author)});
+
   function readItem(record, index) {
     const sources = list(record.Sources).map(readSource);
     const category = kCategories.includes(record.ContentCategory) ? record.ContentCategory : sources.length ? sources[0].category : '';
     const first = sources[0] && sources[0].files[0];
     const item = {
+      record,
       id: text(record.UUID) || 'item-' + index,
       index,
       category,
-      title: text(record.Title) || (sources[0] && sources[0].title) || Olive.say('untitled', {n: index + 1}),
-      description: text(record.Description),
+      ...wordsOfItem(record, index, sources),
       poster: number(record.PosterImageWidth) > 0 ? packageAddress(record.PosterImagePath) : '',
       sources,
       extras: list(record.Extras).map(readSource),
@@ -128,10 +140,9 @@
   Olive.readPackage = function (data) {
     const owner = data.CollectionOwner && typeof data.CollectionOwner === 'object' ? data.CollectionOwner : {};
     return {
+      record: data,
       id: text(data.UUID) || 'package',
-      title: text(data.Title),
-      description: text(data.Description),
-      author: text(data.Author),
+      ...wordsOfPackage(data),
       keywords: text(data.Keywords),
       category: text(data.Category),
       advisory: text(data.AdvisoryLabel),
@@ -141,6 +152,19 @@
       poster: text(data.PosterImagePath) ? 'JukeboxArtwork' : '',
       items: list(data.Media).map(readItem),
     };
+  };
+
+  // Everything of an item that has files of its own.
+  Olive.partsOf = (item) => [...item.sources, item.commentary, ...item.extras].filter(Boolean);
+
+  // Reads titles, descriptions and the author again, after they changed in the records.
+  Olive.rereadWords = function (pack) {
+    Object.assign(pack, wordsOfPackage(pack.record));
+    for (const item of pack.items) {
+      for (const part of Olive.partsOf(item)) Object.assign(part, wordsOfSource(part.record));
+      Object.assign(item, wordsOfItem(item.record, item.index, item.sources));
+      if (item.category === 'Montage') for (const still of item.chapters) still.title = titleOfStill(still.source, item.sources.indexOf(still.source));
+    }
   };
 
   // What a browser can draw in an <img>.

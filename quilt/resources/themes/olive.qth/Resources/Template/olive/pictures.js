@@ -40,6 +40,7 @@
       images[1 - front].classList.remove('front');
       images[1 - front].alt = '';
       caption.textContent = stills[index].source.title;
+      caption.dataset.captionOf = stills[index].source.id;
       if (stills[index + 1]) preload.src = address(index + 1);
     }
     const stage = Olive.timedStage(item, context, parts, {

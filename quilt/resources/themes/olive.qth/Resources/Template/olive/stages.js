@@ -189,7 +189,7 @@
     const element = make('div', {class: 'stage web'},
       make('div', {class: 'web-card'},
         Olive.icon('Web'),
-        make('p', {class: 'web-title', dir: 'auto', text: item.title}),
+        make('p', {class: 'web-title', dir: 'auto', 'data-title-of': item.id, text: item.title}),
         address && make('p', {class: 'web-address', dir: 'ltr', text: address.replace(/^https?:\/\//, '').replace(/\/$/, '')}),
         address ? make('a', {class: 'primary', href: address, target: '_blank', rel: 'noopener noreferrer', onclick: () => context.memory.keep(item, {done: true})},
                        say('openLink'), Olive.icon('open'))
