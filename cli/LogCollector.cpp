@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <cstdlib>
+#include <filesystem>
 #include <system_error>
 
 #include "cli/Text.h"
@@ -75,12 +76,27 @@ std::string LogCollector::warning(std::string_view beginning) const {
   return found == _lines.end() ? std::string() : found->message;
 }
 
+void LogCollector::know(const std::string& name, const std::string& original) {
+  const std::lock_guard guard(_mutex);
+  _originals[name] = original;
+}
+
+// A line names its file first, in quotes.
+std::string LogCollector::asKnown(const std::string& message) const {
+  const std::size_t begin = message.find('"') + 1;
+  const std::size_t end = begin == 0 ? begin : message.find('"', begin);
+  if (end == 0 || end == std::string::npos) return message;
+  const auto original = _originals.find(std::filesystem::path(message.substr(begin, end - begin)).filename());
+  return original == _originals.end() ? message : message.substr(0, begin) + original->second + message.substr(end);
+}
+
 void LogCollector::showWarnings() {
   if (_printsAll) return;
   std::vector<Line> lines;
   {
     const std::lock_guard guard(_mutex);
     lines.swap(_lines);
+    for (Line& line : lines) line.message = asKnown(line.message);
   }
   for (const Line& line : lines)
     if (line.level == platform::LogLevel::Warning) _messages.warning(escaped(line.message));

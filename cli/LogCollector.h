@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <map>
 #include <memory>
 #include <mutex>
 #include <string>
@@ -26,6 +27,8 @@ class LogCollector : public platform::LogSink {
   [[nodiscard]] std::string cause() const;
   /// The first warning that begins so; empty when none has come.
   [[nodiscard]] std::string warning(std::string_view beginning) const;
+  /// From now on a warning of a file of this name, wherever it lies, speaks of the file that users know it as.
+  void know(const std::string& name, const std::string& original);
   /// Prints the warnings that have come, unless all lines were printed as they came.
   void showWarnings();
 
@@ -35,10 +38,13 @@ class LogCollector : public platform::LogSink {
     std::string message;
   };
 
+  [[nodiscard]] std::string asKnown(const std::string& message) const;
+
   Messages& _messages;
   const bool _printsAll;
   mutable std::mutex _mutex;
   std::vector<Line> _lines;
+  std::map<std::string, std::string> _originals;  // by the name of the copy
 };
 
 }  // namespace quilt::cli

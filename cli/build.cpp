@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <fmt/format.h>
 
+#include <algorithm>
+
 #include "cli/ActingDelegate.h"
 #include "cli/EntryJson.h"
 #include "cli/Exporting.h"
@@ -168,6 +170,21 @@ void describe(QuiltDocument& document, const BuildPlan& plan, const LogCollector
     throw explain(cannot + ": Its poster cannot be written", log, document.posterImagePath(), document.path());
 }
 
+// The package is built where nobody looks: what is said of its files is said of those that they are copies of.
+void knowOriginals(const QuiltMedia& made, const NewItem& item, LogCollector& log) {
+  const auto know = [&log](const QuiltMediaSource& source, const NewSource& original) {
+    for (const auto& derivative : source.derivatives())
+      if (const auto url = derivative->url(); url && url->isFileUrl())
+        log.know(url->relativePath().filename(), original.url.relativePath());
+  };
+  const auto sources = made.sources();
+  for (std::size_t i = 0; i < std::min(sources.size(), item.sources.size()); ++i) know(*sources[i], item.sources[i]);
+  const auto extras = made.extras();
+  for (std::size_t i = 0; i < std::min(extras.size(), item.extras.size()); ++i) know(*extras[i], item.extras[i]);
+  if (const auto commentary = made.audioCommentarySource(); commentary && item.commentary)
+    know(*commentary, *item.commentary);
+}
+
 void addItems(QuiltDocument& document, const BuildPlan& plan, const Context& context) {
   double total = 0;
   for (const NewItem& item : plan.items) total += weightOf(item);
@@ -178,15 +195,16 @@ void addItems(QuiltDocument& document, const BuildPlan& plan, const Context& con
       const NewItem& item = plan.items[added];
       context.log.beginOperation();
       const double weight = weightOf(item);
-      const bool done = addItem(
-                            document, item,
-                            [&](double percentage) {
-                              const double share = (before + weight * percentage / 100) / total;
-                              context.progress.report("Adding " + item.title, kLooked + share * (kCopied - kLooked));
-                              return !Interrupt::isRequested();
-                            },
-                            SaveTime::Later) != nullptr;
-      if (!done) return;
+      const auto made = addItem(
+          document, item,
+          [&](double percentage) {
+            const double share = (before + weight * percentage / 100) / total;
+            context.progress.report("Adding " + item.title, kLooked + share * (kCopied - kLooked));
+            return !Interrupt::isRequested();
+          },
+          SaveTime::Later);
+      if (!made) return;
+      knowOriginals(*made, item, context.log);
       if (!context.settings.quiet) context.log.showWarnings();
       before += weight;
     }

@@ -288,6 +288,15 @@ TEST_F(BuildCommandTest, EveryMissingOrUnsupportedFileIsToldWithItsPlace) {
   EXPECT_EQ("", run.out);
 }
 
+TEST_F(BuildCommandTest, WarningsNameTheFileAsTheAuthorKnowsIt) {
+  const fs::path damaged = folder() / "empty.pdf";
+  write(damaged, makePdf({"<< /Type /Catalog /Pages 2 0 R >>", "<< /Type /Pages /Kids [] /Count 0 >>"}));
+  const Ended run =
+      quilt({"build", manifest({{"title", "A talk"}, {"media", {{{"source", "empty.pdf"}}}}}), "--output", out()});
+  EXPECT_EQ(0, run.exit) << run.err;
+  EXPECT_THAT(run.err, HasSubstr("Pages of document at path \"" + damaged.string() + "\" cannot be shown"));
+}
+
 TEST_F(BuildCommandTest, AFileThatIsMissingIsNotFound) {
   EXPECT_THAT(placesOf({{"media", {{{"source", "nowhere.mp4"}}}}}, 3), ElementsAre("media[0].source"));
 }
