@@ -1,9 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "tests/support/InspectBytes.h"
 
-#include <sys/mman.h>
-#include <unistd.h>
-
 #include <stdexcept>
 #include <string>
 
@@ -11,6 +8,7 @@
 #include "quilt/platform/ffmpeg/FfmpegInspector.h"
 #include "quilt/platform/ffmpeg/FfmpegMovieToolkit.h"
 #include "quilt/platform/interfaces/Services.h"
+#include "tests/support/MemoryFile.h"
 #include "tests/support/ScratchFolder.h"
 
 namespace quilt::support {
@@ -32,23 +30,6 @@ class NoImages final : public Images {
     if (bitmap.pixels.size() != bitmap.width * bitmap.height * 4) throw std::logic_error("a bitmap of the wrong size");
     return Error{ErrorKind::Unsupported, "No images are made.", {}};
   }
-};
-
-// Bytes under a path, without a disk.
-class MemoryFile {
- public:
-  explicit MemoryFile(std::span<const std::uint8_t> bytes) : _descriptor(memfd_create("media", MFD_CLOEXEC)) {
-    if (_descriptor < 0 || write(_descriptor, bytes.data(), bytes.size()) != static_cast<ssize_t>(bytes.size())) {
-      throw std::runtime_error("no file in memory");
-    }
-  }
-  MemoryFile(const MemoryFile&) = delete;
-  MemoryFile& operator=(const MemoryFile&) = delete;
-  ~MemoryFile() { close(_descriptor); }
-  [[nodiscard]] std::filesystem::path path() const { return "/proc/self/fd/" + std::to_string(_descriptor); }
-
- private:
-  int _descriptor;
 };
 
 }  // namespace
