@@ -174,10 +174,11 @@ bool QuiltMediaSource::previewWithProgressionBlock(
   };
   RepeatedReport waiting(beforeTheFirst);
   const PreviewContent content(*this, waiting.continueBlock());
-  if (waiting.wasCancelled()) {
+  const auto cancelled = [this] {
     FDYLogger::logCritical("Previewing media at URL \"%@\" has been cancelled", previewItemURL());
     return false;
-  }
+  };
+  if (waiting.wasCancelled()) return cancelled();
   const std::size_t count = content.count();
   if (count == 0) {
     platform::report<QuiltMediaPreview>(withProgressionBlock, nullptr, 100);
@@ -191,9 +192,7 @@ bool QuiltMediaSource::previewWithProgressionBlock(
       preview = usablePreview(i);
       if (!preview) preview = makePreview(content, i);
     }
-    if (platform::report(withProgressionBlock, preview, platform::integerPercentage(i + 1, count))) continue;
-    FDYLogger::logCritical("Previewing media at URL \"%@\" has been cancelled", previewItemURL());
-    return false;
+    if (!platform::report(withProgressionBlock, preview, platform::integerPercentage(i + 1, count))) return cancelled();
   }
   return true;
 }
