@@ -40,6 +40,21 @@ class MainLoopThreadTest : public support::ModelFixture {
   }
 
   void startWorker(std::function<void()> job) { workers.emplace_back(std::move(job)); }
+  /// A worker has the main thread count to `count` in blocks, one after the other, and then does `atTheEnd`.
+  template <class Count>
+  void startCounting(int count, Count& blocks, std::function<void()> atTheEnd) {
+    startWorker([count, &blocks, atTheEnd = std::move(atTheEnd)] {
+      for (int i = 0; i < count; ++i) platform::performBlockOnMainThread([&] { ++blocks; });
+      atTheEnd();
+    });
+  }
+  /// What ends a runUntil() that waits for `done`.
+  static std::function<void()> finishing(std::atomic<bool>& done) {
+    return [&done] {
+      done = true;
+      platform::services().runLoop->wake();
+    };
+  }
   void joinWorkers() {
     for (std::thread& worker : workers) worker.join();
     workers.clear();
@@ -67,10 +82,7 @@ TYPED_TEST_SUITE_P(MainLoopThreadTest);
 TYPED_TEST_P(MainLoopThreadTest, RunsTheBlocksOfAWorkerInTheToolkitsOwnLoop) {
   typename TypeParam::Loop loop;
   int blocks = 0;
-  this->startWorker([&] {
-    for (int i = 0; i < 100; ++i) platform::performBlockOnMainThread([&] { ++blocks; });
-    loop.quit();
-  });
+  this->startCounting(100, blocks, [&] { loop.quit(); });
   loop.run();
   EXPECT_EQ(100, blocks);
 }
@@ -78,11 +90,7 @@ TYPED_TEST_P(MainLoopThreadTest, RunsTheBlocksOfAWorkerInTheToolkitsOwnLoop) {
 TYPED_TEST_P(MainLoopThreadTest, TurnsTheLoopUntilTheWorkIsDone) {
   std::atomic<bool> done = false;
   int blocks = 0;
-  this->startWorker([&] {
-    for (int i = 0; i < 100; ++i) platform::performBlockOnMainThread([&] { ++blocks; });
-    done = true;
-    platform::services().runLoop->wake();
-  });
+  this->startCounting(100, blocks, this->finishing(done));
   platform::services().runLoop->runUntil([&] { return done.load(); });
   EXPECT_EQ(100, blocks);
 }
@@ -240,11 +248,7 @@ TYPED_TEST_P(MainLoopThreadTest, WorkersThatWaitWhenTheAdapterDiesGetTheirBlocks
 TYPED_TEST_P(MainLoopThreadTest, AfterTheAdapterTheMainThreadStillRunsBlocks) {
   std::atomic<bool> done = false;
   int blocks = 0;
-  this->startWorker([&] {
-    for (int i = 0; i < 50; ++i) platform::performBlockOnMainThread([&] { ++blocks; });
-    done = true;
-    platform::services().runLoop->wake();
-  });
+  this->startCounting(50, blocks, this->finishing(done));
   this->adapter->runUntil([&] { return blocks > 10; });
   this->adapter.reset();
   platform::services().runLoop->runUntil([&] { return done.load(); });
@@ -277,11 +281,7 @@ TYPED_TEST_P(MainLoopThreadTest, AWakeThatComesLateTouchesNothing) {
 TYPED_TEST_P(MainLoopThreadTest, AnotherAdapterMayFollow) {
   std::atomic<bool> done = false;
   std::atomic<int> blocks = 0;
-  this->startWorker([&] {
-    for (int i = 0; i < 50; ++i) platform::performBlockOnMainThread([&] { ++blocks; });
-    done = true;
-    platform::services().runLoop->wake();
-  });
+  this->startCounting(50, blocks, this->finishing(done));
   this->adapter->runUntil([&] { return blocks > 10; });
   this->adapter.reset();
   platform::services().runLoop->runUntil([&] { return done.load(); });
