@@ -18,13 +18,6 @@ bool isA(const platform::Object& object) {
   return dynamic_cast<const T*>(&object) != nullptr;
 }
 
-const Accessor* find(const ExposedClass* type, std::string_view name) {
-  if (!type) return nullptr;
-  const auto found = std::find_if(type->accessors.begin(), type->accessors.end(),
-                                  [name](const Accessor& accessor) { return accessor.name == name; });
-  return found == type->accessors.end() ? nullptr : &*found;
-}
-
 bool fits(Argument argument, std::span<const Value> given) {
   switch (argument) {
     case Argument::None:
@@ -70,12 +63,20 @@ const ExposedClass* exposedClassOf(const platform::Object& object) {
   return nullptr;
 }
 
+const Accessor* accessorOf(const platform::Object& object, std::string_view name) {
+  const ExposedClass* type = exposedClassOf(object);
+  if (!type) return nullptr;
+  const auto found = std::find_if(type->accessors.begin(), type->accessors.end(),
+                                  [name](const Accessor& accessor) { return accessor.name == name; });
+  return found == type->accessors.end() ? nullptr : &*found;
+}
+
 bool isExcludedFromScripts(const platform::Object& object, std::string_view name) {
-  return find(exposedClassOf(object), name) == nullptr;
+  return accessorOf(object, name) == nullptr;
 }
 
 platform::Result<Value> perform(platform::Object& receiver, std::string_view name, std::span<const Value> arguments) {
-  const Accessor* accessor = find(exposedClassOf(receiver), name);
+  const Accessor* accessor = accessorOf(receiver, name);
   if (!accessor)
     return platform::Error{platform::ErrorKind::Unsupported, "\"" + std::string(name) + "\" is no accessor here", {}};
   if (!fits(accessor->argument, arguments))

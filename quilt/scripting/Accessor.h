@@ -48,6 +48,9 @@ QUILT_EXPORT std::span<const ExposedClass> exposedClasses();
 /// The class whose accessors the object has: an extra's is the source's. Null for an object that scripts cannot reach.
 QUILT_EXPORT const ExposedClass* exposedClassOf(const platform::Object& object);
 
+/// The accessor of that name that scripts may call on the object; null when there is none. Any thread.
+QUILT_EXPORT const Accessor* accessorOf(const platform::Object& object, std::string_view name);
+
 /// What the object answers to a script host that asks whether a method is kept from scripts: every name is, but those
 /// of the object's accessors.
 QUILT_EXPORT bool isExcludedFromScripts(const platform::Object& object, std::string_view name);

@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "quilt/scripting/bridge/Calls.h"
 
-#include <algorithm>
 #include <charconv>
 #include <nlohmann/json.hpp>
 #include <optional>
@@ -100,10 +99,8 @@ std::optional<Json> jsonFrom(Session& session, const Value& value) {
 
 // Whether the accessor changes something: those that answer nothing do.
 bool isEdit(const platform::Object& object, std::string_view name) {
-  const auto& accessors = exposedClassOf(object)->accessors;
-  return std::any_of(accessors.begin(), accessors.end(), [name](const Accessor& accessor) {
-    return accessor.name == name && accessor.answer == Answer::Nothing;
-  });
+  const Accessor* accessor = accessorOf(object, name);
+  return accessor != nullptr && accessor->answer == Answer::Nothing;
 }
 
 Json tableOfClasses() {
