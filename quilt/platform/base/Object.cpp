@@ -13,17 +13,57 @@ struct Observation::Entry {
   Entry(std::string_view observedKey, ChangeObserver changeObserver, ObservationOptions observationOptions)
       : key(observedKey), observer(std::move(changeObserver)), options(observationOptions) {}
 
+  /// Runs the observer, unless the observation has ended.
+  void tell(const ChangeNotice& notice);
+  /// After this the observer runs on no other thread, and never again.
+  void end();
+
   const std::string key;
   const ChangeObserver observer;
   const ObservationOptions options;
-  RecursiveMonitor monitor;  // held while the observer runs
-  bool active = true;        // guarded by the monitor
+
+ private:
+  // Each run holds a monitor of its own. One for all of them would be a lock around foreign code: a thread that waits
+  // for it with a list's lock, and an observer that wants this list, would wait for each other.
+  std::mutex _mutex;
+  std::vector<std::shared_ptr<RecursiveMonitor>> _runs;
+  bool _active = true;
 };
 
 struct Observation::Registry {
   std::mutex mutex;
   std::vector<std::shared_ptr<Entry>> entries;
 };
+
+void Observation::Entry::tell(const ChangeNotice& notice) {
+  const auto run = std::make_shared<RecursiveMonitor>();
+  const MonitorLock running(*run);
+  {
+    const std::lock_guard guard(_mutex);
+    if (!_active) return;
+    _runs.push_back(run);
+  }
+  struct Leave {
+    ~Leave() {
+      const std::lock_guard guard(entry._mutex);
+      std::erase(entry._runs, run);
+    }
+    Entry& entry;
+    const std::shared_ptr<RecursiveMonitor>& run;
+  };
+  const Leave leave{*this, run};
+  observer(notice);
+}
+
+void Observation::Entry::end() {
+  std::vector<std::shared_ptr<RecursiveMonitor>> runs;
+  {
+    const std::lock_guard guard(_mutex);
+    _active = false;
+    runs = _runs;
+  }
+  for (const auto& run : runs) const MonitorLock untilItHasEnded(*run);
+}
 
 Observation::Observation(std::weak_ptr<Registry> registry, std::shared_ptr<Entry> entry)
     : _registry(std::move(registry)), _entry(std::move(entry)) {}
@@ -42,8 +82,7 @@ void Observation::reset() {
     const std::lock_guard guard(registry->mutex);
     std::erase(registry->entries, entry);
   }
-  const MonitorLock lock(entry->monitor);
-  entry->active = false;
+  entry->end();
 }
 
 Observation Object::observe(std::string_view key, ChangeObserver observer, ObservationOptions options) {
@@ -108,10 +147,7 @@ void Object::notify(Observation::Registry& registry, std::string_view key, Chang
       if (entry->key == key && (phase == ChangePhase::Did || entry->options == ObservationOptions::Prior))
         listeners.push_back(entry);
   }
-  for (const auto& entry : listeners) {
-    const MonitorLock lock(entry->monitor);
-    if (entry->active) entry->observer(ChangeNotice{*this, key, phase});
-  }
+  for (const auto& entry : listeners) entry->tell(ChangeNotice{*this, key, phase});
 }
 
 }  // namespace quilt::platform

@@ -29,7 +29,8 @@ struct ChangeNotice {
   ChangePhase phase;     ///< before or after the change
 };
 
-/// Called on the thread that changes the value: the setting thread for a property, the main thread for a list.
+/// Called on the thread that changes the value: the setting thread for a property, the main thread for a list. When
+/// two threads set a property at once, it runs on both at once.
 using ChangeObserver = std::function<void(const ChangeNotice&)>;
 
 /// An observation that ends with the handle. After reset() or destruction the observer is not running on any other
@@ -45,7 +46,8 @@ class QUILT_EXPORT [[nodiscard]] Observation {
   /// @}
   ~Observation() { reset(); }
 
-  /// Ends the observation, after waiting for an observer that runs on another thread.
+  /// Ends the observation, after waiting for an observer that runs on another thread. Not with a lock held that the
+  /// observer takes.
   void reset();
   /// Whether there is an observation that was not ended by this handle.
   explicit operator bool() const { return _entry != nullptr; }

@@ -13,6 +13,7 @@
 #include "quilt/platform/base/Object.h"
 #include "quilt/platform/base/Observation.h"
 #include "quilt/platform/base/Property.h"
+#include "quilt/platform/base/RecursiveMonitor.h"
 #include "quilt/platform/base/Worker.h"
 
 namespace quilt::platform {
@@ -266,6 +267,25 @@ TEST_F(ObservationThreadTest, TheMainThreadEndsAnObservationWhoseNoticeWaitsForI
   observation.reset();
   EXPECT_TRUE(blockRan);
   worker.join();
+}
+
+// As a document that saves itself does: its observer wants the list, whose holder sets the title.
+TEST_F(ObservationThreadTest, AnObserverMayWaitForALockWhoseHolderSetsTheProperty) {
+  RecursiveMonitor list;
+  std::atomic<int> entered = 0;
+  int heardUnderTheLock = 0;
+  const Observation observation = book->observe("title", [&](const ChangeNotice&) {
+    ++entered;
+    const MonitorLock lock(list);
+    ++heardUnderTheLock;
+  });
+  MonitorLock held(list);
+  std::thread worker([&] { book->setTitle("From the worker"); });
+  while (entered == 0) std::this_thread::yield();
+  book->setTitle("From the holder");
+  held.unlock();
+  worker.join();
+  EXPECT_EQ(2, heardUnderTheLock);
 }
 
 TEST_F(ObservationThreadTest, TwoThreadsSetAndTwoObserve) {
