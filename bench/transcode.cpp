@@ -176,7 +176,7 @@ class Bench {
   static Plan planFor(const fs::path& source, const Grade& grade) {
     Plan plan;
     Result<Input> input = Input::open(source, 15);
-    if (!input) return plan;
+    if (!input || !input->findStreamInfo()) return plan;
     const Result<Outline> found = outline(*input);
     if (!found || found->video == nullptr) return plan;
     plan.video = planVideo(videoTraits(*input, *found->video), grade.box);
