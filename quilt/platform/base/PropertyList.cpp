@@ -37,8 +37,8 @@ void Dictionary::set(std::string key, PropertyList value) {
   append(std::move(key), std::move(value));
 }
 
-void Dictionary::append(std::string key, PropertyList value) {
-  _entries.emplace_back(std::move(key), std::move(value));
+PropertyList& Dictionary::append(std::string key, PropertyList value) {
+  return _entries.emplace_back(std::move(key), std::move(value)).second;
 }
 
 void Dictionary::reserve(std::size_t count) { _entries.reserve(count); }

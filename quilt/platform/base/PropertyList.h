@@ -46,8 +46,9 @@ class QUILT_EXPORT Dictionary {
 
   /// Replaces the value of a key in its place, or appends the key.
   void set(std::string key, PropertyList value);
-  /// Appends without looking for the key; the caller knows that it is not there.
-  void append(std::string key, PropertyList value);
+  /// Appends without looking for the key; the caller knows that it is not there. The value in its place, valid until
+  /// the dictionary changes.
+  PropertyList& append(std::string key, PropertyList value);
   /// Makes room for this many keys in all.
   void reserve(std::size_t count);
   /// Removes the key with its value, if it is there.
@@ -120,6 +121,12 @@ class QUILT_EXPORT PropertyList {
     return std::get_if<T>(&_value);
   }
   /// @}
+
+  /// Makes it an empty value of a kind, to be filled where it is.
+  template <class T>
+  T& become() {
+    return _value.emplace<T>();
+  }
 
   /// The value, to be visited.
   [[nodiscard]] const Value& value() const { return _value; }

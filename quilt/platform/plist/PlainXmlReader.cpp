@@ -1,0 +1,179 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "quilt/platform/plist/PlainXmlReader.h"
+
+#include <algorithm>
+#include <array>
+#include <string>
+#include <utility>
+
+#include "quilt/platform/plist/Limits.h"
+#include "quilt/platform/plist/XmlReader.h"
+#include "quilt/platform/plist/XmlScalars.h"
+#include "quilt/platform/plist/XmlText.h"
+
+namespace quilt::platform {
+
+namespace {
+
+constexpr std::string_view kDeclaration = "<?xml version=\"1.0\" encoding=\"UTF-8\"?>";
+
+struct Entity {
+  std::string_view text;
+  char character;
+};
+
+constexpr Entity kEntities[] = {{"&amp;", '&'}, {"&lt;", '<'}, {"&gt;", '>'}, {"&quot;", '"'}, {"&apos;", '\''}};
+
+/// Answers for each byte at one look, which halves the time of the two loops that see most of a file.
+template <class Test>
+constexpr std::array<bool, 256> tableOf(Test test) {
+  std::array<bool, 256> table{};
+  for (std::size_t c = 0; c < table.size(); ++c) table[c] = test(c);
+  return table;
+}
+
+constexpr auto kIsSpace = tableOf([](std::size_t c) { return c == ' ' || c == '\t' || c == '\n' || c == '\r'; });
+
+/// The characters of a text that stand for themselves. A carriage return does not: a parser makes a line feed of it.
+constexpr auto kIsOrdinary =
+    tableOf([](std::size_t c) { return (c >= ' ' && c < 0x80 && c != '<' && c != '&') || c == '\t' || c == '\n'; });
+
+/// Each function takes what it reads from the front of the text; false or none for what is not written plainly.
+class PlainReader {
+ public:
+  explicit PlainReader(std::string_view text) : _rest(text) {}
+
+  std::optional<PropertyList> read() {
+    PropertyList value(false);
+    return readHead() && readValue(value, 1) && readTail() ? std::optional(std::move(value)) : std::nullopt;
+  }
+
+ private:
+  bool readHead() {
+    take(kDeclaration);
+    skipSpace();
+    if (take("<!DOCTYPE")) {
+      const std::string_view type = takeUpTo('>').value_or("<");
+      // Quotes, one inside the other or around a ">", and declarations are for a parser that knows of them.
+      if (type.find_first_of("<['") != std::string_view::npos || std::count(type.begin(), type.end(), '"') % 2 != 0)
+        return false;
+      skipSpace();
+    }
+    return take("<plist version=\"1.0\">") || take("<plist>");
+  }
+
+  bool readTail() {
+    skipSpace();
+    if (!take("</plist>")) return false;
+    skipSpace();
+    return _rest.empty();
+  }
+
+  bool readValue(PropertyList& value, std::size_t depth) {
+    skipSpace();
+    if (depth > kDeepestNesting || !take("<")) return false;
+    const std::optional<std::string_view> name = takeUpTo('>');
+    if (!name) return false;
+    if (*name == "string") return readText(*name, value.become<std::string>());
+    if (*name == "dict") return readDictionary(value.become<Dictionary>(), depth);
+    if (*name == "array") return readArray(value.become<Array>(), depth);
+    if (*name == "true/" || *name == "false/") {
+      value = *name == "true/";
+      return true;
+    }
+    if (*name == "dict/" || *name == "array/") {
+      value = *name == "dict/" ? PropertyList(Dictionary()) : PropertyList(Array());
+      return true;
+    }
+    std::string text;
+    if (!readText(*name, text)) return false;
+    std::optional<PropertyList> scalar = scalarFrom(*name, text);
+    if (scalar) value = *std::move(scalar);
+    return scalar.has_value();
+  }
+
+  bool readArray(Array& items, std::size_t depth) {
+    for (;;) {
+      skipSpace();
+      if (take("</array>")) return true;
+      if (!readValue(items.emplace_back(false), depth + 1)) return false;
+    }
+  }
+
+  bool readDictionary(Dictionary& entries, std::size_t depth) {
+    for (;;) {
+      skipSpace();
+      if (take("</dict>")) break;
+      if (entries.empty()) entries.reserve(_usualSize);
+      std::string key;
+      if (!take("<key>") || !readText("key", key)) return false;
+      if (!readValue(entries.append(std::move(key), false), depth + 1)) return false;
+    }
+    _usualSize = entries.size();
+    dropRepeatedKeys(entries);
+    return true;
+  }
+
+  /// Reads the text of an element, and its end.
+  bool readText(std::string_view element, std::string& out) {
+    for (;;) {
+      out += takeAll(kIsOrdinary);
+      if (take("</")) return take(element) && take(">");
+      if (!readEntity(out) && !readCharacter(out)) return false;
+    }
+  }
+
+  bool readEntity(std::string& out) {
+    for (const Entity& entity : kEntities) {
+      if (!take(entity.text)) continue;
+      out += entity.character;
+      return true;
+    }
+    return false;
+  }
+
+  /// Reads one character beyond ASCII.
+  bool readCharacter(std::string& out) {
+    if (_rest.empty() || static_cast<unsigned char>(_rest[0]) < 0x80) return false;
+    const Utf8Character character = firstUtf8Character(_rest);
+    if (!isXmlCharacter(character)) return false;
+    out += _rest.substr(0, character.length);
+    _rest.remove_prefix(character.length);
+    return true;
+  }
+
+  bool take(std::string_view expected) {
+    if (!_rest.starts_with(expected)) return false;
+    _rest.remove_prefix(expected.size());
+    return true;
+  }
+
+  /// What stands before the mark; the mark is taken too.
+  std::optional<std::string_view> takeUpTo(char mark) {
+    const std::size_t end = _rest.find(mark);
+    if (end == std::string_view::npos) return std::nullopt;
+    const std::string_view before = _rest.substr(0, end);
+    _rest.remove_prefix(end + 1);
+    return before;
+  }
+
+  /// The longest front of such bytes.
+  std::string_view takeAll(const std::array<bool, 256>& table) {
+    std::size_t length = 0;
+    while (length < _rest.size() && table[static_cast<unsigned char>(_rest[length])]) ++length;
+    const std::string_view all = _rest.substr(0, length);
+    _rest.remove_prefix(length);
+    return all;
+  }
+
+  void skipSpace() { takeAll(kIsSpace); }
+
+  std::string_view _rest;
+  std::size_t _usualSize = 0;  // of the dictionary read last: neighbours are alike, and all together make no more room
+};
+
+}  // namespace
+
+std::optional<PropertyList> readPlainXml(std::string_view text) { return PlainReader(text).read(); }
+
+}  // namespace quilt::platform
