@@ -277,7 +277,7 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
   /// The title, or the fall-back for a missing or empty one.
   std::string displayTitle() const;
   bool readProperties(const Path& file);
-  void apply(const Dictionary& record);
+  void apply(Dictionary record);
   bool writeProperties();
   /// What update() does; none, and nothing logged, while busy.
   std::optional<bool> saveUnlessBusy();

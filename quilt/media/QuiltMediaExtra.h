@@ -14,7 +14,7 @@ class QUILT_EXPORT QuiltMediaExtra : public QuiltMediaSource {
   static std::shared_ptr<QuiltMediaExtra> init();
   static std::shared_ptr<QuiltMediaExtra> initWithURL(const Url& url);
   static std::shared_ptr<QuiltMediaExtra> initWithPath(const Path& path);
-  static std::shared_ptr<QuiltMediaExtra> initWithDictionary(const Dictionary& dictionary,
+  static std::shared_ptr<QuiltMediaExtra> initWithDictionary(Dictionary dictionary,
                                                              const std::shared_ptr<QuiltMedia>& andMedia);
   /// @}
 

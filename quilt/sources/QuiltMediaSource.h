@@ -40,7 +40,7 @@ class QUILT_EXPORT QuiltMediaSource : public platform::Object {
   static std::shared_ptr<QuiltMediaSource> initWithPath(const Path& path);
   /// @}
   /// Reads a record. Null, after a warning, when its identity is no plain folder name.
-  static std::shared_ptr<QuiltMediaSource> initWithDictionary(const Dictionary& dictionary,
+  static std::shared_ptr<QuiltMediaSource> initWithDictionary(Dictionary dictionary,
                                                               const std::shared_ptr<QuiltMedia>& andMedia);
 
   // Properties
@@ -193,7 +193,7 @@ class QUILT_EXPORT QuiltMediaSource : public platform::Object {
  protected:
   QuiltMediaSource();
   /// Fills a fresh object from a record; false, after a warning, when the record is refused.
-  bool initializeWithDictionary(const Dictionary& dictionary, const std::shared_ptr<QuiltMedia>& andMedia);
+  bool initializeWithDictionary(Dictionary dictionary, const std::shared_ptr<QuiltMedia>& andMedia);
   bool initializeWithURL(const Url& url);
 
  private:

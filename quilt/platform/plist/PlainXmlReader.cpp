@@ -70,26 +70,30 @@ class PlainReader {
   }
 
   bool readValue(PropertyList& value, std::size_t depth) {
+    if (depth > kDeepestNesting) return false;
     skipSpace();
-    if (depth > kDeepestNesting || !take("<")) return false;
+    if (take("<string>")) return readText(value.become<std::string>()) && take("</string>");
+    if (take("<dict>")) return readDictionary(value.become<Dictionary>(), depth);
+    if (take("<array>")) return readArray(value.become<Array>(), depth);
+    if (take("<true/>")) return hold(value, true);
+    if (take("<false/>")) return hold(value, false);
+    if (take("<dict/>")) return hold(value, Dictionary());
+    if (take("<array/>")) return hold(value, Array());
+    return readScalar(value);
+  }
+
+  static bool hold(PropertyList& value, PropertyList content) {
+    value = std::move(content);
+    return true;
+  }
+
+  bool readScalar(PropertyList& value) {
+    if (!take("<")) return false;
     const std::optional<std::string_view> name = takeUpTo('>');
-    if (!name) return false;
-    if (*name == "string") return readText(*name, value.become<std::string>());
-    if (*name == "dict") return readDictionary(value.become<Dictionary>(), depth);
-    if (*name == "array") return readArray(value.become<Array>(), depth);
-    if (*name == "true/" || *name == "false/") {
-      value = *name == "true/";
-      return true;
-    }
-    if (*name == "dict/" || *name == "array/") {
-      value = *name == "dict/" ? PropertyList(Dictionary()) : PropertyList(Array());
-      return true;
-    }
     std::string text;
-    if (!readText(*name, text)) return false;
+    if (!name || !readText(text) || !take("</") || !take(*name) || !take(">")) return false;
     std::optional<PropertyList> scalar = scalarFrom(*name, text);
-    if (scalar) value = *std::move(scalar);
-    return scalar.has_value();
+    return scalar && hold(value, *std::move(scalar));
   }
 
   bool readArray(Array& items, std::size_t depth) {
@@ -106,19 +110,19 @@ class PlainReader {
       if (take("</dict>")) break;
       if (entries.empty()) entries.reserve(_usualSize);
       std::string key;
-      if (!take("<key>") || !readText("key", key)) return false;
-      if (!readValue(entries.append(std::move(key), false), depth + 1)) return false;
+      if (!take("<key>") || !readText(key) || !take("</key>")) return false;
+      if (!readValue(entries.append(std::move(key)), depth + 1)) return false;
     }
     _usualSize = entries.size();
     dropRepeatedKeys(entries);
     return true;
   }
 
-  /// Reads the text of an element, and its end.
-  bool readText(std::string_view element, std::string& out) {
+  /// Reads the text of an element, up to a tag.
+  bool readText(std::string& out) {
     for (;;) {
       out += takeAll(kIsOrdinary);
-      if (take("</")) return take(element) && take(">");
+      if (_rest.starts_with('<')) return true;
       if (!readEntity(out) && !readCharacter(out)) return false;
     }
   }
