@@ -77,18 +77,24 @@ std::shared_ptr<QuiltMedia> QuiltMedia::initWithDictionary(Dictionary dictionary
 
 Dictionary QuiltMedia::dictionary() {
   Dictionary record;
+  record.reserve(std::size(kMediaKeys));
   record.append("UUID", uuid());
   if (const Text text = title()) record.append("Title", *text);
   if (const Text text = description()) record.append("Description", *text);
-  if (Array records = recordsOf(_sources); !records.empty()) record.append("Sources", std::move(records));
-  if (Array records = recordsOf(_extras); !records.empty()) record.append("Extras", std::move(records));
-  if (const auto commentary = audioCommentarySource()) record.append("AudioCommentarySource", commentary->dictionary());
-  record.append("IsFlattened", isFlattened());
-  record.append("TotalSizeInMegaBytes", totalSizeInMegaBytes());
+  {
+    const OneLookAtEachFile untilAllIsAdded;
+    if (Array records = recordsOf(_sources); !records.empty()) record.append("Sources", std::move(records));
+    if (Array records = recordsOf(_extras); !records.empty()) record.append("Extras", std::move(records));
+    if (const auto commentary = audioCommentarySource())
+      record.append("AudioCommentarySource", commentary->dictionary());
+    record.append("IsFlattened", isFlattened());
+    record.append("TotalSizeInMegaBytes", totalSizeInMegaBytes());
+  }
   if (const Text category = contentCategory()) record.append("ContentCategory", *category);
   const auto document = documentOwner();
   if (document)
-    record.append("PosterImagePath", platform::pathRelativeTo(posterImagePath(), document->path()).native());
+    record.append("PosterImagePath",
+                  platform::textRelativeTo(below(folderOf(*this), {"poster.jpg"}), document->folder()));
   record.append("PosterImageWidth", posterImageWidth());
   record.append("PosterImageHeight", posterImageHeight());
   platform::appendAll(record, _unknownEntries);

@@ -28,9 +28,9 @@ std::shared_ptr<QuiltMediaExtra> QuiltMediaExtra::initWithDictionary(Dictionary 
   return extra->initializeWithDictionary(std::move(dictionary), andMedia) ? extra : nullptr;
 }
 
-Path QuiltMediaExtra::path() const {
+std::string QuiltMediaExtra::folder() const {
   const auto media = mediaOwner();
-  return media ? pathBelow(folderOf(*media), {"extras", uuid()}) : Path();
+  return media ? below(folderOf(*media), {"extras", uuid()}) : std::string();
 }
 
 }  // namespace quilt

@@ -19,7 +19,7 @@ class QUILT_EXPORT QuiltMediaExtra : public QuiltMediaSource {
   /// @}
 
   /// Inside the item's "extras" folder; empty while the item is not in a document.
-  Path path() const override;
+  std::string folder() const override;
 
  protected:
   QuiltMediaExtra() = default;

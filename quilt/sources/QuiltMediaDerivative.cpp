@@ -167,11 +167,13 @@ std::shared_ptr<QuiltMediaDerivative> QuiltMediaDerivative::initWithDictionary(
 
 Dictionary QuiltMediaDerivative::dictionary() const {
   Dictionary record;
+  record.reserve(std::size(kDerivativeKeys));
   record.append("UUID", uuid());
   const std::optional<Url> location = url();
   const bool isFile = location && location->isFileUrl();
+  const std::string file = isFile ? location->relativePathText() : std::string();
   if (isFile && isFlattened()) {
-    record.append("Filename", location->relativePath().filename().native());
+    record.append("Filename", file.substr(file.rfind('/') + 1));
   } else if (location) {
     record.append("URL", location->absoluteString());
   }
@@ -185,8 +187,7 @@ Dictionary QuiltMediaDerivative::dictionary() const {
   record.append("Duration", duration());
   if (isFile) {
     const auto document = documentOf(sourceOwner());
-    record.append("RelativePath",
-                  platform::pathRelativeTo(location->relativePath(), document ? document->path() : Path()).native());
+    record.append("RelativePath", platform::textRelativeTo(file, document ? document->folder() : std::string()));
   }
   platform::appendAll(record, _unknownEntries);
   return record;

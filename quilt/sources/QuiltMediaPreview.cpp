@@ -59,9 +59,10 @@ std::shared_ptr<QuiltMediaPreview> QuiltMediaPreview::initWithDictionary(
 }
 
 Dictionary QuiltMediaPreview::dictionary() const {
-  const Path file = path();
-  const auto document = documentOf(sourceOwner());
+  const auto source = sourceOwner();
+  const std::string file = pathIn(source);
   Dictionary record;
+  record.reserve(std::size(kPreviewKeys));
   record.append("UUID", uuid());
   if (const Text text = title()) record.append("Title", *text);
   if (const Text text = content()) record.append("Content", *text);
@@ -72,8 +73,8 @@ Dictionary QuiltMediaPreview::dictionary() const {
   if (const auto pixels = height()) record.append("Height", *pixels);
   record.append("IsFlattened", isFlattened());
   if (!file.empty()) {
-    record.append("Filename", file.filename().native());
-    record.append("RelativePath", platform::pathRelativeTo(file, document->path()).native());
+    record.append("Filename", file.substr(file.rfind('/') + 1));
+    record.append("RelativePath", platform::textRelativeTo(file, documentOf(source)->folder()));
   }
   platform::appendAll(record, _unknownEntries);
   return record;
@@ -103,13 +104,13 @@ std::shared_ptr<ImageWrapper> QuiltMediaPreview::image() {
   return loaded;
 }
 
-Path QuiltMediaPreview::path() const {
-  const auto source = sourceOwner();
+Path QuiltMediaPreview::path() const { return pathIn(sourceOwner()); }
+
+std::string QuiltMediaPreview::pathIn(const std::shared_ptr<QuiltMediaSource>& source) const {
   if (!source) return {};
   const std::size_t position = index();
-  return pathBelow(
-      source->path().native(),
-      {"previews", platform::withExtension(position == kNoIndex ? uuid() : std::to_string(position), "jpg")});
+  return below(source->folder(),
+               {"previews", platform::withExtension(position == kNoIndex ? uuid() : std::to_string(position), "jpg")});
 }
 
 bool QuiltMediaPreview::hasPicture() const {
@@ -139,8 +140,9 @@ bool QuiltMediaPreview::flatten() {
 }
 
 double QuiltMediaPreview::totalSizeInMegaBytes() const {
+  if (!isFlattened()) return 0;
   const Path file = path();
-  if (!isFlattened() || file.empty()) return 0;
+  if (file.empty()) return 0;
   const auto size = megaBytesOfFile(file);
   if (size) return *size;
   FDYLogger::logWarning("Source preview at path \"%@\" cannot be sized: \"%@\"", file, size.error());

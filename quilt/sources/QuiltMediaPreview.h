@@ -72,6 +72,7 @@ class QUILT_EXPORT QuiltMediaPreview : public platform::Object {
 
  private:
   static std::shared_ptr<QuiltMediaPreview> make(std::string uuid);
+  std::string pathIn(const std::shared_ptr<QuiltMediaSource>& source) const;
   void adopt(const std::shared_ptr<ImageWrapper>& image);
 
   platform::Property<std::string> _uuid{*this, "uuid"};

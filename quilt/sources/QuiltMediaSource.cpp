@@ -113,6 +113,7 @@ bool QuiltMediaSource::initializeWithDictionary(Dictionary dictionary, const std
 
 Dictionary QuiltMediaSource::dictionary() const {
   Dictionary record;
+  record.reserve(std::size(kSourceKeys));
   record.append("UUID", uuid());
   if (const Text category = contentCategory()) record.append("ContentCategory", *category);
   if (Array records = recordsOf<QuiltMediaDerivative>(_derivatives); !records.empty())
@@ -144,14 +145,14 @@ void QuiltMediaSource::updateDocumentUnlessProcessing() const { requestSave(docu
 
 // ---- Places in the package
 
-Path QuiltMediaSource::path() const {
+std::string QuiltMediaSource::folder() const {
   const auto media = mediaOwner();
-  return media ? pathBelow(folderOf(*media), {"sources", uuid()}) : Path();
+  return media ? below(folderOf(*media), {"sources", uuid()}) : std::string();
 }
 
-Path QuiltMediaSource::derivativesFolderPath() const { return pathBelow(path().native(), {"derivatives"}); }
-Path QuiltMediaSource::previewsFolderPath() const { return pathBelow(path().native(), {"previews"}); }
-Path QuiltMediaSource::audioSamplesFolderPath() const { return pathBelow(path().native(), {"audiosamples"}); }
+Path QuiltMediaSource::derivativesFolderPath() const { return pathBelow(folder(), {"derivatives"}); }
+Path QuiltMediaSource::previewsFolderPath() const { return pathBelow(folder(), {"previews"}); }
+Path QuiltMediaSource::audioSamplesFolderPath() const { return pathBelow(folder(), {"audiosamples"}); }
 
 // ---- Derived values
 

@@ -89,8 +89,10 @@ class QUILT_EXPORT QuiltMediaSource : public platform::Object {
 
   // Places in the package; empty while the source is not in a document
   /// @{
-  /// The source's folder in the package, and the folders in it. Empty while the source is not in a document.
-  virtual Path path() const;
+  /// The source's folder in the package, also as text, which is cheaper; and the folders in it. Empty while the source
+  /// is not in a document.
+  Path path() const { return folder(); }
+  virtual std::string folder() const;
   Path derivativesFolderPath() const;
   Path previewsFolderPath() const;
   Path audioSamplesFolderPath() const;

@@ -41,6 +41,7 @@ std::string percentEncoded(std::string_view text) {
 }
 
 std::string percentDecoded(std::string_view text) {
+  if (text.find('%') == std::string_view::npos) return std::string(text);
   std::string out;
   out.reserve(text.size());
   for (std::size_t i = 0; i < text.size(); ++i) {
@@ -107,6 +108,8 @@ std::optional<Url> Url::parse(std::string_view text) {
   return Url(std::string(text), true);
 }
 
-std::filesystem::path Url::relativePath() const { return percentDecoded(pathPart(_text)); }
+std::filesystem::path Url::relativePath() const { return relativePathText(); }
+
+std::string Url::relativePathText() const { return percentDecoded(pathPart(_text)); }
 
 }  // namespace quilt::platform
