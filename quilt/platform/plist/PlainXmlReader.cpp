@@ -2,10 +2,10 @@
 #include "quilt/platform/plist/PlainXmlReader.h"
 
 #include <algorithm>
-#include <array>
 #include <string>
 #include <utility>
 
+#include "quilt/platform/base/ByteTable.h"
 #include "quilt/platform/plist/Limits.h"
 #include "quilt/platform/plist/XmlReader.h"
 #include "quilt/platform/plist/XmlScalars.h"
@@ -154,7 +154,7 @@ class PlainReader {
   }
 
   /// The longest front of such bytes.
-  std::string_view takeAll(const std::array<bool, 256>& table) {
+  std::string_view takeAll(const ByteTable& table) {
     const std::string_view all = _rest.substr(0, lengthOf(table, _rest));
     _rest.remove_prefix(all.size());
     return all;

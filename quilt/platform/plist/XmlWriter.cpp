@@ -5,6 +5,7 @@
 #include <charconv>
 #include <cmath>
 
+#include "quilt/platform/base/ByteTable.h"
 #include "quilt/platform/plist/Base64.h"
 #include "quilt/platform/plist/XmlText.h"
 
