@@ -14,7 +14,7 @@ namespace quilt::platform {
 namespace {
 
 /// The characters that stand for themselves, of those that are one byte.
-constexpr auto kIsOrdinary = tableOf(
+constexpr auto kNeedsNoEntity = tableOf(
     [](std::size_t c) { return (c >= ' ' && c < 0x80 && c != '<' && c != '>' && c != '&') || c == '\t' || c == '\n'; });
 
 class Writer {
@@ -92,7 +92,7 @@ class Writer {
 
   void escaped(std::string_view text) {
     for (;;) {
-      const std::size_t length = lengthOf(kIsOrdinary, text);
+      const std::size_t length = lengthOf(kNeedsNoEntity, text);
       _out.append(text.substr(0, length));
       text.remove_prefix(length);
       if (text.empty()) return;
