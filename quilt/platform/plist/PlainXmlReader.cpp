@@ -30,6 +30,12 @@ constexpr auto kIsSpace = tableOf([](std::size_t c) { return c == ' ' || c == '\
 constexpr auto kIsOrdinary =
     tableOf([](std::size_t c) { return (c >= ' ' && c < 0x80 && c != '<' && c != '&') || c == '\t' || c == '\n'; });
 
+/// What the line of the document's type is made of, when it declares nothing.
+constexpr auto kIsOfType = tableOf([](std::size_t c) {
+  return (c >= 'A' && c <= 'Z') || (c >= 'a' && c <= 'z') || (c >= '0' && c <= '9') || c == ' ' || c == '"' ||
+         c == '-' || c == '/' || c == '.' || c == ':';
+});
+
 /// Each function takes what it reads from the front of the text; false or none for what is not written plainly.
 class PlainReader {
  public:
@@ -44,11 +50,9 @@ class PlainReader {
   bool readHead() {
     take(kDeclaration);
     skipSpace();
-    if (take("<!DOCTYPE")) {
-      const std::string_view type = takeUpTo('>').value_or("<");
-      // Quotes, one inside the other or around a ">", and declarations are for a parser that knows of them.
-      if (type.find_first_of("<['") != std::string_view::npos || std::count(type.begin(), type.end(), '"') % 2 != 0)
-        return false;
+    if (take("<!DOCTYPE ")) {
+      const std::string_view type = takeAll(kIsOfType);
+      if (std::count(type.begin(), type.end(), '"') % 2 != 0 || !take(">")) return false;
       skipSpace();
     }
     return take("<plist version=\"1.0\">") || take("<plist>");

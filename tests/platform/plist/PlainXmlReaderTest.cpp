@@ -110,7 +110,8 @@ TEST(PlainXmlReaderTest, OnlyTheUsualFirstAndLastLinesArePlain) {
 
   for (const std::string head :
        {"\xEF\xBB\xBF", "<?xml version=\"1.0\" encoding=\"ISO-8859-1\"?>", "<?xml version=\"1.0\"?>", "<!-- a -->", "a",
-        "<!DOCTYPE plist", "<!DOCTYPE plist [<!ENTITY a \"b\">]>", "<!DOCTYPE \">\" a>", "<!DOCTYPE 'a\" \"'>"})
+        "<!DOCTYPE plist", "<!DOCTYPE plist [<!ENTITY a \"b\">]>", "<!DOCTYPE \">\" a>", "<!DOCTYPEplist>",
+        "<!DOCTYPE a\x01>", "<!DOCTYPE 'a\" \"'>"})
     EXPECT_FALSE(readPlainXml(head + list("<true/>"))) << head;
   EXPECT_FALSE(readPlainXml("<plist version=\"2.0\"><true/></plist>"));
   EXPECT_FALSE(readPlainXml("<dict/>"));
