@@ -52,8 +52,8 @@ class Property {
     return value;
   }
 
-  /// Gives the value to an object that is being made, which no one else knows yet: no announcement, and no lock, which
-  /// would be most of the cost of reading a record.
+  /// Gives the value to an object that is being made, which no one else knows yet: without an announcement and without
+  /// the lock, which a document's record would take a thousand times.
   void initialize(T value) { _value = std::move(value); }
 
   /// Sets the value without an announcement, for a cache that fills itself.

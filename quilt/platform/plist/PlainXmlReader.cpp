@@ -104,7 +104,7 @@ class PlainReader {
     for (;;) {
       skipSpace();
       if (take("</dict>")) break;
-      if (entries.empty()) entries.reserve(_usualSize);
+      if (entries.empty()) entries.reserve(std::exchange(_usualSize, 0));
       std::string key;
       if (!take("<key>") || !readText(key) || !take("</key>")) return false;
       if (!readValue(entries.append(std::move(key)), depth + 1)) return false;
@@ -167,7 +167,9 @@ class PlainReader {
   void skipSpace() { takeAll(kIsSpace); }
 
   std::string_view _rest;
-  std::size_t _usualSize = 0;  // of the dictionary read last: neighbours are alike, and all together make no more room
+  // The size of the dictionary that ended last, for one that begins: neighbours are alike. It is used up, so that all
+  // together make no more room than there are entries.
+  std::size_t _usualSize = 0;
 };
 
 }  // namespace

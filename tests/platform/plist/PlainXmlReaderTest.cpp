@@ -2,6 +2,7 @@
 #include "quilt/platform/plist/PlainXmlReader.h"
 
 #include <gtest/gtest.h>
+#include <malloc.h>
 
 #include <string>
 
@@ -127,6 +128,19 @@ TEST(PlainXmlReaderTest, NestsAsDeeplyAsTheFullParser) {
     EXPECT_EQ(depth <= kDeepestNesting, value.has_value());
     EXPECT_EQ(value.has_value(), readFully(list(text)).hasValue());
   }
+}
+
+TEST(PlainXmlReaderTest, DictionariesInsideEachOtherMakeNoMoreRoomThanTheyNeed) {
+  std::string large;
+  for (int i = 0; i < 100'000; ++i) large += "<key>" + std::to_string(i) + "</key><true/>";
+  std::string nested = "<true/>";
+  for (std::size_t i = 2; i < kDeepestNesting; ++i) nested = "<dict><key>a</key>" + nested + "</dict>";
+  const std::string text = list("<array><dict>" + large + "</dict>" + nested + "</array>");
+  const std::size_t before = mallinfo2().uordblks + mallinfo2().hblkhd;
+  const auto value = readPlainXml(text);
+  const std::size_t taken = mallinfo2().uordblks + mallinfo2().hblkhd - before;
+  ASSERT_TRUE(value);
+  EXPECT_LT(taken, 3 * 131'072 * sizeof(Dictionary::Entry));  // the large one, grown by doubling, and one more guess
 }
 
 TEST(PlainXmlReaderTest, WhatTheWriterWritesIsPlain) {
