@@ -1,17 +1,24 @@
 // SPDX-License-Identifier: Apache-2.0
-// Loads and saves a library of generated records beside bare parsing of the same files, in one run:
+// Loads and saves a library of generated records beside what others make of the same files, in one run:
 // `library [DOCUMENTS] [ITEMS]`, 2,000 documents of 10 items by default. Each item has one source with three
 // derivatives and a still for each of its ten chapters, about 70 KB of record for a document. Loading is linear when
-// the rate stays the same from a quarter of the library to all of it.
+// the rate stays the same from a quarter of the library to all of it. Where libplist is not installed, its columns
+// stay empty.
 #include <algorithm>
 #include <chrono>
 #include <cstdio>
 #include <cstdlib>
 #include <filesystem>
 #include <functional>
+#include <nlohmann/json.hpp>
 #include <pugixml.hpp>
 #include <sstream>
 #include <string>
+#include <vector>
+
+#ifdef QUILT_HAS_LIBPLIST
+#include <plist/plist.h>
+#endif
 
 #include "quilt/collections/QuiltCollectionsController.h"
 #include "quilt/platform/install.h"
@@ -35,6 +42,36 @@ double bestOf(int runs, const std::function<void()>& job) {
   double best = 1e12;
   for (int run = 0; run < runs; ++run) best = std::min(best, milliseconds(job));
   return best;
+}
+
+/// A property list as libplist holds it; nothing where that is not installed.
+class Peer {
+ public:
+#ifdef QUILT_HAS_LIBPLIST
+  static constexpr bool kIsThere = true;
+  explicit Peer(const std::string& text) {
+    plist_from_xml(text.data(), static_cast<std::uint32_t>(text.size()), &_root);
+    if (!_root) std::printf("not parsed by libplist\n");
+  }
+  ~Peer() { plist_free(_root); }
+  void write() const {
+    char* text = nullptr;
+    std::uint32_t size = 0;
+    plist_to_xml(_root, &text, &size);
+    std::free(text);
+  }
+
+ private:
+  plist_t _root = nullptr;
+#else
+  static constexpr bool kIsThere = false;
+  explicit Peer(const std::string&) {}
+  void write() const {}
+#endif
+};
+
+void printRatio(const char* of, double ours, double theirs, bool isThere = true) {
+  if (isThere) std::printf("  %s %.3f ms, ratio %.2f", of, theirs, ours / theirs);
 }
 
 std::string fresh() { return quilt::platform::generateUUID(); }
@@ -117,19 +154,45 @@ void parseAll(const fs::path& collection) {
   }
 }
 
+void peerAll(const fs::path& collection) {
+  for (const auto& package : fs::directory_iterator(collection))
+    if (const auto text = services().files->readFile(package.path() / "properties.plist", 1U << 30U)) Peer{*text};
+}
+
 void compareLoading(const fs::path& folder, int documents, int items) {
   const fs::path library = folder / ("library" + std::to_string(documents));
   const fs::path collection = makeLibrary(library, documents, items);
   std::size_t loaded = 0;
   double ours = 1e12;
-  double theirs = 1e12;
+  double parse = 1e12;
+  double peer = 1e12;
   for (int run = 0; run < 3; ++run) {
     ours = std::min(ours, milliseconds([&] { loaded = load(library); }));
-    theirs = std::min(theirs, milliseconds([&] { parseAll(collection); }));
+    parse = std::min(parse, milliseconds([&] { parseAll(collection); }));
+    peer = std::min(peer, milliseconds([&] { peerAll(collection); }));
   }
-  std::printf("load %5zu documents of %d items    ours %9.1f ms (%6.0f documents/s)  parse %9.1f ms  ratio %.2f\n",
-              loaded, items, ours, static_cast<double>(loaded) * 1000 / ours, theirs, ours / theirs);
+  const double each = ours / static_cast<double>(std::max<std::size_t>(loaded, 1));
+  std::printf("load %zu documents of %d items: %.3f ms each", loaded, items, each);
+  printRatio("parse", each, parse / documents);
+  printRatio("libplist", each, peer / documents, Peer::kIsThere);
+  std::printf("\n");
   fs::remove_all(library);
+}
+
+/// Every job once in each turn, the best of each: what else the machine does meanwhile is shared.
+std::vector<double> bestOfEach(int turns, const std::vector<std::function<void()>>& jobs) {
+  std::vector<double> best(jobs.size(), 1e12);
+  for (int turn = 0; turn < turns; ++turn)
+    for (std::size_t i = 0; i < jobs.size(); ++i) best[i] = std::min(best[i], milliseconds(jobs[i]));
+  return best;
+}
+
+void compareLargeRecord() {
+  const std::string text = services().propertyLists->serialize(documentRecord(3000));
+  const auto best = bestOfEach(5, {[&] { (void)services().propertyLists->parse(text); }, [&] { Peer{text}; }});
+  std::printf("read a record of %.0f MB: %.1f ms", static_cast<double>(text.size()) / 1e6, best[0]);
+  printRatio("libplist", best[0], best[1], Peer::kIsThere);
+  std::printf("\n");
 }
 
 void compareSaving(const fs::path& folder, int items) {
@@ -138,19 +201,28 @@ void compareSaving(const fs::path& folder, int items) {
   const fs::path document = fs::is_directory(file) ? file : std::next(fs::directory_iterator(package))->path();
   const auto opened = quilt::QuiltDocument::initWithPath(document);
   if (!opened) return;
-  pugi::xml_document xml;
-  xml.load_file((document / "properties.plist").c_str());
-  const double text = bestOf(20, [&] { (void)services().propertyLists->serialize(opened->dictionary()); });
-  const double peer = bestOf(20, [&] {
-    std::ostringstream out;
-    xml.save(out);
-  });
   const Dictionary record = opened->dictionary();
-  const double alone = bestOf(20, [&] { (void)services().propertyLists->serialize(record); });
-  std::printf(
-      "record of %5d items to text       ours %9.3f ms (%.3f from a dictionary)  pugixml %9.3f ms  ratio %.2f\n", items,
-      text, alone, peer, alone / peer);
-  std::printf("save it                            ours %9.3f ms\n", bestOf(5, [&] { opened->update(); }));
+  const std::string text = services().propertyLists->serialize(record);
+  const Peer peer(text);
+  pugi::xml_document xml;
+  xml.load_string(text.c_str());
+  const auto json = nlohmann::json::parse(services().json->toJSON(record));
+  const auto best = bestOfEach(20, {[&] { (void)services().propertyLists->serialize(opened->dictionary()); },
+                                    [&] { (void)services().propertyLists->serialize(record); }, [&] { peer.write(); },
+                                    [&] {
+                                      std::ostringstream out;
+                                      xml.save(out);
+                                    },
+                                    [&] { (void)services().json->toJSON(record); }, [&] { (void)json.dump(); }});
+  for (const std::size_t ours : {std::size_t{0}, std::size_t{1}}) {
+    std::printf("%d items, %s to text: %.3f ms", items, ours == 0 ? "model" : "dictionary", best[ours]);
+    printRatio("libplist", best[ours], best[2], Peer::kIsThere);
+    printRatio("pugixml", best[ours], best[3]);
+    std::printf("\n");
+  }
+  std::printf("%d items, dictionary to JSON: %.3f ms", items, best[4]);
+  printRatio("nlohmann", best[4], best[5]);
+  std::printf("\n%d items, save: %.3f ms\n", items, bestOf(5, [&] { opened->update(); }));
 }
 
 }  // namespace
@@ -162,6 +234,7 @@ int main(int argumentCount, char** arguments) {
   std::string pattern = (fs::temp_directory_path() / "quilt-bench-XXXXXX").string();
   if (mkdtemp(pattern.data()) == nullptr) return 1;
   for (const int part : {documents / 4, documents / 2, documents}) compareLoading(pattern, part, items);
+  compareLargeRecord();
   compareSaving(fs::path(pattern) / "ten", 10);
   compareSaving(fs::path(pattern) / "thousand", 1000);
   fs::remove_all(pattern);

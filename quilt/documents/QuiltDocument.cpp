@@ -2,6 +2,7 @@
 #include "quilt/documents/QuiltDocument.h"
 
 #include <algorithm>
+#include <utility>
 
 #include "quilt/collections/QuiltCollection.h"
 #include "quilt/platform/base/FDYLogger.h"
@@ -159,7 +160,7 @@ bool QuiltDocument::readProperties(const Path& file) {
     FDYLogger::logWarning("Failed to open document at path \"%@\": \"Properties file cannot be found\"", path());
     return false;
   }
-  const auto record = readPropertiesOf(path(), file);
+  auto record = readPropertiesOf(path(), file);
   // Media of a wrong kind is damage, not an empty list: opening it as empty would lose the items at the next save.
   const auto isUsable = [](const Dictionary& dictionary) {
     return !dictionary.contains("Media") || dictionary.array("Media") != nullptr;
@@ -169,29 +170,29 @@ bool QuiltDocument::readProperties(const Path& file) {
     return false;
   }
   if (record->string("Version") != kFormatVersion) return false;
-  apply(*record);
+  apply(*std::move(record));
   return true;
 }
 
-void QuiltDocument::apply(const Dictionary& record) {
-  if (const Text text = record.string("UUID")) setUuid(*text);
-  if (Text text = record.string("Title")) setTitle(std::move(text));
-  if (Text text = record.string("Description")) setDescription(std::move(text));
-  if (Text text = record.string("Author")) setAuthor(std::move(text));
-  if (Text text = record.string("Keywords")) setKeywords(std::move(text));
-  if (Text text = record.string("Category")) setCategory(std::move(text));
-  if (Text text = record.string("AdvisoryLabel")) setAdvisoryLabel(std::move(text));
+void QuiltDocument::apply(Dictionary record) {
+  if (Text text = record.takeString("UUID")) setUuid(*std::move(text));
+  if (Text text = record.takeString("Title")) setTitle(std::move(text));
+  if (Text text = record.takeString("Description")) setDescription(std::move(text));
+  if (Text text = record.takeString("Author")) setAuthor(std::move(text));
+  if (Text text = record.takeString("Keywords")) setKeywords(std::move(text));
+  if (Text text = record.takeString("Category")) setCategory(std::move(text));
+  if (Text text = record.takeString("AdvisoryLabel")) setAdvisoryLabel(std::move(text));
   if (const auto order = record.integer("jukeboxOrder")) setJukeboxOrder(*order);
   if (const Text themePath = record.string("ThemePath")) setTheme(QuiltTheme::initWithPath(*themePath));
   if (const auto date = record.date("CreationDate")) setCreationDate(date);
   if (const auto date = record.date("ModifiedDate")) setModifiedDate(date);
-  if (Text text = record.string("Type")) setType(std::move(text));
-  if (const Array* items = record.array("Media")) {
+  if (Text text = record.takeString("Type")) setType(std::move(text));
+  if (Array* items = record.array("Media")) {
     const auto self = shared(this);
-    for (const auto& item : *items)
-      if (const auto* entry = item.as<Dictionary>()) addMedia(QuiltMedia::initWithDictionary(*entry, self));
+    for (auto& item : *items)
+      if (auto* entry = item.as<Dictionary>()) addMedia(QuiltMedia::initWithDictionary(std::move(*entry), self));
   }
-  if (Text text = record.string("LastPublishURL")) setLastPublishURL(std::move(text));
+  if (Text text = record.takeString("LastPublishURL")) setLastPublishURL(std::move(text));
   _unknownEntries = platform::entriesBeyond(kDocumentKeys, record);
 }
 

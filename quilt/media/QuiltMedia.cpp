@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "quilt/media/QuiltMedia.h"
 
+#include <utility>
+
 #include "quilt/documents/QuiltDocument.h"
 #include "quilt/platform/base/Paths.h"
 #include "quilt/platform/interfaces/Services.h"
@@ -36,37 +38,37 @@ Array recordsOf(const List& list) {
 
 }  // namespace
 
-QuiltMedia::QuiltMedia() { _uuid.store(platform::generateUUID()); }
+QuiltMedia::QuiltMedia() { _uuid.initialize(platform::generateUUID()); }
 
 std::shared_ptr<QuiltMedia> QuiltMedia::init() {
   struct Made final : QuiltMedia {};
   return std::make_shared<Made>();
 }
 
-std::shared_ptr<QuiltMedia> QuiltMedia::initWithDictionary(const Dictionary& dictionary,
+std::shared_ptr<QuiltMedia> QuiltMedia::initWithDictionary(Dictionary dictionary,
                                                            const std::shared_ptr<QuiltDocument>& andDocument) {
   auto media = init();
   // First, so that the children find their places while they load.
-  media->setDocumentOwner(andDocument);
-  if (const Text uuid = dictionary.string("UUID")) {
+  media->_documentOwner.initialize(andDocument);
+  if (Text uuid = dictionary.takeString("UUID")) {
     if (!isAcceptedName(*uuid, "media item")) return nullptr;
-    media->setUuid(*uuid);
+    media->_uuid.initialize(*std::move(uuid));
   }
-  if (Text title = dictionary.string("Title")) media->setTitle(std::move(title));
-  if (Text description = dictionary.string("Description")) media->setDescription(std::move(description));
-  if (Text category = dictionary.string("ContentCategory")) media->setContentCategory(std::move(category));
-  if (const Array* records = dictionary.array("Sources")) {
-    for (const auto& record : *records)
-      if (const auto* entry = record.as<Dictionary>())
-        media->addSource(QuiltMediaSource::initWithDictionary(*entry, media));
+  if (Text title = dictionary.takeString("Title")) media->_title.initialize(std::move(title));
+  if (Text description = dictionary.takeString("Description")) media->_description.initialize(std::move(description));
+  if (Text category = dictionary.takeString("ContentCategory")) media->_contentCategory.initialize(std::move(category));
+  if (Array* records = dictionary.array("Sources")) {
+    for (auto& record : *records)
+      if (auto* entry = record.as<Dictionary>())
+        media->addSource(QuiltMediaSource::initWithDictionary(std::move(*entry), media));
   }
-  if (const Array* records = dictionary.array("Extras")) {
-    for (const auto& record : *records)
-      if (const auto* entry = record.as<Dictionary>())
-        media->addExtra(QuiltMediaExtra::initWithDictionary(*entry, media));
+  if (Array* records = dictionary.array("Extras")) {
+    for (auto& record : *records)
+      if (auto* entry = record.as<Dictionary>())
+        media->addExtra(QuiltMediaExtra::initWithDictionary(std::move(*entry), media));
   }
-  if (const Dictionary* record = dictionary.dictionary("AudioCommentarySource")) {
-    if (const auto commentary = QuiltMediaSource::initWithDictionary(*record, media))
+  if (Dictionary* record = dictionary.dictionary("AudioCommentarySource")) {
+    if (const auto commentary = QuiltMediaSource::initWithDictionary(std::move(*record), media))
       media->setAudioCommentarySource(commentary);
   }
   media->_unknownEntries = platform::entriesBeyond(kMediaKeys, dictionary);
@@ -75,18 +77,24 @@ std::shared_ptr<QuiltMedia> QuiltMedia::initWithDictionary(const Dictionary& dic
 
 Dictionary QuiltMedia::dictionary() {
   Dictionary record;
+  record.reserve(std::size(kMediaKeys));
   record.append("UUID", uuid());
   if (const Text text = title()) record.append("Title", *text);
   if (const Text text = description()) record.append("Description", *text);
-  if (Array records = recordsOf(_sources); !records.empty()) record.append("Sources", std::move(records));
-  if (Array records = recordsOf(_extras); !records.empty()) record.append("Extras", std::move(records));
-  if (const auto commentary = audioCommentarySource()) record.append("AudioCommentarySource", commentary->dictionary());
-  record.append("IsFlattened", isFlattened());
-  record.append("TotalSizeInMegaBytes", totalSizeInMegaBytes());
+  {
+    const OneLookAtEachFile untilAllIsAdded;
+    if (Array records = recordsOf(_sources); !records.empty()) record.append("Sources", std::move(records));
+    if (Array records = recordsOf(_extras); !records.empty()) record.append("Extras", std::move(records));
+    if (const auto commentary = audioCommentarySource())
+      record.append("AudioCommentarySource", commentary->dictionary());
+    record.append("IsFlattened", isFlattened());
+    record.append("TotalSizeInMegaBytes", totalSizeInMegaBytes());
+  }
   if (const Text category = contentCategory()) record.append("ContentCategory", *category);
   const auto document = documentOwner();
   if (document)
-    record.append("PosterImagePath", platform::pathRelativeTo(posterImagePath(), document->path()).native());
+    record.append("PosterImagePath",
+                  platform::textRelativeTo(below(folderOf(*this), {"poster.jpg"}), document->folder()));
   record.append("PosterImageWidth", posterImageWidth());
   record.append("PosterImageHeight", posterImageHeight());
   platform::appendAll(record, _unknownEntries);

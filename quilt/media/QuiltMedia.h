@@ -23,7 +23,7 @@ class QUILT_EXPORT QuiltMedia : public platform::Object, public ImageBrowserItem
   static std::shared_ptr<QuiltMedia> init();
   /// Reads a record. Null, after a warning, when its identity is no plain folder name. Children whose records yield
   /// nothing are skipped.
-  static std::shared_ptr<QuiltMedia> initWithDictionary(const Dictionary& dictionary,
+  static std::shared_ptr<QuiltMedia> initWithDictionary(Dictionary dictionary,
                                                         const std::shared_ptr<QuiltDocument>& andDocument);
 
   // Properties

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "quilt/media/QuiltMediaExtra.h"
 
+#include <utility>
+
 #include "quilt/media/QuiltMedia.h"
 #include "quilt/sources/ModelFiles.h"
 
@@ -20,15 +22,15 @@ std::shared_ptr<QuiltMediaExtra> QuiltMediaExtra::initWithPath(const Path& path)
   return initWithURL(Url::fileUrl(path));
 }
 
-std::shared_ptr<QuiltMediaExtra> QuiltMediaExtra::initWithDictionary(const Dictionary& dictionary,
+std::shared_ptr<QuiltMediaExtra> QuiltMediaExtra::initWithDictionary(Dictionary dictionary,
                                                                      const std::shared_ptr<QuiltMedia>& andMedia) {
   auto extra = init();
-  return extra->initializeWithDictionary(dictionary, andMedia) ? extra : nullptr;
+  return extra->initializeWithDictionary(std::move(dictionary), andMedia) ? extra : nullptr;
 }
 
-Path QuiltMediaExtra::path() const {
+std::string QuiltMediaExtra::folder() const {
   const auto media = mediaOwner();
-  return media ? pathBelow(folderOf(*media), {"extras", uuid()}) : Path();
+  return media ? below(folderOf(*media), {"extras", uuid()}) : std::string();
 }
 
 }  // namespace quilt

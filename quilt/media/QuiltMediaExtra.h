@@ -14,12 +14,12 @@ class QUILT_EXPORT QuiltMediaExtra : public QuiltMediaSource {
   static std::shared_ptr<QuiltMediaExtra> init();
   static std::shared_ptr<QuiltMediaExtra> initWithURL(const Url& url);
   static std::shared_ptr<QuiltMediaExtra> initWithPath(const Path& path);
-  static std::shared_ptr<QuiltMediaExtra> initWithDictionary(const Dictionary& dictionary,
+  static std::shared_ptr<QuiltMediaExtra> initWithDictionary(Dictionary dictionary,
                                                              const std::shared_ptr<QuiltMedia>& andMedia);
   /// @}
 
   /// Inside the item's "extras" folder; empty while the item is not in a document.
-  Path path() const override;
+  std::string folder() const override;
 
  protected:
   QuiltMediaExtra() = default;

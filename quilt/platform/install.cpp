@@ -49,7 +49,7 @@ namespace {
   return {name, false, "", std::string("Configure the build with ") + option + "=ON."};
 }
 
-void append(std::vector<Capability>& list, const std::vector<Capability>& more) {
+[[maybe_unused]] void append(std::vector<Capability>& list, const std::vector<Capability>& more) {
   list.insert(list.end(), more.begin(), more.end());
 }
 

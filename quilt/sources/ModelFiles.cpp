@@ -2,6 +2,7 @@
 #include "quilt/sources/ModelFiles.h"
 
 #include <algorithm>
+#include <unordered_map>
 #include <utility>
 
 #include "quilt/documents/QuiltDocument.h"
@@ -16,6 +17,20 @@ using platform::services;
 
 namespace {
 
+platform::Result<double> measured(const Path& path) {
+  const auto attributes = services().files->attributesOfItemAtPath(path);
+  if (!attributes) return attributes.error();
+  constexpr float kilo = 1.0F / 1024.0F;
+  return static_cast<double>(static_cast<float>(attributes->size) * kilo * kilo);
+}
+
+struct Looks {
+  std::size_t depth = 0;
+  std::unordered_map<std::string, platform::Result<double>> sizes;
+};
+
+thread_local Looks looks;
+
 // The text stays empty: what lies in no document has no place.
 void descend(std::string& folder, std::string_view name) {
   if (folder.empty()) return;
@@ -27,15 +42,19 @@ void descend(std::string& folder, std::string_view name) {
 
 std::string folderOf(const QuiltMedia& media) {
   const auto document = media.documentOwner();
-  std::string folder = document ? document->path().native() : std::string();
+  std::string folder = document ? document->folder() : std::string();
   descend(folder, "media");
   descend(folder, media.uuid());
   return folder;
 }
 
-Path pathBelow(std::string folder, std::initializer_list<std::string_view> names) {
+std::string below(std::string folder, std::initializer_list<std::string_view> names) {
   for (const std::string_view name : names) descend(folder, name);
-  return Path(std::move(folder));
+  return folder;
+}
+
+Path pathBelow(std::string folder, std::initializer_list<std::string_view> names) {
+  return Path(below(std::move(folder), names));
 }
 
 platform::Result<void> createDirectoryIfMissing(const Path& path) {
@@ -61,11 +80,17 @@ void deleteFromPackage(const Path& path, const std::shared_ptr<QuiltDocument>& d
   if (!removed) platform::FDYLogger::logWarning(warning, path, removed.error());
 }
 
+OneLookAtEachFile::OneLookAtEachFile() { ++looks.depth; }
+
+OneLookAtEachFile::~OneLookAtEachFile() {
+  if (--looks.depth == 0) looks.sizes.clear();
+}
+
 platform::Result<double> megaBytesOfFile(const Path& path) {
-  const auto attributes = services().files->attributesOfItemAtPath(path);
-  if (!attributes) return attributes.error();
-  constexpr float kilo = 1.0F / 1024.0F;
-  return static_cast<double>(static_cast<float>(attributes->size) * kilo * kilo);
+  if (looks.depth == 0) return measured(path);
+  const auto known = looks.sizes.find(path.native());
+  if (known != looks.sizes.end()) return known->second;
+  return looks.sizes.emplace(path.native(), measured(path)).first->second;
 }
 
 std::string fileNameForTitle(const std::string& title) {

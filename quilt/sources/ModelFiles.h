@@ -19,8 +19,11 @@ class QuiltMedia;
 /// building one step by step down to a file would be most of the cost of a record.
 std::string folderOf(const QuiltMedia& media);
 
-/// `name` below `folder`; nothing without a folder.
+/// @{
+/// The names below `folder`, one in the other, as text or as a path; nothing without a folder.
+std::string below(std::string folder, std::initializer_list<std::string_view> names);
 Path pathBelow(std::string folder, std::initializer_list<std::string_view> names);
+/// @}
 
 /// Makes the folder with its parents unless something is there.
 platform::Result<void> createDirectoryIfMissing(const Path& path);
@@ -37,6 +40,16 @@ void deleteFromPackage(const Path& path, const std::shared_ptr<QuiltDocument>& d
 
 /// A size in megabytes: the bytes in single precision, divided twice by 1024.
 platform::Result<double> megaBytesOfFile(const Path& path);
+
+/// While one lives, megaBytesOfFile looks at each file once on this thread. A record states the size of a file three
+/// times: with the derivative, in the source's total and in the item's; and each look asks the disk.
+class OneLookAtEachFile {
+ public:
+  OneLookAtEachFile();
+  OneLookAtEachFile(const OneLookAtEachFile&) = delete;
+  OneLookAtEachFile& operator=(const OneLookAtEachFile&) = delete;
+  ~OneLookAtEachFile();
+};
 
 /// A title as the base of a file name: "." becomes "_" and "/" becomes "-". Cut, between characters, to leave room for
 /// a counter and an extension in a file name's 255 bytes.

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "quilt/sources/QuiltMediaAudioSamples.h"
 
+#include <utility>
+
 #include "quilt/documents/QuiltDocument.h"
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/base/Paths.h"
@@ -40,12 +42,12 @@ std::shared_ptr<QuiltMediaAudioSamples> QuiltMediaAudioSamples::initWithURL(cons
 }
 
 std::shared_ptr<QuiltMediaAudioSamples> QuiltMediaAudioSamples::initWithDictionary(
-    const Dictionary& dictionary, const std::shared_ptr<QuiltMediaSource>& andMediaSource) {
+    Dictionary dictionary, const std::shared_ptr<QuiltMediaSource>& andMediaSource) {
   auto samples = init();
   samples->setSourceOwner(andMediaSource);
-  if (const Text uuid = dictionary.string("UUID")) {
+  if (Text uuid = dictionary.takeString("UUID")) {
     if (!isAcceptedName(*uuid, "samples file")) return nullptr;
-    samples->setUuid(uuid);
+    samples->setUuid(std::move(uuid));
   }
   // The key only marks that there were samples; where they lie follows from the identity.
   if (dictionary.string("SampleURL") && andMediaSource) {

@@ -21,7 +21,7 @@ class QUILT_EXPORT QuiltMediaAudioSamples : public platform::Object {
   static std::shared_ptr<QuiltMediaAudioSamples> initWithURL(const Url& url, const Text& uuid);
   /// Reads a record. Null, after a warning, when its identity is no plain file name.
   static std::shared_ptr<QuiltMediaAudioSamples> initWithDictionary(
-      const Dictionary& dictionary, const std::shared_ptr<QuiltMediaSource>& andMediaSource);
+      Dictionary dictionary, const std::shared_ptr<QuiltMediaSource>& andMediaSource);
 
   /// A second object with the same values and owner.
   std::shared_ptr<QuiltMediaAudioSamples> copy() const;

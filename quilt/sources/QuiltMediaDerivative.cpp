@@ -2,6 +2,7 @@
 #include "quilt/sources/QuiltMediaDerivative.h"
 
 #include <algorithm>
+#include <utility>
 
 #include "quilt/documents/QuiltDocument.h"
 #include "quilt/media/QuiltMedia.h"
@@ -79,12 +80,16 @@ double narrowed(double value) { return static_cast<double>(static_cast<float>(va
 
 }  // namespace
 
-QuiltMediaDerivative::QuiltMediaDerivative() { _uuid.store(platform::generateUUID()); }
+QuiltMediaDerivative::QuiltMediaDerivative(std::string uuid) { _uuid.initialize(std::move(uuid)); }
 
-std::shared_ptr<QuiltMediaDerivative> QuiltMediaDerivative::init() {
-  struct Made final : QuiltMediaDerivative {};
-  return std::make_shared<Made>();
+std::shared_ptr<QuiltMediaDerivative> QuiltMediaDerivative::make(std::string uuid) {
+  struct Made final : QuiltMediaDerivative {
+    explicit Made(std::string uuid) : QuiltMediaDerivative(std::move(uuid)) {}
+  };
+  return std::make_shared<Made>(std::move(uuid));
 }
+
+std::shared_ptr<QuiltMediaDerivative> QuiltMediaDerivative::init() { return make(platform::generateUUID()); }
 
 std::shared_ptr<QuiltMediaDerivative> QuiltMediaDerivative::initWithURL(const Url& url) {
   auto derivative = init();
@@ -129,46 +134,46 @@ bool QuiltMediaDerivative::classify(const Url& url) {
 }
 
 std::shared_ptr<QuiltMediaDerivative> QuiltMediaDerivative::initWithDictionary(
-    const Dictionary& dictionary, const std::shared_ptr<QuiltMediaSource>& andMediaSource) {
-  auto derivative = init();
-  derivative->setSourceOwner(andMediaSource);
-  if (const Text uuid = dictionary.string("UUID")) {
-    if (!isAcceptedName(*uuid, "source derivative")) return nullptr;
-    derivative->setUuid(*uuid);
-  }
+    Dictionary dictionary, const std::shared_ptr<QuiltMediaSource>& andMediaSource) {
+  Text uuid = dictionary.takeString("UUID");
+  if (uuid && !isAcceptedName(*uuid, "source derivative")) return nullptr;
+  auto derivative = uuid ? make(*std::move(uuid)) : init();
+  derivative->_sourceOwner.initialize(andMediaSource);
   if (const Text filename = dictionary.string("Filename")) {
     if (!isAcceptedName(*filename, "source derivative")) return nullptr;
     const Path folder = andMediaSource ? andMediaSource->derivativesFolderPath() : Path();
     if (!folder.empty()) {
       if (!isInsidePackage(folder / *filename, documentOf(andMediaSource), "source derivative")) return nullptr;
-      derivative->setUrl(Url::fileUrl(folder / *filename));
+      derivative->_url.initialize(Url::fileUrl(folder / *filename));
     }
   } else if (const Text url = dictionary.string("URL")) {
-    derivative->setUrl(Url::parse(*url));
+    derivative->_url.initialize(Url::parse(*url));
   }
-  if (Text type = dictionary.string("ContentType")) derivative->setContentType(std::move(type));
-  if (const Array* array = dictionary.array("CompatibilityTags")) {
+  if (Text type = dictionary.takeString("ContentType")) derivative->_contentType.initialize(std::move(type));
+  if (Array* array = dictionary.array("CompatibilityTags")) {
     std::vector<std::string> tags;
-    for (const auto& element : *array)
-      if (const auto* tag = element.as<std::string>()) tags.push_back(*tag);
-    derivative->setCompatibilityTags(std::move(tags));
+    for (auto& element : *array)
+      if (auto* tag = element.as<std::string>()) tags.push_back(std::move(*tag));
+    derivative->_compatibilityTags.initialize(std::move(tags));
   }
-  if (Text type = dictionary.string("MimeType")) derivative->setMimetype(std::move(type));
-  if (const auto width = dictionary.real("Width")) derivative->setWidth(narrowed(*width));
-  if (const auto height = dictionary.real("Height")) derivative->setHeight(narrowed(*height));
-  if (const auto duration = dictionary.real("Duration")) derivative->setDuration(narrowed(*duration));
-  if (const auto flattened = dictionary.boolean("IsFlattened")) derivative->setIsFlattened(*flattened);
+  if (Text type = dictionary.takeString("MimeType")) derivative->_mimetype.initialize(std::move(type));
+  if (const auto width = dictionary.real("Width")) derivative->_width.initialize(narrowed(*width));
+  if (const auto height = dictionary.real("Height")) derivative->_height.initialize(narrowed(*height));
+  if (const auto duration = dictionary.real("Duration")) derivative->_duration.initialize(narrowed(*duration));
+  if (const auto flattened = dictionary.boolean("IsFlattened")) derivative->_isFlattened.initialize(*flattened);
   derivative->_unknownEntries = platform::entriesBeyond(kDerivativeKeys, dictionary);
   return derivative;
 }
 
 Dictionary QuiltMediaDerivative::dictionary() const {
   Dictionary record;
+  record.reserve(std::size(kDerivativeKeys));
   record.append("UUID", uuid());
   const std::optional<Url> location = url();
   const bool isFile = location && location->isFileUrl();
+  const std::string file = isFile ? location->relativePathText() : std::string();
   if (isFile && isFlattened()) {
-    record.append("Filename", location->relativePath().filename().native());
+    record.append("Filename", file.substr(file.rfind('/') + 1));
   } else if (location) {
     record.append("URL", location->absoluteString());
   }
@@ -182,8 +187,7 @@ Dictionary QuiltMediaDerivative::dictionary() const {
   record.append("Duration", duration());
   if (isFile) {
     const auto document = documentOf(sourceOwner());
-    record.append("RelativePath",
-                  platform::pathRelativeTo(location->relativePath(), document ? document->path() : Path()).native());
+    record.append("RelativePath", platform::textRelativeTo(file, document ? document->folder() : std::string()));
   }
   platform::appendAll(record, _unknownEntries);
   return record;

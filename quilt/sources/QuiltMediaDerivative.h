@@ -28,7 +28,7 @@ class QUILT_EXPORT QuiltMediaDerivative : public platform::Object {
   /// @}
   /// Reads a record. Null, after a warning, when its names would lead out of the source's folder.
   static std::shared_ptr<QuiltMediaDerivative> initWithDictionary(
-      const Dictionary& dictionary, const std::shared_ptr<QuiltMediaSource>& andMediaSource);
+      Dictionary dictionary, const std::shared_ptr<QuiltMediaSource>& andMediaSource);
 
   /// @{
   /// Whether the file's type is one that any source, a classic document or a document-file source accepts. True for
@@ -95,9 +95,10 @@ class QUILT_EXPORT QuiltMediaDerivative : public platform::Object {
   Dictionary dictionary() const;
 
  protected:
-  QuiltMediaDerivative();
+  explicit QuiltMediaDerivative(std::string uuid);
 
  private:
+  static std::shared_ptr<QuiltMediaDerivative> make(std::string uuid);
   bool classify(const Url& url);
 
   platform::Property<std::string> _uuid{*this, "uuid"};

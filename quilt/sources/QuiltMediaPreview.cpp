@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "quilt/sources/QuiltMediaPreview.h"
 
+#include <utility>
+
 #include "quilt/documents/QuiltDocument.h"
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/base/Paths.h"
@@ -21,12 +23,16 @@ constexpr std::string_view kPreviewKeys[] = {"UUID",  "Title",  "Content",     "
 
 }  // namespace
 
-QuiltMediaPreview::QuiltMediaPreview() { _uuid.store(platform::generateUUID()); }
+QuiltMediaPreview::QuiltMediaPreview(std::string uuid) { _uuid.initialize(std::move(uuid)); }
 
-std::shared_ptr<QuiltMediaPreview> QuiltMediaPreview::init() {
-  struct Made final : QuiltMediaPreview {};
-  return std::make_shared<Made>();
+std::shared_ptr<QuiltMediaPreview> QuiltMediaPreview::make(std::string uuid) {
+  struct Made final : QuiltMediaPreview {
+    explicit Made(std::string uuid) : QuiltMediaPreview(std::move(uuid)) {}
+  };
+  return std::make_shared<Made>(std::move(uuid));
 }
+
+std::shared_ptr<QuiltMediaPreview> QuiltMediaPreview::init() { return make(platform::generateUUID()); }
 
 std::shared_ptr<QuiltMediaPreview> QuiltMediaPreview::initWithImageWrapper(
     const std::shared_ptr<ImageWrapper>& imageWrapper) {
@@ -38,26 +44,25 @@ std::shared_ptr<QuiltMediaPreview> QuiltMediaPreview::initWithImageWrapper(
 }
 
 std::shared_ptr<QuiltMediaPreview> QuiltMediaPreview::initWithDictionary(
-    const Dictionary& dictionary, const std::shared_ptr<QuiltMediaSource>& andMediaSource) {
-  auto preview = init();
-  preview->setSourceOwner(andMediaSource);
-  if (const Text uuid = dictionary.string("UUID")) {
-    if (!isAcceptedName(*uuid, "source preview")) return nullptr;
-    preview->setUuid(*uuid);
-  }
-  if (Text title = dictionary.string("Title")) preview->setTitle(std::move(title));
-  if (Text content = dictionary.string("Content")) preview->setContent(std::move(content));
-  if (const auto index = dictionary.integer("Index")) preview->setIndex(static_cast<std::size_t>(*index));
-  if (const auto timecode = dictionary.real("Timecode")) preview->setTimecode(*timecode);
-  if (const auto flattened = dictionary.boolean("IsFlattened")) preview->setIsFlattened(*flattened);
+    Dictionary dictionary, const std::shared_ptr<QuiltMediaSource>& andMediaSource) {
+  Text uuid = dictionary.takeString("UUID");
+  if (uuid && !isAcceptedName(*uuid, "source preview")) return nullptr;
+  auto preview = uuid ? make(*std::move(uuid)) : init();
+  preview->_sourceOwner.initialize(andMediaSource);
+  if (Text title = dictionary.takeString("Title")) preview->_title.initialize(std::move(title));
+  if (Text content = dictionary.takeString("Content")) preview->_content.initialize(std::move(content));
+  if (const auto index = dictionary.integer("Index")) preview->_index.initialize(static_cast<std::size_t>(*index));
+  if (const auto timecode = dictionary.real("Timecode")) preview->_timecode.initialize(*timecode);
+  if (const auto flattened = dictionary.boolean("IsFlattened")) preview->_isFlattened.initialize(*flattened);
   preview->_unknownEntries = platform::entriesBeyond(kPreviewKeys, dictionary);
   return preview;
 }
 
 Dictionary QuiltMediaPreview::dictionary() const {
-  const Path file = path();
-  const auto document = documentOf(sourceOwner());
+  const auto source = sourceOwner();
+  const std::string file = pathIn(source);
   Dictionary record;
+  record.reserve(std::size(kPreviewKeys));
   record.append("UUID", uuid());
   if (const Text text = title()) record.append("Title", *text);
   if (const Text text = content()) record.append("Content", *text);
@@ -68,8 +73,8 @@ Dictionary QuiltMediaPreview::dictionary() const {
   if (const auto pixels = height()) record.append("Height", *pixels);
   record.append("IsFlattened", isFlattened());
   if (!file.empty()) {
-    record.append("Filename", file.filename().native());
-    record.append("RelativePath", platform::pathRelativeTo(file, document->path()).native());
+    record.append("Filename", file.substr(file.rfind('/') + 1));
+    record.append("RelativePath", platform::textRelativeTo(file, documentOf(source)->folder()));
   }
   platform::appendAll(record, _unknownEntries);
   return record;
@@ -99,13 +104,13 @@ std::shared_ptr<ImageWrapper> QuiltMediaPreview::image() {
   return loaded;
 }
 
-Path QuiltMediaPreview::path() const {
-  const auto source = sourceOwner();
+Path QuiltMediaPreview::path() const { return pathIn(sourceOwner()); }
+
+std::string QuiltMediaPreview::pathIn(const std::shared_ptr<QuiltMediaSource>& source) const {
   if (!source) return {};
   const std::size_t position = index();
-  return pathBelow(
-      source->path().native(),
-      {"previews", platform::withExtension(position == kNoIndex ? uuid() : std::to_string(position), "jpg")});
+  return below(source->folder(),
+               {"previews", platform::withExtension(position == kNoIndex ? uuid() : std::to_string(position), "jpg")});
 }
 
 bool QuiltMediaPreview::hasPicture() const {
@@ -135,8 +140,9 @@ bool QuiltMediaPreview::flatten() {
 }
 
 double QuiltMediaPreview::totalSizeInMegaBytes() const {
+  if (!isFlattened()) return 0;
   const Path file = path();
-  if (!isFlattened() || file.empty()) return 0;
+  if (file.empty()) return 0;
   const auto size = megaBytesOfFile(file);
   if (size) return *size;
   FDYLogger::logWarning("Source preview at path \"%@\" cannot be sized: \"%@\"", file, size.error());

@@ -18,7 +18,7 @@ class QUILT_EXPORT QuiltMediaPreview : public platform::Object {
   /// A preview of the image fitted into high definition. Null for an absent image.
   static std::shared_ptr<QuiltMediaPreview> initWithImageWrapper(const std::shared_ptr<ImageWrapper>& imageWrapper);
   /// Reads a record. Null, after a warning, when its identity is no plain file name.
-  static std::shared_ptr<QuiltMediaPreview> initWithDictionary(const Dictionary& dictionary,
+  static std::shared_ptr<QuiltMediaPreview> initWithDictionary(Dictionary dictionary,
                                                                const std::shared_ptr<QuiltMediaSource>& andMediaSource);
 
   /// Names the file of a preview without an index, so it is a plain file name.
@@ -68,9 +68,11 @@ class QUILT_EXPORT QuiltMediaPreview : public platform::Object {
   Dictionary dictionary() const;
 
  protected:
-  QuiltMediaPreview();
+  explicit QuiltMediaPreview(std::string uuid);
 
  private:
+  static std::shared_ptr<QuiltMediaPreview> make(std::string uuid);
+  std::string pathIn(const std::shared_ptr<QuiltMediaSource>& source) const;
   void adopt(const std::shared_ptr<ImageWrapper>& image);
 
   platform::Property<std::string> _uuid{*this, "uuid"};

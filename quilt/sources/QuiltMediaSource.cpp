@@ -2,6 +2,7 @@
 #include "quilt/sources/QuiltMediaSource.h"
 
 #include <algorithm>
+#include <utility>
 
 #include "quilt/documents/QuiltDocument.h"
 #include "quilt/media/QuiltMedia.h"
@@ -50,7 +51,7 @@ Array recordsOf(const List& list) {
 
 }  // namespace
 
-QuiltMediaSource::QuiltMediaSource() { _uuid.store(platform::generateUUID()); }
+QuiltMediaSource::QuiltMediaSource() { _uuid.initialize(platform::generateUUID()); }
 
 std::shared_ptr<QuiltMediaSource> QuiltMediaSource::init() {
   struct Made final : QuiltMediaSource {};
@@ -66,10 +67,10 @@ std::shared_ptr<QuiltMediaSource> QuiltMediaSource::initWithPath(const Path& pat
   return initWithURL(Url::fileUrl(path));
 }
 
-std::shared_ptr<QuiltMediaSource> QuiltMediaSource::initWithDictionary(const Dictionary& dictionary,
+std::shared_ptr<QuiltMediaSource> QuiltMediaSource::initWithDictionary(Dictionary dictionary,
                                                                        const std::shared_ptr<QuiltMedia>& andMedia) {
   auto source = init();
-  return source->initializeWithDictionary(dictionary, andMedia) ? source : nullptr;
+  return source->initializeWithDictionary(std::move(dictionary), andMedia) ? source : nullptr;
 }
 
 bool QuiltMediaSource::initializeWithURL(const Url& url) {
@@ -82,27 +83,27 @@ bool QuiltMediaSource::initializeWithURL(const Url& url) {
   return true;
 }
 
-bool QuiltMediaSource::initializeWithDictionary(const Dictionary& dictionary,
-                                                const std::shared_ptr<QuiltMedia>& andMedia) {
-  setMediaOwner(andMedia);
-  if (const Text uuid = dictionary.string("UUID")) {
+bool QuiltMediaSource::initializeWithDictionary(Dictionary dictionary, const std::shared_ptr<QuiltMedia>& andMedia) {
+  _mediaOwner.initialize(andMedia);
+  if (Text uuid = dictionary.takeString("UUID")) {
     if (!isAcceptedName(*uuid, "media source")) return false;
-    setUuid(*uuid);
+    _uuid.initialize(*std::move(uuid));
   }
   const auto self = shared(this);
-  if (const Array* records = dictionary.array("Derivatives")) {
-    for (const auto& record : *records)
-      if (const auto* entry = record.as<Dictionary>())
-        addDerivative(QuiltMediaDerivative::initWithDictionary(*entry, self));
+  if (Array* records = dictionary.array("Derivatives")) {
+    for (auto& record : *records)
+      if (auto* entry = record.as<Dictionary>())
+        addDerivative(QuiltMediaDerivative::initWithDictionary(std::move(*entry), self));
   }
-  if (const Array* records = dictionary.array("Previews")) {
-    for (const auto& record : *records)
-      if (const auto* entry = record.as<Dictionary>()) addPreview(QuiltMediaPreview::initWithDictionary(*entry, self));
+  if (Array* records = dictionary.array("Previews")) {
+    for (auto& record : *records)
+      if (auto* entry = record.as<Dictionary>())
+        addPreview(QuiltMediaPreview::initWithDictionary(std::move(*entry), self));
   }
-  if (const Dictionary* record = dictionary.dictionary("AudioSamples"))
-    addAudioSamples(QuiltMediaAudioSamples::initWithDictionary(*record, self));
-  if (Text title = dictionary.string("Title")) setTitle(std::move(title));
-  if (Text description = dictionary.string("Description")) setDescription(std::move(description));
+  if (Dictionary* record = dictionary.dictionary("AudioSamples"))
+    addAudioSamples(QuiltMediaAudioSamples::initWithDictionary(std::move(*record), self));
+  if (Text title = dictionary.takeString("Title")) setTitle(std::move(title));
+  if (Text description = dictionary.takeString("Description")) setDescription(std::move(description));
   if (const auto timecode = dictionary.real("Timecode")) setTimecode(*timecode);
   _unknownEntries = platform::entriesBeyond(kSourceKeys, dictionary);
   // Last: a dirty source drops what was just read but its main derivative.
@@ -112,6 +113,7 @@ bool QuiltMediaSource::initializeWithDictionary(const Dictionary& dictionary,
 
 Dictionary QuiltMediaSource::dictionary() const {
   Dictionary record;
+  record.reserve(std::size(kSourceKeys));
   record.append("UUID", uuid());
   if (const Text category = contentCategory()) record.append("ContentCategory", *category);
   if (Array records = recordsOf<QuiltMediaDerivative>(_derivatives); !records.empty())
@@ -143,14 +145,14 @@ void QuiltMediaSource::updateDocumentUnlessProcessing() const { requestSave(docu
 
 // ---- Places in the package
 
-Path QuiltMediaSource::path() const {
+std::string QuiltMediaSource::folder() const {
   const auto media = mediaOwner();
-  return media ? pathBelow(folderOf(*media), {"sources", uuid()}) : Path();
+  return media ? below(folderOf(*media), {"sources", uuid()}) : std::string();
 }
 
-Path QuiltMediaSource::derivativesFolderPath() const { return pathBelow(path().native(), {"derivatives"}); }
-Path QuiltMediaSource::previewsFolderPath() const { return pathBelow(path().native(), {"previews"}); }
-Path QuiltMediaSource::audioSamplesFolderPath() const { return pathBelow(path().native(), {"audiosamples"}); }
+Path QuiltMediaSource::derivativesFolderPath() const { return pathBelow(folder(), {"derivatives"}); }
+Path QuiltMediaSource::previewsFolderPath() const { return pathBelow(folder(), {"previews"}); }
+Path QuiltMediaSource::audioSamplesFolderPath() const { return pathBelow(folder(), {"audiosamples"}); }
 
 // ---- Derived values
 

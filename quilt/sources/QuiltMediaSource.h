@@ -40,7 +40,7 @@ class QUILT_EXPORT QuiltMediaSource : public platform::Object {
   static std::shared_ptr<QuiltMediaSource> initWithPath(const Path& path);
   /// @}
   /// Reads a record. Null, after a warning, when its identity is no plain folder name.
-  static std::shared_ptr<QuiltMediaSource> initWithDictionary(const Dictionary& dictionary,
+  static std::shared_ptr<QuiltMediaSource> initWithDictionary(Dictionary dictionary,
                                                               const std::shared_ptr<QuiltMedia>& andMedia);
 
   // Properties
@@ -89,8 +89,10 @@ class QUILT_EXPORT QuiltMediaSource : public platform::Object {
 
   // Places in the package; empty while the source is not in a document
   /// @{
-  /// The source's folder in the package, and the folders in it. Empty while the source is not in a document.
-  virtual Path path() const;
+  /// The source's folder in the package, also as text, which is cheaper; and the folders in it. Empty while the source
+  /// is not in a document.
+  Path path() const { return folder(); }
+  virtual std::string folder() const;
   Path derivativesFolderPath() const;
   Path previewsFolderPath() const;
   Path audioSamplesFolderPath() const;
@@ -197,7 +199,7 @@ class QUILT_EXPORT QuiltMediaSource : public platform::Object {
  protected:
   QuiltMediaSource();
   /// Fills a fresh object from a record; false, after a warning, when the record is refused.
-  bool initializeWithDictionary(const Dictionary& dictionary, const std::shared_ptr<QuiltMedia>& andMedia);
+  bool initializeWithDictionary(Dictionary dictionary, const std::shared_ptr<QuiltMedia>& andMedia);
   bool initializeWithURL(const Url& url);
 
  private:

@@ -3,6 +3,9 @@
 
 #include <gmock/gmock.h>
 
+#include <algorithm>
+
+#include "quilt/platform/testing/ForwardingFileManager.h"
 #include "tests/support/PackageFixture.h"
 
 namespace quilt {
@@ -270,6 +273,41 @@ TEST_F(QuiltMediaTest, UnknownKeysAreWrittenBackAfterOurs) {
   const Dictionary record = read({{"Later", Array{1, "two"}}, {"Title", "T"}, {"Sooner", true}})->dictionary();
   EXPECT_EQ(*(record.end() - 2), Dictionary::Entry("Later", Array{1, "two"}));
   EXPECT_EQ(*(record.end() - 1), Dictionary::Entry("Sooner", true));
+}
+
+TEST_F(QuiltMediaTest, TheRecordLooksAtEachFileOnceAndSaysSoEachTimeWhenItIsGone) {
+  class CountingFiles final : public platform::ForwardingFileManager {
+   public:
+    CountingFiles() : ForwardingFileManager(platform::services().files) {}
+    [[nodiscard]] platform::Result<platform::FileAttributes> attributesOfItemAtPath(const Path& path) const override {
+      looks.push_back(path.filename().native());
+      return ForwardingFileManager::attributesOfItemAtPath(path);
+    }
+    mutable std::vector<std::string> looks;
+  };
+  const auto files = std::make_shared<CountingFiles>();
+  const platform::ScopedService scope(&platform::Services::files, files);
+  const auto source = addEmptySource();
+  for (const char* name : {"here.mp4", "gone.mp4"}) {
+    const auto derivative = derivativeTagged({"Desktop"});
+    derivative->setUrl(Url::fileUrl(folder() / name));
+    source->addDerivative(derivative);
+  }
+  writeFile(folder() / "here.mp4", std::string(1 << 20, 'x'));
+  takeLines();
+
+  const Dictionary record = item()->dictionary();
+  EXPECT_THAT(files->looks, ElementsAre("here.mp4", "gone.mp4"));
+  EXPECT_EQ(record.real("TotalSizeInMegaBytes"), 1.0);
+  const Lines lines = takeProblems();
+  const auto ofGone = [](const support::Line& line) {
+    return line.text.find("gone.mp4\" cannot be sized") != std::string::npos;
+  };
+  EXPECT_EQ(std::count_if(lines.begin(), lines.end(), ofGone), 3);  // derivative, source, item
+
+  writeFile(folder() / "here.mp4", std::string(2 << 20, 'x'));
+  EXPECT_EQ(item()->dictionary().real("TotalSizeInMegaBytes"), 2.0);
+  EXPECT_EQ(files->looks.size(), 4U);
 }
 
 TEST_F(QuiltMediaTest, ARecordSurvivesTheRoundTrip) {

@@ -3,8 +3,11 @@
 
 #include <set>
 
+#include "quilt/platform/plist/PlainXmlReader.h"
 #include "quilt/platform/plist/XmlPropertyLists.h"
+#include "quilt/platform/plist/XmlReader.h"
 #include "quilt/platform/plist/XmlText.h"
+#include "quilt/platform/plist/XmlWriter.h"
 
 namespace quilt::support {
 
@@ -51,6 +54,16 @@ class Judge {
   }
 };
 
+/// What is read plainly must be what the full parser reads; a comment has that one read it.
+std::string disagreementOfReaders(std::string_view bytes) {
+  const auto plain = readPlainXml(bytes);
+  if (!plain) return {};
+  std::string commented = std::string(bytes) + "<!-- -->";
+  const auto full = readXml(commented);
+  if (!full) return "What is read plainly the parser refuses: " + full.error().text;
+  return writeXml(*plain) == writeXml(*full) ? "" : "Read plainly it is another value.";
+}
+
 }  // namespace
 
 std::string problemWith(const PropertyList& value) {
@@ -63,6 +76,7 @@ std::string problemWith(const PropertyList& value) {
 }
 
 std::string problemWhenReading(std::string_view bytes) {
+  if (std::string problem = disagreementOfReaders(bytes); !problem.empty()) return problem;
   const auto value = XmlPropertyLists().parse(bytes);
   if (value) return problemWith(*value);
   if (value.error().text.empty() || !isXmlText(value.error().text)) return "The error says nothing.";

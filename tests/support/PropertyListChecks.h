@@ -14,8 +14,8 @@ namespace quilt::support {
 /// writing it anew gives the same bytes.
 std::string problemWith(const platform::PropertyList& value);
 
-/// Reads the bytes, whichever they are, and judges what comes of it: a right value, or an error that says something.
-/// Empty when it is one of both.
+/// Reads the bytes, whichever they are, and judges what comes of it: a right value, the same of both readers of XML, or
+/// an error that says something. Empty when it is one of both.
 std::string problemWhenReading(std::string_view bytes);
 
 }  // namespace quilt::support

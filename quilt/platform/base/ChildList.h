@@ -2,6 +2,7 @@
 #pragma once
 
 #include <algorithm>
+#include <functional>
 #include <memory>
 #include <string>
 #include <string_view>
@@ -81,15 +82,14 @@ class ChildList {
   void insert(const Pointer& child, std::size_t index) {
     if (!child) return;
     const MonitorLock guard = lock();
-    if (isBeyond(index, _children.size())) return;
-    attach(*child);
-    change([&] { _children.insert(at(_children, index), child); });
+    if (!isBeyond(index, _children.size())) place(child, index);
   }
 
   /// insert() at the end.
   void append(const Pointer& child) {
+    if (!child) return;
     const MonitorLock guard = lock();
-    insert(child, _children.size());
+    place(child, _children.size());
   }
 
   /// Detaches the child and removes every occurrence of it. Announces also when the list does not hold it.
@@ -128,8 +128,9 @@ class ChildList {
     return list.begin() + static_cast<std::ptrdiff_t>(index);
   }
 
-  void attach(Child& child) {
-    if (_setOwner) (child.*_setOwner)(std::static_pointer_cast<Owner>(_owner.shared_from_this()));
+  void place(const Pointer& child, std::size_t index) {
+    if (_setOwner) ((*child).*_setOwner)(std::static_pointer_cast<Owner>(_owner.shared_from_this()));
+    change([&] { _children.insert(at(_children, index), child); });
   }
 
   [[nodiscard]] bool isBeyond(std::size_t index, std::size_t bound) const {
@@ -140,7 +141,7 @@ class ChildList {
 
   template <class Mutation>
   void change(const Mutation& mutation) {
-    _owner.changeOnMainThread(_key, mutation);
+    _owner.changeOnMainThread(_key, std::cref(mutation));  // a copy would be on the heap
   }
 
   Owner& _owner;

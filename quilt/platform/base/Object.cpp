@@ -90,7 +90,10 @@ Observation Object::observe(std::string_view key, ChangeObserver observer, Obser
   std::shared_ptr<Observation::Registry> registry;
   {
     const std::lock_guard guard(_mutex);
-    if (!_registry) _registry = std::make_shared<Observation::Registry>();
+    if (!_registry) {
+      _registry = std::make_shared<Observation::Registry>();
+      _observers = _registry.get();
+    }
     registry = _registry;
   }
   const std::lock_guard guard(registry->mutex);
@@ -99,15 +102,11 @@ Observation Object::observe(std::string_view key, ChangeObserver observer, Obser
 }
 
 bool Object::isObserved(std::string_view key) const {
-  std::shared_ptr<Observation::Registry> registry;
-  {
-    const std::lock_guard guard(_mutex);
-    registry = _registry;
-  }
-  if (!registry) return false;
+  if (!hasObservers()) return false;
   const std::vector<std::string_view> dependents = keysDependingOn(key);
-  const std::lock_guard guard(registry->mutex);
-  return std::any_of(registry->entries.begin(), registry->entries.end(), [&](const auto& entry) {
+  Observation::Registry& registry = *_observers;
+  const std::lock_guard guard(registry.mutex);
+  return std::any_of(registry.entries.begin(), registry.entries.end(), [&](const auto& entry) {
     return entry->key == key || std::find(dependents.begin(), dependents.end(), entry->key) != dependents.end();
   });
 }
@@ -129,17 +128,12 @@ void Object::performBlockOnMainThread(const std::function<void()>& block) { Main
 std::vector<std::string_view> Object::keysDependingOn(std::string_view) const { return {}; }
 
 void Object::announce(std::string_view key, ChangePhase phase) {
-  std::shared_ptr<Observation::Registry> registry;
-  {
-    const std::lock_guard guard(_mutex);
-    registry = _registry;
-  }
-  if (!registry) return;
-  notify(*registry, key, phase);
-  for (const std::string_view dependent : keysDependingOn(key)) notify(*registry, dependent, phase);
+  notify(key, phase);
+  for (const std::string_view dependent : keysDependingOn(key)) notify(dependent, phase);
 }
 
-void Object::notify(Observation::Registry& registry, std::string_view key, ChangePhase phase) {
+void Object::notify(std::string_view key, ChangePhase phase) {
+  Observation::Registry& registry = *_observers;
   std::vector<std::shared_ptr<Observation::Entry>> listeners;
   {
     const std::lock_guard guard(registry.mutex);

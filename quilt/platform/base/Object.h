@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <atomic>
 #include <functional>
 #include <memory>
 #include <mutex>
@@ -30,8 +31,12 @@ class QUILT_EXPORT Object : public std::enable_shared_from_this<Object> {
 
   /// @{
   /// Announces a change of `key`, and of every key that depends on it, to their observers.
-  void willChangeValueForKey(std::string_view key) { announce(key, ChangePhase::Will); }
-  void didChangeValueForKey(std::string_view key) { announce(key, ChangePhase::Did); }
+  void willChangeValueForKey(std::string_view key) {
+    if (hasObservers()) announce(key, ChangePhase::Will);
+  }
+  void didChangeValueForKey(std::string_view key) {
+    if (hasObservers()) announce(key, ChangePhase::Did);
+  }
   /// @}
 
   /// Whether anyone observes the key or a key that depends on it.
@@ -58,11 +63,14 @@ class QUILT_EXPORT Object : public std::enable_shared_from_this<Object> {
   template <class T>
   friend class Property;
 
+  /// Most objects never have any, and each change asks: so this is a look, without the mutex.
+  [[nodiscard]] bool hasObservers() const { return _observers != nullptr; }
   void announce(std::string_view key, ChangePhase phase);
-  void notify(Observation::Registry& registry, std::string_view key, ChangePhase phase);
+  void notify(std::string_view key, ChangePhase phase);
 
-  mutable std::mutex _mutex;  // guards the values of all properties and the registry pointer
-  std::shared_ptr<Observation::Registry> _registry;
+  mutable std::mutex _mutex;                         // guards the values of all properties
+  std::shared_ptr<Observation::Registry> _registry;  // made, under the mutex, by the first observer, and then kept
+  std::atomic<Observation::Registry*> _observers = nullptr;  // the registry, once it is there
 };
 
 }  // namespace quilt::platform

@@ -17,6 +17,9 @@ QUILT_EXPORT bool isPlainComponent(std::string_view name);
 /// outside climbs with "..". An empty `base` or `path` gives `path` unchanged.
 QUILT_EXPORT std::filesystem::path pathRelativeTo(const std::filesystem::path& path, const std::filesystem::path& base);
 
+/// pathRelativeTo() as text, for paths that are at hand as text: a path keeps each component as a text of its own.
+QUILT_EXPORT std::string textRelativeTo(const std::string& path, const std::string& base);
+
 /// Expands a leading "~" (the user's home folder), removes "." and ".." components and doubled or trailing separators,
 /// all by the text alone.
 QUILT_EXPORT std::filesystem::path standardizedPath(const std::filesystem::path& path);

@@ -11,9 +11,9 @@ std::optional<T> copyOf(const PropertyList* value) {
   return typed ? std::optional<T>(*typed) : std::nullopt;
 }
 
-template <class T>
-const T* pointerTo(const PropertyList* value) {
-  return value ? value->as<T>() : nullptr;
+template <class T, class Value>
+auto* pointerTo(Value* value) {
+  return value ? value->template as<T>() : nullptr;
 }
 
 }  // namespace
@@ -37,9 +37,11 @@ void Dictionary::set(std::string key, PropertyList value) {
   append(std::move(key), std::move(value));
 }
 
-void Dictionary::append(std::string key, PropertyList value) {
-  _entries.emplace_back(std::move(key), std::move(value));
+PropertyList& Dictionary::append(std::string key, PropertyList value) {
+  return _entries.emplace_back(std::move(key), std::move(value)).second;
 }
+
+PropertyList& Dictionary::append(std::string key) { return _entries.emplace_back(std::move(key), false).second; }
 
 void Dictionary::reserve(std::size_t count) { _entries.reserve(count); }
 
@@ -53,11 +55,22 @@ const PropertyList* Dictionary::find(std::string_view key) const {
   return nullptr;
 }
 
+PropertyList* Dictionary::find(std::string_view key) {
+  return const_cast<PropertyList*>(std::as_const(*this).find(key));  // of an object that is not const
+}
+
 std::optional<std::string> Dictionary::string(std::string_view key) const { return copyOf<std::string>(find(key)); }
 std::optional<bool> Dictionary::boolean(std::string_view key) const { return copyOf<bool>(find(key)); }
 std::optional<Date> Dictionary::date(std::string_view key) const { return copyOf<Date>(find(key)); }
 const Array* Dictionary::array(std::string_view key) const { return pointerTo<Array>(find(key)); }
 const Dictionary* Dictionary::dictionary(std::string_view key) const { return pointerTo<Dictionary>(find(key)); }
+Array* Dictionary::array(std::string_view key) { return pointerTo<Array>(find(key)); }
+Dictionary* Dictionary::dictionary(std::string_view key) { return pointerTo<Dictionary>(find(key)); }
+
+std::optional<std::string> Dictionary::takeString(std::string_view key) {
+  auto* text = pointerTo<std::string>(find(key));
+  return text ? std::optional(std::exchange(*text, {})) : std::nullopt;
+}
 
 std::optional<std::int64_t> Dictionary::integer(std::string_view key) const {
   const PropertyList* value = find(key);

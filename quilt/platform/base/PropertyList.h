@@ -1,7 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <algorithm>
 #include <cstdint>
+#include <iterator>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -46,15 +48,20 @@ class QUILT_EXPORT Dictionary {
 
   /// Replaces the value of a key in its place, or appends the key.
   void set(std::string key, PropertyList value);
-  /// Appends without looking for the key; the caller knows that it is not there.
-  void append(std::string key, PropertyList value);
+  /// Appends without looking for the key; the caller knows that it is not there. The value in its place, valid until
+  /// the dictionary changes.
+  PropertyList& append(std::string key, PropertyList value);
+  PropertyList& append(std::string key);  ///< likewise, with false, for the value to be filled in its place
   /// Makes room for this many keys in all.
   void reserve(std::size_t count);
   /// Removes the key with its value, if it is there.
   void remove(std::string_view key);
 
+  /// @{
   /// The value of a key, or null. Valid until the dictionary changes.
   [[nodiscard]] const PropertyList* find(std::string_view key) const;
+  [[nodiscard]] PropertyList* find(std::string_view key);
+  /// @}
   /// Whether the key is there, with a value of any kind.
   [[nodiscard]] bool contains(std::string_view key) const { return find(key) != nullptr; }
 
@@ -67,8 +74,12 @@ class QUILT_EXPORT Dictionary {
   [[nodiscard]] std::optional<bool> boolean(std::string_view key) const;
   [[nodiscard]] std::optional<Date> date(std::string_view key) const;
   [[nodiscard]] const Array* array(std::string_view key) const;
+  [[nodiscard]] Array* array(std::string_view key);
   [[nodiscard]] const Dictionary* dictionary(std::string_view key) const;
+  [[nodiscard]] Dictionary* dictionary(std::string_view key);
   /// @}
+  /// string(), moved out: the value that stays is empty.
+  [[nodiscard]] std::optional<std::string> takeString(std::string_view key);
 
   /// @{
   /// How many keys there are.
@@ -121,6 +132,12 @@ class QUILT_EXPORT PropertyList {
   }
   /// @}
 
+  /// Makes it an empty value of a kind, to be filled where it is.
+  template <class T>
+  T& become() {
+    return _value.emplace<T>();
+  }
+
   /// The value, to be visited.
   [[nodiscard]] const Value& value() const { return _value; }
 
@@ -137,9 +154,7 @@ template <class Keys>
 Dictionary entriesBeyond(const Keys& known, const Dictionary& record) {
   Dictionary rest;
   for (const auto& [key, value] : record) {
-    bool isKnown = false;
-    for (const auto& name : known) isKnown = isKnown || key == name;
-    if (!isKnown) rest.append(key, value);
+    if (std::find(std::begin(known), std::end(known), key) == std::end(known)) rest.append(key, value);
   }
   return rest;
 }

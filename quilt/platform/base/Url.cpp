@@ -41,6 +41,7 @@ std::string percentEncoded(std::string_view text) {
 }
 
 std::string percentDecoded(std::string_view text) {
+  if (text.find('%') == std::string_view::npos) return std::string(text);
   std::string out;
   out.reserve(text.size());
   for (std::size_t i = 0; i < text.size(); ++i) {
@@ -80,7 +81,7 @@ std::string_view pathPart(std::string_view text) {
     text.remove_prefix(2);
     text.remove_prefix(std::min(text.find_first_of("/?#"), text.size()));
   }
-  return text.substr(0, text.find_first_of("?#"));
+  return text.substr(0, std::min(text.find('?'), text.find('#')));
 }
 
 }  // namespace
@@ -101,11 +102,14 @@ std::optional<Url> Url::parse(std::string_view text) {
     const std::string_view authority = afterScheme.substr(2, afterScheme.find('/', 2) - 2);
     if (!authority.empty() && lowercase(authority) != "localhost") return std::nullopt;
   }
-  const std::string path = percentDecoded(pathPart(text));
-  if (path.empty() || path.front() != '/' || path.find('\0') != std::string::npos) return std::nullopt;
+  const std::string_view path = pathPart(text);
+  const bool isAbsolute = percentDecoded(path.substr(0, 3)).starts_with('/');
+  if (!isAbsolute || path.find("%00") != std::string_view::npos) return std::nullopt;
   return Url(std::string(text), true);
 }
 
-std::filesystem::path Url::relativePath() const { return percentDecoded(pathPart(_text)); }
+std::filesystem::path Url::relativePath() const { return relativePathText(); }
+
+std::string Url::relativePathText() const { return percentDecoded(pathPart(_text)); }
 
 }  // namespace quilt::platform

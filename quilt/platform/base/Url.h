@@ -28,6 +28,8 @@ class QUILT_EXPORT Url {
 
   /// The path part, percent-decoded: for a file URL the file's path.
   [[nodiscard]] std::filesystem::path relativePath() const;
+  /// The same as text, which costs a tenth.
+  [[nodiscard]] std::string relativePathText() const;
 
   /// Equal when their texts are.
   bool operator==(const Url&) const = default;

@@ -1,17 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "quilt/platform/plist/XmlReader.h"
 
-#include <locale.h>
-#include <stdlib.h>
-
 #include <algorithm>
-#include <charconv>
 #include <pugixml.hpp>
 #include <unordered_map>
 #include <utility>
 
-#include "quilt/platform/plist/Base64.h"
 #include "quilt/platform/plist/Limits.h"
+#include "quilt/platform/plist/PlainXmlReader.h"
+#include "quilt/platform/plist/XmlScalars.h"
 #include "quilt/platform/plist/XmlText.h"
 
 namespace quilt::platform {
@@ -60,54 +57,7 @@ bool holdsTooManyTags(std::string_view buffer) {
   return std::cmp_greater(tags, kMostTags);
 }
 
-std::string_view trimmed(std::string_view text) {
-  constexpr std::string_view space = " \t\r\n";
-  const std::size_t first = text.find_first_not_of(space);
-  return first == std::string_view::npos ? std::string_view()
-                                         : text.substr(first, text.find_last_not_of(space) - first + 1);
-}
-
 bool isBlank(std::string_view text) { return trimmed(text).empty(); }
-
-std::string_view withoutPlus(std::string_view text) {
-  const bool isMarked = text.size() > 1 && text[0] == '+' && text[1] != '-' && text[1] != '+';
-  return isMarked ? text.substr(1) : text;
-}
-
-/// Reads the whole text as a number; invalid_argument when it is none.
-template <class Number, class... Base>
-std::errc numberFrom(std::string_view text, Number& number, Base... base) {
-  const auto [stop, problem] = std::from_chars(text.data(), text.data() + text.size(), number, base...);
-  return stop == text.data() + text.size() && !text.empty() ? problem : std::errc::invalid_argument;
-}
-
-std::optional<double> realFrom(std::string_view text) {
-  text = withoutPlus(trimmed(text));
-  double number = 0;
-  const std::errc problem = numberFrom(text, number);
-  if (problem == std::errc()) return number;
-  if (problem != std::errc::result_out_of_range) return std::nullopt;
-  // Beyond the range of reals: strtod tells whether that is infinity or nothing, here in no one's language.
-  static const locale_t plain = newlocale(LC_ALL_MASK, "C", nullptr);
-  return strtod_l(std::string(text).c_str(), nullptr, plain);
-}
-
-std::optional<PropertyList> integerFrom(std::string_view text) {
-  text = withoutPlus(trimmed(text));
-  if (text.starts_with("0x") || text.starts_with("0X")) {
-    std::uint64_t number = 0;
-    if (numberFrom(text.substr(2), number, 16) != std::errc()) return std::nullopt;
-    return std::in_range<std::int64_t>(number) ? PropertyList(static_cast<std::int64_t>(number))
-                                               : PropertyList(static_cast<double>(number));
-  }
-  std::int64_t number = 0;
-  const std::errc problem = numberFrom(text, number);
-  if (problem == std::errc()) return PropertyList(number);
-  if (problem != std::errc::result_out_of_range) return std::nullopt;
-  // The nearest real is closer to it than any integer that fits.
-  const auto real = realFrom(text);
-  return real ? std::optional<PropertyList>(*real) : std::nullopt;
-}
 
 /// Makes values of elements. After the first failure only error() is of use.
 class Builder {
@@ -131,18 +81,8 @@ class Builder {
       value = PropertyList(name == "true");
       return true;
     }
-    std::optional<PropertyList> scalar;
-    if (name == "integer") {
-      scalar = integerFrom(_text);
-    } else if (name == "real") {
-      if (const auto real = realFrom(_text)) scalar = PropertyList(*real);
-    } else if (name == "date") {
-      if (const auto date = parseIso8601(trimmed(_text))) scalar = PropertyList(*date);
-    } else if (name == "data") {
-      if (auto data = decodeBase64(_text)) scalar = PropertyList(*std::move(data));
-    } else {
-      return fail(element, "is no kind of value");
-    }
+    if (!isScalarElement(name)) return fail(element, "is no kind of value");
+    std::optional<PropertyList> scalar = scalarFrom(name, _text);
     if (!scalar) return fail(element, "cannot be read");
     value = *std::move(scalar);
     return true;
@@ -258,6 +198,7 @@ void dropRepeatedKeys(Dictionary& dictionary) {
 
 Result<PropertyList> readXml(std::string& buffer) {
   if (holdsTooManyTags(buffer)) return damaged("The property list holds too many values", 0);
+  if (std::optional<PropertyList> value = readPlainXml(buffer)) return *std::move(value);
   const unsigned space = mayHoldSplitTexts(buffer) ? pugi::parse_ws_pcdata : pugi::parse_ws_pcdata_single;
   Builder builder(mayHoldForeignBytes(buffer));
   pugi::xml_document document;

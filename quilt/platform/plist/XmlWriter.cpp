@@ -5,12 +5,17 @@
 #include <charconv>
 #include <cmath>
 
+#include "quilt/platform/base/ByteTable.h"
 #include "quilt/platform/plist/Base64.h"
 #include "quilt/platform/plist/XmlText.h"
 
 namespace quilt::platform {
 
 namespace {
+
+/// The characters that stand for themselves, of those that are one byte.
+constexpr auto kNeedsNoEntity = tableOf(
+    [](std::size_t c) { return (c >= ' ' && c < 0x80 && c != '<' && c != '>' && c != '&') || c == '\t' || c == '\n'; });
 
 class Writer {
  public:
@@ -86,33 +91,30 @@ class Writer {
   }
 
   void escaped(std::string_view text) {
-    std::size_t plain = 0;  // characters that stand for themselves, copied in one piece
-    const auto flush = [&] {
-      _out.append(text.substr(0, plain));
-      text.remove_prefix(plain);
-      plain = 0;
-    };
-    while (plain < text.size()) {
-      const char c = text[plain];
-      if (c > '>' && c < 0x7F) {
-        ++plain;
-        continue;
-      }
-      const std::string_view entity = c == '&'    ? "&amp;"
-                                      : c == '<'  ? "&lt;"
-                                      : c == '>'  ? "&gt;"
-                                      : c == '\r' ? "&#13;"
-                                                  : "";
-      const Utf8Character character = firstUtf8Character(text.substr(plain));
-      if (entity.empty() && isXmlCharacter(character)) {
-        plain += character.length;
-        continue;
-      }
-      flush();
-      _out.append(entity.empty() ? kReplacementText : entity);
+    for (;;) {
+      const std::size_t length = lengthOf(kNeedsNoEntity, text);
+      _out.append(text.substr(0, length));
+      text.remove_prefix(length);
+      if (text.empty()) return;
+      const Utf8Character character = firstUtf8Character(text);
+      _out.append(textOf(character, text));
       text.remove_prefix(character.length);
     }
-    flush();
+  }
+
+  /// What stands for the first character of the text.
+  static std::string_view textOf(const Utf8Character& character, std::string_view text) {
+    switch (text[0]) {
+      case '&':
+        return "&amp;";
+      case '<':
+        return "&lt;";
+      case '>':
+        return "&gt;";
+      case '\r':
+        return "&#13;";
+    }
+    return isXmlCharacter(character) ? text.substr(0, character.length) : kReplacementText;
   }
 
   std::string _out;

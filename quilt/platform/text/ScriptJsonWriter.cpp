@@ -5,11 +5,16 @@
 #include <charconv>
 #include <cmath>
 
+#include "quilt/platform/base/ByteTable.h"
 #include "quilt/platform/base/Utf8.h"
 
 namespace quilt::platform {
 
 namespace {
+
+/// The characters of one byte that a script's text holds as they are.
+constexpr ByteTable kStandsForItself =
+    tableOf([](std::size_t c) { return c >= ' ' && c < 0x7F && c != '"' && c != '\\' && c != '<'; });
 
 class Writer {
  public:
@@ -38,9 +43,14 @@ class Writer {
   void element(Date date) { element(formatIso8601(date)); }
 
   void element(const Data& data) {
-    Array bytes;
-    for (const std::uint8_t byte : data) bytes.emplace_back(std::int64_t{byte});
-    element(bytes);
+    _out += '[';
+    const char* separator = "";
+    for (const std::uint8_t byte : data) {
+      _out += separator;
+      element(std::int64_t{byte});
+      separator = ",";
+    }
+    _out += ']';
   }
 
   void element(const Array& array) {
@@ -69,7 +79,11 @@ class Writer {
 
   void element(const std::string& text) {
     _out += '"';
-    for (std::string_view rest = text; !rest.empty();) {
+    for (std::string_view rest = text;;) {
+      const std::size_t length = lengthOf(kStandsForItself, rest);
+      _out += rest.substr(0, length);
+      rest.remove_prefix(length);
+      if (rest.empty()) break;
       const Utf8Character character = firstUtf8Character(rest);
       append(character, rest.substr(0, character.length));
       rest.remove_prefix(character.length);

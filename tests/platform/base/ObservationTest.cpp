@@ -28,6 +28,13 @@ class Book : public Object {
   void setTitle(std::string title) { _title.set(std::move(title)); }
   std::string exchangeTitle(std::string title) { return _title.exchange(std::move(title)); }
   void cacheTitle(std::string title) { _title.store(std::move(title)); }
+  void beginWith(std::string title, const std::shared_ptr<Book>& sequel) {
+    _title.initialize(std::move(title));
+    _sequel.initialize(sequel);
+  }
+  [[nodiscard]] std::size_t titleLength() const {
+    return _title.with([](const std::string& title) { return title.size(); });
+  }
   [[nodiscard]] std::shared_ptr<Book> sequel() const { return _sequel.get(); }
   void setSequel(const std::shared_ptr<Book>& sequel) { _sequel.set(sequel); }
 
@@ -60,6 +67,17 @@ TEST_F(ObservationTest, HearsOfEachChangeOfItsKey) {
   book->setSequel(nullptr);
   book->setTitle("Two");
   EXPECT_THAT(heard, ElementsAre("A did title", "A did title"));
+}
+
+TEST_F(ObservationTest, HearsNothingOfTheValuesThatAnObjectBeginsWith) {
+  const Observation observations[] = {book->observe("title", note("A"), ObservationOptions::Prior),
+                                      book->observe("sequel", note("B"), ObservationOptions::Prior)};
+  const auto sequel = std::make_shared<Book>();
+  book->beginWith("One", sequel);
+  EXPECT_THAT(heard, IsEmpty());
+  EXPECT_EQ("One", book->title());
+  EXPECT_EQ(3U, book->titleLength());
+  EXPECT_EQ(sequel, book->sequel());
 }
 
 TEST_F(ObservationTest, HearsAlsoWhenTheValueStaysTheSame) {

@@ -2,6 +2,9 @@
 #include <gtest/gtest.h>
 
 #include <cstdlib>
+#include <filesystem>
+#include <string>
+#include <vector>
 
 #include "quilt/platform/base/Paths.h"
 
@@ -27,6 +30,21 @@ TEST(PathsTest, ExpressesAPathRelativeToAFolder) {
   EXPECT_EQ(".", pathRelativeTo("/a/b", "/a/b"));
   EXPECT_EQ("/a/b", pathRelativeTo("/a/b", ""));
   EXPECT_EQ("", pathRelativeTo("", "/a"));
+}
+
+TEST(PathsTest, TextsOfPathsRelateAsThePathsDo) {
+  std::vector<std::string> paths{"/", "a", "a/b", "/a/", "/a/../b", "//a", "/a/./b"};
+  const std::vector<std::string> names{"/a", "/ab", "/b"};
+  for (const auto& one : names)
+    for (const auto& two : names)
+      for (const std::string& path : {one, one + two, one + two + "/a"}) paths.push_back(path);
+  for (const std::string& path : paths) {
+    for (const std::string& base : paths) {
+      const auto relative =
+          std::filesystem::path(path).lexically_normal().lexically_relative(standardizedPath(base)).native();
+      EXPECT_EQ(relative.empty() ? path : relative, textRelativeTo(path, base)) << path << " to " << base;
+    }
+  }
 }
 
 TEST(PathsTest, StandardizesByTheTextAlone) {

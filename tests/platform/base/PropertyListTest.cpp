@@ -97,6 +97,28 @@ TEST(PropertyListTest, ACopyIsItsOwn) {
   EXPECT_EQ(2, third.integer("a"));
 }
 
+TEST(PropertyListTest, AValueIsFilledInItsPlace) {
+  Dictionary dictionary;
+  dictionary.append("a").become<Array>().emplace_back(1);
+  dictionary.append("b", 2);
+  dictionary.append("c");
+  EXPECT_EQ(dictionary, (Dictionary{{"a", Array{1}}, {"b", 2}, {"c", false}}));
+  dictionary.array("a")->emplace_back("two");
+  dictionary.find("b")->become<Dictionary>();
+  dictionary.dictionary("b")->append("deep", true);
+  EXPECT_EQ(dictionary, (Dictionary{{"a", Array{1, "two"}}, {"b", Dictionary{{"deep", true}}}, {"c", false}}));
+  EXPECT_EQ(dictionary.array("b"), nullptr);
+  EXPECT_EQ(dictionary.dictionary("a"), nullptr);
+}
+
+TEST(PropertyListTest, ATextIsTakenOnceAndItsKeyStays) {
+  Dictionary dictionary{{"text", "longer than what fits into a text itself"}, {"whole", 7}};
+  EXPECT_EQ(dictionary.takeString("text"), "longer than what fits into a text itself");
+  EXPECT_EQ(dictionary.takeString("whole"), std::nullopt);
+  EXPECT_EQ(dictionary.takeString("none"), std::nullopt);
+  EXPECT_EQ(dictionary, (Dictionary{{"text", ""}, {"whole", 7}}));
+}
+
 TEST(PropertyListTest, UnknownEntriesAreSetAsideAndComeBackInOrder) {
   const std::array known{"UUID", "Title"};
   const Dictionary record{{"Zeta", 1}, {"UUID", "u"}, {"Alpha", Array{2}}, {"Title", "t"}};

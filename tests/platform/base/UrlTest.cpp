@@ -46,6 +46,9 @@ TEST(UrlTest, ReadsLocalFileUrls) {
     EXPECT_TRUE(url->isFileUrl());
     EXPECT_EQ("/a/b", url->relativePath());
   }
+  EXPECT_EQ("/a b", Url::parse("file:%2fa%20b")->relativePathText());
+  EXPECT_EQ("/a", Url::parse("file:///a#b?c")->relativePathText());
+  EXPECT_EQ("/a%00", Url::parse("file:///a%2500")->relativePathText());
   EXPECT_EQ("/100%", Url::parse("file:///100%")->relativePath());
   EXPECT_EQ("/%zz%4", Url::parse("file:///%zz%4")->relativePath());
 }
@@ -53,7 +56,7 @@ TEST(UrlTest, ReadsLocalFileUrls) {
 TEST(UrlTest, RefusesWhatIsNoAbsoluteUrl) {
   for (const char* text :
        {"", "a", "/a/b", ":x", "1a:x", "http:", "https://a b", "https://a\nb", " https://a", "https://a\x7f", "a/b:c",
-        "file://host/a", "file://", "file:a", "file://localhost", "file:///a%00b", "file://\x01/a"})
+        "file://host/a", "file://", "file:a", "file://localhost", "file:///a%00b", "file:///a%%00", "file://\x01/a"})
     EXPECT_FALSE(Url::parse(text)) << text;
   EXPECT_FALSE(Url::parse(std::string_view("https://a\0b", 11)));
 }
