@@ -41,6 +41,10 @@ bool isWritable(int rune) {
 
 void appendLine(const fz_stext_line& line, std::string& text) {
   for (const fz_stext_char* character = line.first_char; character; character = character->next) {
+    if (character->c >= 0x20 && character->c < 0x7F) {  // nearly all
+      text += static_cast<char>(character->c);
+      continue;
+    }
     if (character->c == '\t') text += ' ';
     if (!isWritable(character->c)) continue;
     char bytes[FZ_UTFMAX];
@@ -63,6 +67,24 @@ std::string textOf(const fz_stext_page& page) {
     text.resize(length);
   }
   return mupdf::trimmed(text).value_or("");
+}
+
+// Whether every character lies on the page for certain: it starts there, at least its own size from the edges.
+bool isOnPage(const fz_stext_page& page) {
+  for (const fz_stext_block* block = page.first_block; block; block = block->next) {
+    if (block->type != FZ_STEXT_BLOCK_TEXT) continue;
+    for (const fz_stext_line* line = block->u.t.first_line; line; line = line->next) {
+      for (const fz_stext_char* character = line->first_char; character; character = character->next) {
+        const auto [x, y] = character->origin;
+        const float margin = character->size;
+        const fz_rect& box = page.mediabox;
+        const bool isAcross = x >= box.x0 + margin && x <= box.x1 - margin;
+        const bool isDown = y >= box.y0 + margin && y <= box.y1 - margin;
+        if (!isAcross || !isDown) return false;
+      }
+    }
+  }
+  return true;
 }
 
 class MupdfDocument final : public PagedDocument {
@@ -147,15 +169,13 @@ class MupdfDocument final : public PagedDocument {
     const Result<fz_rect> box = load(index);
     if (!box) return box.error();
     MupdfContext::Owner<fz_stext_page> text(_context, fz_drop_stext_page);
-    MupdfContext::Owner<fz_device> device(_context, fz_drop_device);
-    const Result<void> read = _context.run(kDamagedPage, _path, [&](fz_context* c) {
-      fz_stext_options options{};
-      options.flags = FZ_STEXT_MEDIABOX_CLIP;
-      text.object = fz_new_stext_page(c, *box);
-      device.object = fz_new_stext_device(c, text.object, &options);
-      fz_run_page(c, _page.object, device.object, fz_identity, _context.cookie());
-      fz_close_device(c, device.object);
-    });
+    Result<void> read = readText(*box, text);
+    // To ask of each letter's outline whether it lies beyond the page takes a tenth of the time.
+    if (read && !_isTextClipped && !isOnPage(*text.object)) {
+      _isTextClipped = true;
+      text.reset();
+      read = readText(*box, text);
+    }
     if (!read) return read.error();
     return textOf(*text.object);
   }
@@ -187,6 +207,18 @@ class MupdfDocument final : public PagedDocument {
     return loaded ? Error{ErrorKind::Damaged, "The page has no size.", _path} : loaded.error();
   }
 
+  Result<void> readText(const fz_rect& box, MupdfContext::Owner<fz_stext_page>& text) {
+    MupdfContext::Owner<fz_device> device(_context, fz_drop_device);
+    return _context.run(kDamagedPage, _path, [&](fz_context* c) {
+      fz_stext_options options{};
+      if (_isTextClipped) options.flags = FZ_STEXT_MEDIABOX_CLIP;
+      text.object = fz_new_stext_page(c, box);
+      device.object = fz_new_stext_device(c, text.object, &options);
+      fz_run_page(c, _page.object, device.object, fz_identity, _context.cookie());
+      fz_close_device(c, device.object);
+    });
+  }
+
   const std::filesystem::path _path;
   const DocumentKind _kind;
   std::mutex _mutex;
@@ -197,6 +229,7 @@ class MupdfDocument final : public PagedDocument {
   MupdfContext::Owner<fz_page> _page{_context, fz_drop_page};  // the last one asked for: it is often asked for again
   std::size_t _index = 0;
   fz_rect _box = fz_empty_rect;
+  bool _isTextClipped = false;  // once a page had text at its edge or beyond: then others have
 };
 
 }  // namespace

@@ -147,6 +147,17 @@ TEST_F(MupdfDocumentsTest, APageOfPicturesHasNoText) {
   EXPECT_EQ(textDrawn(textAt(72, 5000, "Far off the page")), "");
 }
 
+TEST_F(MupdfDocumentsTest, OnlyWhatLiesOnThePageIsRead) {
+  const std::string onPage = textAt(72, 700, "Here");
+  for (const std::string& beyond :
+       {textAt(72, 5000, "Above"), textAt(72, -40, "Below"), textAt(-200, 400, "Left"), textAt(700, 400, "Right")}) {
+    EXPECT_EQ(textDrawn(onPage + beyond), "Here");
+    EXPECT_EQ(textDrawn(beyond + onPage), "Here");
+  }
+  // Of a line that leaves the page, the letters on it.
+  EXPECT_EQ(textDrawn(textAt(560, 700, "Cut at the edge")), "Cut at the");
+}
+
 TEST_F(MupdfDocumentsTest, LongTextIsCutAtAWholeCharacter) {
   std::string content;
   for (int i = 0; i < 9000; ++i)
