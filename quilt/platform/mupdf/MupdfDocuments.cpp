@@ -4,7 +4,11 @@
 #include <mupdf/fitz.h>
 
 #include <algorithm>
+#include <array>
+#include <bit>
 #include <cmath>
+#include <cstdint>
+#include <cstring>
 #include <mutex>
 #include <optional>
 #include <utility>
@@ -30,6 +34,23 @@ constexpr double kMaximumSide = 32767;  // pixels of a drawn page
 
 constexpr const char* kDamaged = "The document is damaged";
 constexpr const char* kDamagedPage = "The page is damaged";
+
+// Makes opaque pixels of four bytes of those of three in the last three quarters of the bitmap: each moves to the
+// front, where those before it have been moved from.
+void spreadPixels(Bitmap& bitmap) {
+  constexpr auto kOpaque = std::bit_cast<std::uint32_t>(std::array<std::uint8_t, 4>{0, 0, 0, 255});
+  const std::size_t count = bitmap.width * bitmap.height;
+  std::uint8_t* to = bitmap.pixels.data();
+  const std::uint8_t* from = to + count;
+  for (std::size_t i = 0; i + 1 < count; ++i, to += 4, from += 3) {
+    std::uint32_t pixel = 0;
+    std::memcpy(&pixel, from, 4);  // with the first byte of the next
+    pixel |= kOpaque;
+    std::memcpy(to, &pixel, 4);
+  }
+  std::memmove(to, from, 3);
+  to[3] = 255;
+}
 
 // Neither control characters nor what is no character, which no record could hold, nor the sign for a letter that the
 // document's font does not tell.
@@ -148,19 +169,22 @@ class MupdfDocument final : public PagedDocument {
     const auto scaleDown = static_cast<float>(pixels.height / (box->y1 - box->y0));
 
     Bitmap bitmap{static_cast<std::size_t>(pixels.width), static_cast<std::size_t>(pixels.height), {}};
-    bitmap.pixels.assign(bitmap.width * bitmap.height * 4, 0xFF);
+    const std::size_t count = bitmap.width * bitmap.height;
+    bitmap.pixels.assign(count * 4, 0xFF);
     MupdfContext::Owner<fz_pixmap> pixmap(_context, fz_drop_pixmap);
     MupdfContext::Owner<fz_device> device(_context, fz_drop_device);
     const Result<void> drawn = _context.run(kDamagedPage, _path, [&](fz_context* c) {
       const fz_matrix matrix = fz_pre_translate(fz_scale(scaleAcross, scaleDown), -box->x0, -box->y0);
+      // Without transparency, of which mixing colours would leave traces; in the last three quarters of the bytes.
       pixmap.object =
           fz_new_pixmap_with_data(c, fz_device_rgb(c), static_cast<int>(bitmap.width), static_cast<int>(bitmap.height),
-                                  nullptr, 1, static_cast<int>(bitmap.width * 4), bitmap.pixels.data());
+                                  nullptr, 0, static_cast<int>(bitmap.width * 3), bitmap.pixels.data() + count);
       device.object = fz_new_draw_device(c, fz_identity, pixmap.object);
       fz_run_page(c, _page.object, device.object, matrix, _context.cookie());
       fz_close_device(c, device.object);
     });
     if (!drawn) return drawn.error();
+    spreadPixels(bitmap);
     return bitmap;
   }
 
