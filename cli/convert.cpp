@@ -35,12 +35,19 @@ Identities derivativesOf(const QuiltDocument& document) {
   return all;
 }
 
-void printNew(const QuiltDocument& document, const std::string& format, Identities& known, Output& output) {
+// The format that it was made for is the last tag.
+std::string formatOf(const QuiltMediaDerivative& derivative) {
+  const auto tags = derivative.compatibilityTags();
+  return tags && !tags->empty() ? tags->back() : std::string();
+}
+
+void printNew(const QuiltDocument& document, Identities& known, Output& output) {
   forEachSource(document, [&](const QuiltMedia& item, const QuiltMediaSource& source) {
     const Text title = source.title() ? source.title() : item.title();
     for (const auto& derivative : source.derivatives()) {
       if (!known.insert(derivative->uuid()).second) continue;
       const auto url = derivative->url();
+      const std::string format = formatOf(*derivative);
       output.item({{"uuid", derivative->uuid()},
                    {"title", title.value_or("")},
                    {"type", derivative->contentType().value_or("")},
@@ -63,17 +70,21 @@ void ActingDelegate::perform(const ConvertRequest& request) {
   Identities known = derivativesOf(*document);
   const auto formats = static_cast<double>(request.formats.size());
   double before = 0;
-  for (const std::string& format : request.formats) {
+  for (auto wanted = request.formats.begin(); wanted != request.formats.end(); ++wanted) {
+    const std::string& format = *wanted;
     _context.log.beginOperation();
     bool converted = false;
     platform::runOnWorker([&] {
-      converted = document->convertToFormat(format, [&](double percentage) {
-        _context.progress.report("Converting to " + format, before + percentage / formats);
-        return !Interrupt::isRequested();
-      });
+      converted = document->convertToFormat(format,
+                                            [&](double percentage) {
+                                              _context.progress.report("Converting to " + format,
+                                                                       before + percentage / formats);
+                                              return !Interrupt::isRequested();
+                                            },
+                                            {std::next(wanted), request.formats.end()});
     });
     // What was made before a failure stays, and is told.
-    printNew(*document, format, known, _context.output);
+    printNew(*document, known, _context.output);
     if (Interrupt::isRequested()) throw Interrupt::failure("The rest was not converted");
     if (!converted)
       throw explain(

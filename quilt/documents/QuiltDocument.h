@@ -257,8 +257,10 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
   bool flattenWithProgressionBlock(const ProgressionBlock& withProgressionBlock);
   /// The formats that every item offers, in the first item's order.
   std::vector<std::string> availableFormats() const;
-  /// Has every item make the format; false at the first that cannot, or when the block answers false.
-  bool convertToFormat(const std::string& format, const ProgressionBlock& withProgressionBlock);
+  /// Has every item make the format; false at the first that cannot, or when the block answers false. `followedBy`
+  /// as of the source's.
+  bool convertToFormat(const std::string& format, const ProgressionBlock& withProgressionBlock,
+                       const std::vector<std::string>& followedBy = {});
   /// Builds a finished copy, as a folder or zipped, in the folder `path` under a unique name made from the title. The
   /// path of what was made, or empty. Flattens, converts and finalizes this document on the way.
   Path exportToPath(const Path& path, bool zipped, const std::vector<std::string>& usingFormats,

@@ -77,14 +77,16 @@ std::vector<std::string> QuiltDocument::availableFormats() const {
   return formats;
 }
 
-bool QuiltDocument::convertToFormat(const std::string& format, const ProgressionBlock& withProgressionBlock) {
+bool QuiltDocument::convertToFormat(const std::string& format, const ProgressionBlock& withProgressionBlock,
+                                    const std::vector<std::string>& followedBy) {
   const std::size_t total = mediaCount();
   std::size_t position = 0;
   return performBlockOnMedia([&](const auto& item) {
     const float start = static_cast<float>(position++) * 100.0F / static_cast<float>(total);
-    return item->convertToFormat(format, [&](double percentage) {
+    const auto intoStep = [&](double percentage) {
       return report(withProgressionBlock, static_cast<double>(start) + percentage / static_cast<double>(total));
-    });
+    };
+    return item->convertToFormat(format, intoStep, followedBy);
   });
 }
 
@@ -176,10 +178,10 @@ Path QuiltDocument::exportCopy(const Path& path, bool zipped, const std::vector<
 
   if (!isFlattened() && !flattenWithProgressionBlock(band(block, 0))) return cleanUp({});
   const double formats = static_cast<double>(usingFormats.size());
-  for (const std::string& format : usingFormats) {
+  for (auto format = usingFormats.begin(); format != usingFormats.end(); ++format) {
     // Each format runs through the same band again.
     const auto intoBand = [&](double percentage) { return report(block, percentage / formats / 6.0 + kConvertBand); };
-    if (!convertToFormat(format, intoBand)) return cleanUp({});
+    if (!convertToFormat(*format, intoBand, {std::next(format), usingFormats.end()})) return cleanUp({});
   }
   if (!finalizeWithProgressionBlock(band(block, kFinalizeBand))) return cleanUp({});
 

@@ -180,8 +180,9 @@ class QUILT_EXPORT QuiltMedia : public platform::Object, public ImageBrowserItem
   /// Writes the children's previews that were made since the item was flattened into the package, so that what finalize
   /// promises to readers of the record is on disk.
   void flattenPreviews();
-  /// Has every child make the format; stops at the first that cannot.
-  bool convertToFormat(const std::string& format, const ProgressionBlock& withProgressionBlock);
+  /// Has every child make the format; stops at the first that cannot. `followedBy` as of the source's.
+  bool convertToFormat(const std::string& format, const ProgressionBlock& withProgressionBlock,
+                       const std::vector<std::string>& followedBy = {});
   /// Flattens, converts and finalizes the whole document, then copies this item's sources into a folder.
   bool exportToPath(const Path& path, const std::string& withFormat, const ProgressionBlock& withProgressionBlock);
   /// The formats that every child offers, in the first source's order.

@@ -163,20 +163,22 @@ void QuiltMedia::flattenPreviews() {
   if (const auto commentary = audioCommentarySource()) flatten(commentary);
 }
 
-bool QuiltMedia::convertToFormat(const std::string& format, const ProgressionBlock& withProgressionBlock) {
+bool QuiltMedia::convertToFormat(const std::string& format, const ProgressionBlock& withProgressionBlock,
+                                 const std::vector<std::string>& followedBy) {
   const SaveDeferral deferral;
   const auto commentary = audioCommentarySource();
   // One more without a commentary, none with it: the scale that hosts know.
   const std::size_t total = sourcesCount() + extraCount() + (commentary ? 0 : 1);
   std::size_t next = 0;
   const auto convert = [&](const auto& child) {
-    return child->convertToFormat(format, realStep(withProgressionBlock, next++, total));
+    return child->convertToFormat(format, realStep(withProgressionBlock, next++, total), followedBy);
   };
   if (!performBlockOnSources(convert) || !performBlockOnExtra(convert)) return false;
   if (!commentary) return true;
   // The commentary shares the last child's step. Without other children there is no step to share: it has the whole.
-  if (total == 0) return commentary->convertToFormat(format, withProgressionBlock);
-  return commentary->convertToFormat(format, realStep(withProgressionBlock, next == 0 ? 0 : next - 1, total));
+  if (total == 0) return commentary->convertToFormat(format, withProgressionBlock, followedBy);
+  return commentary->convertToFormat(format, realStep(withProgressionBlock, next == 0 ? 0 : next - 1, total),
+                                     followedBy);
 }
 
 bool QuiltMedia::exportToPath(const Path& path, const std::string& withFormat,

@@ -174,7 +174,11 @@ class QUILT_EXPORT QuiltMediaSource : public platform::Object {
   /// accepts leaves the source empty.
   void reloadWithFileAtPath(const Path& path, const ProgressionBlock& withProgressionBlock);
   /// Makes a derivative for the tag when one is needed and can be made. On failure the source keeps what it had.
-  bool convertToFormat(const std::string& format, const ProgressionBlock& withProgressionBlock);
+  ///
+  /// `followedBy` are the tags that the caller is going to ask for next. What comes of the same pass over a movie is
+  /// made now, so that the next call finds it there.
+  bool convertToFormat(const std::string& format, const ProgressionBlock& withProgressionBlock,
+                       const std::vector<std::string>& followedBy = {});
   /// Every tag of every derivative, each once, in list order.
   std::vector<std::string> availableFormats() const;
   /// Whether every derivative and the audio samples lie in the package. False without derivatives or samples.
@@ -205,7 +209,8 @@ class QUILT_EXPORT QuiltMediaSource : public platform::Object {
   std::shared_ptr<QuiltMediaPreview> makePreview(const PreviewContent& content, std::size_t index);
   bool convertImage(const std::string& format);
   bool convertAudio(const std::string& format, const ProgressionBlock& block);
-  bool convertMovie(const std::string& format, const ProgressionBlock& block);
+  bool convertMovie(const std::string& format, const ProgressionBlock& block,
+                    const std::vector<std::string>& followedBy);
   bool adoptConverted(const Path& file, const std::string& format);
   Path newHiddenFile(const std::string& extension) const;
 

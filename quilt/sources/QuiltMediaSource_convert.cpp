@@ -52,7 +52,8 @@ std::vector<std::string> QuiltMediaSource::availableFormats() const {
   return formats;
 }
 
-bool QuiltMediaSource::convertToFormat(const std::string& format, const ProgressionBlock& withProgressionBlock) {
+bool QuiltMediaSource::convertToFormat(const std::string& format, const ProgressionBlock& withProgressionBlock,
+                                       const std::vector<std::string>& followedBy) {
   platform::report(withProgressionBlock, 0);
   bool done = !dirty() && derivativeWithFormat(format);
   if (!done) {
@@ -64,7 +65,7 @@ bool QuiltMediaSource::convertToFormat(const std::string& format, const Progress
     } else if (category == kQuiltMediaContentCategoryAudio) {
       done = convertAudio(format, withProgressionBlock);
     } else if (category == kQuiltMediaContentCategoryMovie) {
-      done = convertMovie(format, withProgressionBlock);
+      done = convertMovie(format, withProgressionBlock, followedBy);
     } else {
       FDYLogger::logWarning("Trying to convert a media with an invalid content category");
       return false;
@@ -115,7 +116,8 @@ bool QuiltMediaSource::convertAudio(const std::string& format, const Progression
   return false;
 }
 
-bool QuiltMediaSource::convertMovie(const std::string& format, const ProgressionBlock& block) {
+bool QuiltMediaSource::convertMovie(const std::string& format, const ProgressionBlock& block,
+                                    const std::vector<std::string>& followedBy) {
   if (format == kDesktop) return true;
   if (format != k720p && format != k480p) return false;
   const auto main = mainDerivative();
@@ -128,12 +130,29 @@ bool QuiltMediaSource::convertMovie(const std::string& format, const Progression
   if (!url || file.empty()) return false;
   auto& transcoder = *services().transcoder;
   const Url destination = Url::fileUrl(file);
-  const auto made = format == k720p ? transcoder.transcodeToHD(*url, destination, stopWhenCancelled(block))
-                                    : transcoder.transcodeToSD(*url, destination, stopWhenCancelled(block));
-  if (made) return adoptConverted(file, format);
-  // The line names HD for both sizes.
-  FDYLogger::logCritical("Failed to convert video at URL \"%@\" to HD: \"%@\"", url, made.error());
-  return false;
+
+  // Decoding a movie once for both grades takes a good deal less time than twice.
+  const std::string other = format == k720p ? k480p : k720p;
+  const bool isOtherNext = std::find(followedBy.begin(), followedBy.end(), other) != followedBy.end();
+  Path otherFile;
+  if (isOtherNext && !derivativeWithFormat(other) && isBetter(*main, other)) otherFile = newHiddenFile("m4v");
+  const Url otherDestination = Url::fileUrl(otherFile);
+
+  const auto made =
+      otherFile.empty()
+          ? (format == k720p ? transcoder.transcodeToHD(*url, destination, stopWhenCancelled(block))
+                             : transcoder.transcodeToSD(*url, destination, stopWhenCancelled(block)))
+          : transcoder.transcodeToHDAndSD(*url, format == k720p ? destination : otherDestination,
+                                          format == k720p ? otherDestination : destination, stopWhenCancelled(block));
+  if (!made) {
+    // The line names HD for both sizes.
+    FDYLogger::logCritical("Failed to convert video at URL \"%@\" to HD: \"%@\"", url, made.error());
+    return false;
+  }
+  if (!adoptConverted(file, format)) return false;
+  // Whoever asks for the other one then learns whether it is there.
+  if (!otherFile.empty()) adoptConverted(otherFile, other);
+  return true;
 }
 
 bool QuiltMediaSource::adoptConverted(const Path& file, const std::string& format) {

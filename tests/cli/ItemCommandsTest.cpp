@@ -285,6 +285,22 @@ TEST_F(ConvertCommandTest, MakesTheMissingDerivativesOnce) {
   EXPECT_EQ("", quilt({"convert", "Talk", "--format", "720p"}).out);
 }
 
+TEST_F(ConvertCommandTest, TellsBothGradesOfAMovieByTheirFormats) {
+  MediaSpec film;
+  film.duration = 0.4;
+  film.width = 1920;
+  film.height = 1080;
+  quiltJson({"add", "Talk", makeMedia(film)});
+  const json made = quiltJson({"convert", "Talk", "--format", "720p", "--format", "480p"})["result"];
+  ASSERT_THAT(made, SizeIs(2));
+  EXPECT_EQ("720p", made[0]["format"]);
+  EXPECT_EQ("480p", made[1]["format"]);
+  const json derivatives = items()[0]["Sources"][0]["Derivatives"];
+  ASSERT_THAT(derivatives, SizeIs(3));
+  EXPECT_EQ(1280, derivatives[1]["Width"]);
+  EXPECT_EQ(640, derivatives[2]["Width"]);
+}
+
 TEST_F(ConvertCommandTest, WhatIsSmallEnoughStaysAlone) {
   quiltJson({"add", "Talk", image("a.jpg"), "https://example.org/"});
   const json made = quiltJson({"convert", "Talk", "--format", "480p", "--format", "Desktop"})["result"];

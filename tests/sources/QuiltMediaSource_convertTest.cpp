@@ -350,6 +350,46 @@ TEST_F(QuiltMediaSourceConvertTest, AMovieIsTranscodedToTheSizeAskedFor) {
   }
 }
 
+TEST_F(QuiltMediaSourceConvertTest, AGradeThatIsAskedForNextIsMadeInTheSamePass) {
+  for (const auto& [first, next] : {std::pair("720p", "480p"), std::pair("480p", "720p")}) {
+    const auto source = this->source(largeMovie());
+    const Installed<ToldTranscoder> transcoder(&Services::transcoder);
+    transcoder->made = mediumMovie();
+    EXPECT_TRUE(source->convertToFormat(first, {}, {next}));
+    ASSERT_THAT(transcoder->calls, SizeIs(2));
+    EXPECT_EQ(transcoder->calls[0].operation, "HD and SD");
+    ASSERT_EQ(source->derivativeCount(), 3u);
+    EXPECT_EQ(source->derivativeAtIndex(1)->compatibilityTags()->back(), first);
+    EXPECT_EQ(source->derivativeAtIndex(2)->compatibilityTags()->back(), next);
+    EXPECT_THAT(filesOf(*source), UnorderedElementsAre(source->derivativeAtIndex(1)->uuid() + ".m4v",
+                                                       source->derivativeAtIndex(2)->uuid() + ".m4v"));
+    EXPECT_TRUE(source->convertToFormat(next, {}));
+    EXPECT_THAT(transcoder->calls, SizeIs(2)) << "it is there";
+  }
+}
+
+TEST_F(QuiltMediaSourceConvertTest, AGradeThatIsThereOrUselessIsNotMadeAgain) {
+  const auto source = this->source(largeMovie());
+  const Installed<ToldTranscoder> transcoder(&Services::transcoder);
+  transcoder->made = smallMovie();
+  EXPECT_TRUE(source->convertToFormat("480p", {}, {"Desktop", "480p"}));
+  EXPECT_TRUE(source->convertToFormat("720p", {}, {"480p"}));
+  const auto medium = this->source(mediumMovie());
+  EXPECT_TRUE(medium->convertToFormat("480p", {}, {"720p"}));
+  std::vector<std::string> operations;
+  for (const auto& call : transcoder->calls) operations.push_back(call.operation);
+  EXPECT_THAT(operations, ElementsAre("SD", "HD", "SD"));
+}
+
+TEST_F(QuiltMediaSourceConvertTest, APassForBothGradesFailsWithOneLine) {
+  const auto source = this->source(largeMovie());
+  const Installed<ToldTranscoder> transcoder(&Services::transcoder);
+  EXPECT_FALSE(source->convertToFormat("720p", progress.block(), {"480p"}));
+  EXPECT_EQ(takeLines(),
+            Lines{critical("Failed to convert video at URL \"" + mainUrl(*source) + "\" to HD: \"The film tore.\"")});
+  EXPECT_EQ(source->derivativeCount(), 1u);
+}
+
 TEST_F(QuiltMediaSourceConvertTest, AMediumMovieIsTranscodedToStandardDefinition) {
   const auto source = this->source(mediumMovie());
   const Installed<ToldTranscoder> transcoder(&Services::transcoder);

@@ -57,7 +57,7 @@ class ToldAudioPreview final : public platform::FDYAudioPreview {
 class ToldTranscoder final : public platform::FDYMediaTranscoder {
  public:
   struct Call {
-    std::string operation;  ///< "audio", "HD", "SD"
+    std::string operation;  ///< "audio", "HD", "SD"; "HD and SD" with "SD with it"
     platform::Url source;
     platform::Url destination;
   };
@@ -77,6 +77,12 @@ class ToldTranscoder final : public platform::FDYMediaTranscoder {
   platform::Result<void> transcodeToSD(const platform::Url& source, const platform::Url& toDestination,
                                        const platform::TranscoderProgressBlock& withProgressionBlock) override {
     return run("SD", source, toDestination, withProgressionBlock);
+  }
+  platform::Result<void> transcodeToHDAndSD(const platform::Url& source, const platform::Url& toHDDestination,
+                                            const platform::Url& toSDDestination,
+                                            const platform::TranscoderProgressBlock& withProgressionBlock) override {
+    const auto made = run("HD and SD", source, toHDDestination, withProgressionBlock);
+    return made ? run("SD with it", source, toSDDestination, {}) : made;
   }
 
  private:

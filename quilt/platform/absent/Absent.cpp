@@ -56,6 +56,12 @@ Result<void> AbsentTranscoder::transcodeToSD(const Url& source, const Url& /*toD
   return _absence.error(source.relativePath());
 }
 
+Result<void> AbsentTranscoder::transcodeToHDAndSD(const Url& source, const Url& /*toHDDestination*/,
+                                                  const Url& /*toSDDestination*/,
+                                                  const TranscoderProgressBlock& /*withProgressionBlock*/) {
+  return _absence.error(source.relativePath());
+}
+
 Result<void> AbsentArchive::archiveFile(const std::filesystem::path& file, std::string_view /*underName*/,
                                         const std::filesystem::path& /*toZipFile*/,
                                         const ProgressionBlock& /*withProgressionBlock*/) {

@@ -92,6 +92,8 @@ class AbsentTranscoder final : public FDYMediaTranscoder {
                              const TranscoderProgressBlock& withProgressionBlock) override;
   Result<void> transcodeToSD(const Url& source, const Url& toDestination,
                              const TranscoderProgressBlock& withProgressionBlock) override;
+  Result<void> transcodeToHDAndSD(const Url& source, const Url& toHDDestination, const Url& toSDDestination,
+                                  const TranscoderProgressBlock& withProgressionBlock) override;
 
  private:
   Absence _absence{"Conversion of movies and audio"};

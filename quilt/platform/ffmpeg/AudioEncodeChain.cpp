@@ -42,14 +42,13 @@ Result<CodecContext> openEncoder(const AudioPlan& plan, const std::filesystem::p
 class AudioEncodeChain final : public StreamChain {
  public:
   AudioEncodeChain(const Input& input, const AVStream& source, const AudioPlan& plan, CodecContext decoder,
-                   CodecContext encoder, MovieOutput& output, const AVStream& stream)
+                   CodecContext encoder, Track track)
       : _file(input.path()),
         _source(source),
         _plan(plan),
         _decoder(std::move(decoder)),
         _encoder(std::move(encoder)),
-        _output(output),
-        _stream(stream) {}
+        _track(std::move(track)) {}
 
   Result<void> take(AVPacket& packet) override {
     SoundFrames frames(_source, packet);
@@ -188,7 +187,7 @@ class AudioEncodeChain final : public StreamChain {
     int code = 0;
     while ((code = avcodec_receive_packet(_encoder.get(), _packet.get())) >= 0) {
       _hasDelivered = true;
-      if (Result<void> written = _output.write(*_packet, _stream, _encoder->time_base); !written) return written;
+      if (Result<void> written = _track.write(*_packet, _encoder->time_base); !written) return written;
     }
     return code == AVERROR(EAGAIN) || code == AVERROR_EOF ? Result<void>() : conversionFailure(code, _file);
   }
@@ -198,8 +197,7 @@ class AudioEncodeChain final : public StreamChain {
   AudioPlan _plan;
   CodecContext _decoder;
   CodecContext _encoder;
-  MovieOutput& _output;
-  const AVStream& _stream;
+  Track _track;
   std::optional<FilterChain> _conversion;
   std::optional<FilterChain> _evening;
   Frame _decoded{av_frame_alloc()};
@@ -217,16 +215,16 @@ class AudioEncodeChain final : public StreamChain {
 }  // namespace
 
 Result<std::unique_ptr<StreamChain>> makeAudioEncodeChain(const Input& input, const AVStream& source,
-                                                          const AudioPlan& plan, MovieOutput& output) {
+                                                          const AudioPlan& plan, const Outputs& outputs) {
   const std::filesystem::path& file = input.path();
   Result<CodecContext> decoder = openDecoder(source, 1, file);
   if (!decoder) return decoder.error();
   Result<CodecContext> encoder = openEncoder(plan, file);
   if (!encoder) return encoder.error();
-  Result<AVStream*> stream = output.addStream(source, **encoder);
-  if (!stream) return stream.error();
+  Result<Track> track = Track::add(outputs, source, **encoder);
+  if (!track) return track.error();
   return std::unique_ptr<StreamChain>(std::make_unique<AudioEncodeChain>(input, source, plan, *std::move(decoder),
-                                                                         *std::move(encoder), output, **stream));
+                                                                         *std::move(encoder), *std::move(track)));
 }
 
 }  // namespace quilt::platform::ffmpeg

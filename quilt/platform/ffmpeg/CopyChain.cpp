@@ -15,8 +15,8 @@ constexpr std::size_t kMostHeld = 32;  // packets; no codec reorders more
 
 class CopyChain final : public StreamChain {
  public:
-  CopyChain(const AVStream& source, MovieOutput& output, const AVStream& stream)
-      : _source(source), _timeBase(source.time_base), _output(output), _stream(stream) {}
+  CopyChain(const AVStream& source, Track track)
+      : _source(source), _timeBase(source.time_base), _track(std::move(track)) {}
 
   Result<void> take(AVPacket& packet) override {
     if ((packet.flags & AV_PKT_FLAG_CORRUPT) != 0) return {};  // of a file that breaks off
@@ -80,20 +80,19 @@ class CopyChain final : public StreamChain {
     _hasDelivered = true;
     const AVCodecParameters& parameters = *_source.codecpar;
     if (parameters.codec_type != AVMEDIA_TYPE_AUDIO || parameters.frame_size <= 0) {
-      return _output.write(packet, _stream, _timeBase);
+      return _track.write(packet, _timeBase);
     }
     // Sound lasts a whole number of samples, whatever the container rounds its times to.
     const AVRational samples{1, parameters.sample_rate};
     packet.dts = packet.pts =
         av_rescale_delta(_timeBase, packet.dts, samples, parameters.frame_size, &_samples, samples);
     packet.duration = parameters.frame_size;
-    return _output.write(packet, _stream, samples);
+    return _track.write(packet, samples);
   }
 
   const AVStream& _source;
   AVRational _timeBase;
-  MovieOutput& _output;
-  const AVStream& _stream;
+  Track _track;
   std::vector<Packet> _held;
   bool _hasDelivered = false;
   bool _isUnfit = false;
@@ -103,13 +102,13 @@ class CopyChain final : public StreamChain {
 
 }  // namespace
 
-Result<std::unique_ptr<StreamChain>> makeCopyChain(const AVStream& source, MovieOutput& output) {
+Result<std::unique_ptr<StreamChain>> makeCopyChain(const AVStream& source, const Outputs& outputs) {
   const AVCodecParameters& parameters = *source.codecpar;
   const bool isSound = parameters.codec_type == AVMEDIA_TYPE_AUDIO;
-  Result<AVStream*> stream =
-      output.addStream(source, parameters, isSound ? AVRational{1, parameters.sample_rate} : source.time_base);
-  if (!stream) return stream.error();
-  return std::unique_ptr<StreamChain>(std::make_unique<CopyChain>(source, output, **stream));
+  Result<Track> track =
+      Track::add(outputs, source, parameters, isSound ? AVRational{1, parameters.sample_rate} : source.time_base);
+  if (!track) return track.error();
+  return std::unique_ptr<StreamChain>(std::make_unique<CopyChain>(source, *std::move(track)));
 }
 
 }  // namespace quilt::platform::ffmpeg

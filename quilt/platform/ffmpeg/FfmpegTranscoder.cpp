@@ -3,10 +3,10 @@
 
 #include <algorithm>
 #include <array>
-#include <map>
 #include <memory>
 #include <optional>
 #include <utility>
+#include <vector>
 
 #include "quilt/platform/ffmpeg/Failure.h"
 #include "quilt/platform/ffmpeg/FieldProbe.h"
@@ -72,73 +72,112 @@ class Transcode {
   Transcode(Input input, const Facts& facts, Copying copying, TranscodeProgress& progress)
       : _input(std::move(input)), _facts(facts), _copying(copying), _progress(progress) {}
 
-  Result<void> run(const Target& target) {
-    Result<std::unique_ptr<MovieOutput>> output =
-        MovieOutput::create(target.file, target.kind, _facts.duration, _progress);
-    if (!output) return output.error();
-    if (target.kind == OutputKind::Movie) {
-      if (Result<void> added = addVideo(target.box, **output); !added) return added;
+  /// Makes all of the files, of one kind, in one pass; none when one fails.
+  Result<void> run(const std::vector<Target>& targets) {
+    const bool isMovie = targets.front().kind == OutputKind::Movie;
+    for (const Target& target : targets) {
+      Result<std::unique_ptr<MovieOutput>> output =
+          MovieOutput::create(target.file, target.kind, _facts.duration, _progress);
+      if (!output) return output.error();
+      _files.push_back(*std::move(output));
+      _outputs.push_back(_files.back().get());
     }
-    if (Result<void> added = addAudio(**output); !added) return added;
+    if (isMovie) {
+      if (Result<void> added = addVideo(targets); !added) return added;
+    }
+    if (Result<void> added = addAudio(); !added) return added;
     if (_chains.empty()) return Error{ErrorKind::Unsupported, "The file holds no sound.", _input.path()};
-    if (target.kind == OutputKind::Movie) addSubtitles(**output);
-    describe(**output);
-    if (Result<void> chapters = (*output)->setChapters(_facts.chapters); !chapters) return chapters;
-    const AVStream* cover = addCover(**output);
-    if (Result<void> begun = (*output)->begin(); !begun) return begun;
-    if (cover != nullptr) {
-      if (Result<void> written = writeCover(*cover, **output); !written) return written;
+    if (isMovie) addSubtitles();
+    for (MovieOutput* output : _outputs) {
+      if (Result<void> begun = begin(*output); !begun) return begun;
     }
     if (Result<void> carried = carryPackets(); !carried) return carried;
-    return (*output)->finish();
+    for (std::size_t i = 0; i < targets.size(); ++i) {
+      Result<void> finished = _outputs[i]->finish();
+      if (finished) continue;
+      std::error_code ignored;
+      for (std::size_t done = 0; done < i; ++done) std::filesystem::remove(targets[done].file, ignored);
+      return finished;
+    }
+    return {};
   }
 
   /// Whether another attempt without copies may succeed.
   [[nodiscard]] bool isUnfitForCopying() const {
-    return std::ranges::any_of(_chains, [](const auto& entry) { return entry.second->isUnfit(); });
+    return std::ranges::any_of(_chains, [](const auto& entry) { return entry.chain->isUnfit(); });
   }
 
  private:
-  Result<void> addVideo(PictureSize box, MovieOutput& output) {
+  struct Entry {
+    int stream;  // the index of the source stream
+    std::unique_ptr<StreamChain> chain;
+  };
+
+  Result<void> addVideo(const std::vector<Target>& targets) {
     AVStream* stream = mainVideo(_input);
     if (stream == nullptr) return {};
     VideoTraits traits = videoTraits(_input, *stream);
     traits.isInterlaced =
         traits.isInterlaced || _facts.fields == Fields::TopFirst || _facts.fields == Fields::BottomFirst;
     if (traits.stored.width <= 0 || traits.stored.height <= 0) return failure(AVERROR_INVALIDDATA, _input.path());
-    VideoPlan plan = planVideo(traits, box, _copying);
-    constexpr double leastApart = 0.5;  // seconds; whole pictures take room
-    for (const Chapter& chapter : _facts.chapters) {
-      if (!plan.chapterStarts.empty() && chapter.start - plan.chapterStarts.back() < leastApart) continue;
-      plan.chapterStarts.push_back(chapter.start);
+    Outputs copies;
+    std::vector<PictureTarget> encoded;
+    for (std::size_t i = 0; i < targets.size(); ++i) {
+      VideoPlan plan = planVideo(traits, targets[i].box, _copying);
+      plan.chapterStarts = chapterStarts();
+      if (plan.isCopied) {
+        copies.push_back(_outputs[i]);
+      } else {
+        encoded.push_back({std::move(plan), _outputs[i]});
+      }
     }
+    if (!copies.empty()) {
+      if (Result<void> added = add(*stream, makeCopyChain(*stream, copies)); !added) return added;
+    }
+    if (encoded.empty()) return {};
     const Company company = mainAudio(_input) == nullptr ? Company::Alone : Company::WithSound;
-    return add(*stream, plan.isCopied ? makeCopyChain(*stream, output)
-                                      : makeVideoEncodeChain(_input, *stream, plan, _facts.fields, company, output));
+    return add(*stream, makeVideoEncodeChain(_input, *stream, encoded, _facts.fields, company));
   }
 
-  Result<void> addAudio(MovieOutput& output) {
+  [[nodiscard]] std::vector<double> chapterStarts() const {
+    constexpr double leastApart = 0.5;  // seconds; whole pictures take room
+    std::vector<double> starts;
+    for (const Chapter& chapter : _facts.chapters) {
+      if (starts.empty() || chapter.start - starts.back() >= leastApart) starts.push_back(chapter.start);
+    }
+    return starts;
+  }
+
+  Result<void> addAudio() {
     AVStream* stream = mainAudio(_input);
     if (stream == nullptr) return {};
     const AudioPlan plan = planAudio(audioTraits(_input, *stream), _copying);
-    return add(*stream,
-               plan.isCopied ? makeCopyChain(*stream, output) : makeAudioEncodeChain(_input, *stream, plan, output));
+    return add(*stream, plan.isCopied ? makeCopyChain(*stream, _outputs)
+                                      : makeAudioEncodeChain(_input, *stream, plan, _outputs));
   }
 
-  void addSubtitles(MovieOutput& output) {
+  void addSubtitles() {
     constexpr int most = 32;
     int count = 0;
     for (unsigned i = 0; i < _input.context()->nb_streams && count < most; ++i) {
       const AVStream& stream = *_input.context()->streams[i];
       if (stream.codecpar->codec_type != AVMEDIA_TYPE_SUBTITLE || !isTextSubtitle(stream)) continue;
-      if (add(stream, makeSubtitleChain(_input, stream, output))) ++count;  // the movie goes without, too
+      if (add(stream, makeSubtitleChain(_input, stream, _outputs))) ++count;  // the movie goes without, too
     }
   }
 
   Result<void> add(const AVStream& stream, Result<std::unique_ptr<StreamChain>> chain) {
     if (!chain) return chain.error();
-    _chains[stream.index] = *std::move(chain);
+    _chains.push_back({stream.index, *std::move(chain)});
     return {};
+  }
+
+  Result<void> begin(MovieOutput& output) {
+    describe(output);
+    if (Result<void> chapters = output.setChapters(_facts.chapters); !chapters) return chapters;
+    const AVStream* cover = addCover(output);
+    if (Result<void> begun = output.begin(); !begun || cover == nullptr) return begun;
+    return writeCover(*cover, output);
   }
 
   // What a reader of the derivative may want to know; nothing of where and with what it was recorded.
@@ -173,7 +212,7 @@ class Transcode {
   Result<void> carryPackets() {
     for (unsigned i = 0; i < _input.context()->nb_streams; ++i) {
       AVStream* stream = _input.context()->streams[i];
-      if (!_chains.contains(stream->index)) stream->discard = AVDISCARD_ALL;
+      if (!isCarried(stream->index)) stream->discard = AVDISCARD_ALL;
     }
     const bool leaps = (_input.context()->iformat->flags & AVFMT_TS_DISCONT) != 0;
     SourceTimeline timeline(startTime(_input), leaps, _facts.duration);
@@ -181,18 +220,17 @@ class Transcode {
     if (!packet) return failure(AVERROR(ENOMEM), _input.path());
     int code = 0;
     while (_input.allow(kPacketSeconds), (code = av_read_frame(_input.context(), packet.get())) >= 0) {
-      const auto found = _chains.find(packet->stream_index);
-      if (found != _chains.end()) {
+      if (isCarried(packet->stream_index)) {
         const AVRational base = _input.context()->streams[packet->stream_index]->time_base;
         timeline.place(*packet, base);
         if (packet->dts != AV_NOPTS_VALUE) reach(seconds(packet->dts, base));
-        if (Result<void> taken = found->second->take(*packet); !taken) return taken;
+        if (Result<void> taken = hand(*packet); !taken) return taken;
       }
       av_packet_unref(packet.get());
       if (!_progress.goOn()) return TranscodeProgress::stopped(_input.path());
     }
     if (code == AVERROR_EXIT || code == AVERROR(EIO)) return failure(code, _input.path());
-    for (auto& [index, chain] : _chains) {  // anything else ends the file where it breaks off
+    for (const auto& [index, chain] : _chains) {  // anything else ends the file where it breaks off
       if (Result<void> finished = chain->finish(); !finished) return finished;
       if (chain->hasDelivered()) continue;
       const bool isVideo = _input.context()->streams[index]->codecpar->codec_type == AVMEDIA_TYPE_VIDEO;
@@ -201,6 +239,21 @@ class Transcode {
                    _input.path()};
     }
     if (_progress.isStopped()) return TranscodeProgress::stopped(_input.path());
+    return {};
+  }
+
+  [[nodiscard]] bool isCarried(int stream) const {
+    return std::ranges::any_of(_chains, [stream](const Entry& entry) { return entry.stream == stream; });
+  }
+
+  // Each of the packet's chains takes it; those that pass it on change it.
+  Result<void> hand(const AVPacket& packet) {
+    for (const auto& [stream, chain] : _chains) {
+      if (stream != packet.stream_index) continue;
+      const Packet same(av_packet_clone(&packet));
+      if (!same) return failure(AVERROR(ENOMEM), _input.path());
+      if (Result<void> taken = chain->take(*same); !taken) return taken;
+    }
     return {};
   }
 
@@ -214,7 +267,9 @@ class Transcode {
   const Facts& _facts;
   Copying _copying;
   TranscodeProgress& _progress;
-  std::map<int, std::unique_ptr<StreamChain>> _chains;  // by index of the source stream
+  std::vector<std::unique_ptr<MovieOutput>> _files;
+  Outputs _outputs;  // the same, for the chains
+  std::vector<Entry> _chains;
 };
 
 struct Attempt {
@@ -222,34 +277,42 @@ struct Attempt {
   bool isUnfitForCopying = false;
 };
 
-Attempt attempt(const std::filesystem::path& file, const Facts& facts, const Target& target, Copying copying,
-                TranscodeProgress& progress) {
+Attempt attempt(const std::filesystem::path& file, const Facts& facts, const std::vector<Target>& targets,
+                Copying copying, TranscodeProgress& progress) {
   Result<Input> input = Input::open(file, kInspectionSeconds);
   if (!input) return {input.error()};
   if (Result<void> completed = input->findStreamInfo(); !completed) return {completed};
   if (!progress.goOn()) return {TranscodeProgress::stopped(file)};
   Transcode transcode(*std::move(input), facts, copying, progress);
-  Result<void> result = transcode.run(target);
+  Result<void> result = transcode.run(targets);
   return {std::move(result), transcode.isUnfitForCopying()};
 }
 
-Result<void> transcode(const Url& source, const Url& destination, OutputKind kind, PictureSize box,
-                       const TranscoderProgressBlock& block) {
-  for (const Url* url : {&source, &destination}) {
-    if (!url->isFileUrl()) return Error{ErrorKind::Unsupported, "Only local files are converted.", {}};
-  }
+struct Wanted {
+  OutputKind kind;
+  PictureSize box;
+  const Url& destination;
+};
+
+Result<void> transcode(const Url& source, const std::vector<Wanted>& wanted, const TranscoderProgressBlock& block) {
+  const Error notLocal{ErrorKind::Unsupported, "Only local files are converted.", {}};
+  if (!source.isFileUrl()) return notLocal;
   const std::filesystem::path file = source.relativePath();
-  const Target target{kind, box, destination.relativePath()};
-  std::error_code ignored;
-  if (std::filesystem::equivalent(file, target.file, ignored)) {
-    return Error{ErrorKind::AlreadyExists, "A file is not replaced by its own conversion.", file};
+  std::vector<Target> targets;
+  for (const auto& [kind, box, destination] : wanted) {
+    if (!destination.isFileUrl()) return notLocal;
+    targets.push_back({kind, box, destination.relativePath()});
+    std::error_code ignored;
+    if (std::filesystem::equivalent(file, targets.back().file, ignored)) {
+      return Error{ErrorKind::AlreadyExists, "A file is not replaced by its own conversion.", file};
+    }
   }
   TranscodeProgress progress(block);
   progress.begin();
-  const Result<Facts> facts = gatherFacts(file, kind == OutputKind::Movie);
+  const Result<Facts> facts = gatherFacts(file, targets.front().kind == OutputKind::Movie);
   if (!facts) return facts.error();
-  Attempt done = attempt(file, *facts, target, Copying::WherePossible, progress);
-  if (!done.result && done.isUnfitForCopying) done = attempt(file, *facts, target, Copying::Never, progress);
+  Attempt done = attempt(file, *facts, targets, Copying::WherePossible, progress);
+  if (!done.result && done.isUnfitForCopying) done = attempt(file, *facts, targets, Copying::Never, progress);
   if (done.result) {
     progress.complete();
   } else if (progress.isStopped()) {
@@ -262,17 +325,26 @@ Result<void> transcode(const Url& source, const Url& destination, OutputKind kin
 
 Result<void> FfmpegTranscoder::transcodeToAudio(const Url& source, const Url& toDestination,
                                                 const TranscoderProgressBlock& withProgressionBlock) {
-  return transcode(source, toDestination, OutputKind::Sound, {}, withProgressionBlock);
+  return transcode(source, {{OutputKind::Sound, {}, toDestination}}, withProgressionBlock);
 }
 
 Result<void> FfmpegTranscoder::transcodeToHD(const Url& source, const Url& toDestination,
                                              const TranscoderProgressBlock& withProgressionBlock) {
-  return transcode(source, toDestination, OutputKind::Movie, kHighDefinitionBox, withProgressionBlock);
+  return transcode(source, {{OutputKind::Movie, kHighDefinitionBox, toDestination}}, withProgressionBlock);
 }
 
 Result<void> FfmpegTranscoder::transcodeToSD(const Url& source, const Url& toDestination,
                                              const TranscoderProgressBlock& withProgressionBlock) {
-  return transcode(source, toDestination, OutputKind::Movie, kStandardDefinitionBox, withProgressionBlock);
+  return transcode(source, {{OutputKind::Movie, kStandardDefinitionBox, toDestination}}, withProgressionBlock);
+}
+
+Result<void> FfmpegTranscoder::transcodeToHDAndSD(const Url& source, const Url& toHDDestination,
+                                                  const Url& toSDDestination,
+                                                  const TranscoderProgressBlock& withProgressionBlock) {
+  return transcode(source,
+                   {{OutputKind::Movie, kHighDefinitionBox, toHDDestination},
+                    {OutputKind::Movie, kStandardDefinitionBox, toSDDestination}},
+                   withProgressionBlock);
 }
 
 }  // namespace quilt::platform

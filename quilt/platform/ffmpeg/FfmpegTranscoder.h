@@ -19,6 +19,8 @@ class FfmpegTranscoder final : public FDYMediaTranscoder {
                              const TranscoderProgressBlock& withProgressionBlock) override;
   Result<void> transcodeToSD(const Url& source, const Url& toDestination,
                              const TranscoderProgressBlock& withProgressionBlock) override;
+  Result<void> transcodeToHDAndSD(const Url& source, const Url& toHDDestination, const Url& toSDDestination,
+                                  const TranscoderProgressBlock& withProgressionBlock) override;
 };
 
 }  // namespace quilt::platform

@@ -146,7 +146,8 @@ std::string inputColours(const Colours& colours) {
 }
 
 std::string sizing(PictureSize size) {
-  return "w=" + std::to_string(size.width) + ":h=" + std::to_string(size.height) + ":filter=bicubic";
+  return "w=" + std::to_string(size.width) + ":h=" + std::to_string(size.height) +
+         ":filter=bicubic:param_a=0:param_b=0.6";
 }
 
 constexpr const char* kOutputColours = "m=709:p=709:t=709:r=limited";

@@ -2,15 +2,16 @@
 #pragma once
 
 #include <memory>
+#include <vector>
 
 #include "quilt/platform/base/Result.h"
 #include "quilt/platform/ffmpeg/Handles.h"
-#include "quilt/platform/ffmpeg/MovieOutput.h"
+#include "quilt/platform/ffmpeg/Track.h"
 #include "quilt/platform/ffmpeg/TranscodePlan.h"
 
 namespace quilt::platform::ffmpeg {
 
-/// Carries one stream from the packets of a file to those of another.
+/// Carries one stream from the packets of a file to those of others.
 class StreamChain {
  public:
   virtual ~StreamChain() = default;
@@ -28,21 +29,29 @@ class StreamChain {
 
 /// Passes packets on as they are; repairs decoding times that do not rise. Unfit once the decoder's set-up changes,
 /// for which the output has no place.
-Result<std::unique_ptr<StreamChain>> makeCopyChain(const AVStream& source, MovieOutput& output);
+Result<std::unique_ptr<StreamChain>> makeCopyChain(const AVStream& source, const Outputs& outputs);
 
-/// H.264 High with the plan's size; `fields` as found out before.
+/// What becomes of the pictures in one of the files.
+struct PictureTarget {
+  VideoPlan plan;
+  MovieOutput* output;
+};
+
+/// H.264 High with the plans' sizes, decoded once; `fields` as found out before. The plans are for the same stream.
 enum class Fields;
 enum class Company { Alone, WithSound };
-Result<std::unique_ptr<StreamChain>> makeVideoEncodeChain(const Input& input, AVStream& source, const VideoPlan& plan,
-                                                          Fields fields, Company company, MovieOutput& output);
+Result<std::unique_ptr<StreamChain>> makeVideoEncodeChain(const Input& input, AVStream& source,
+                                                          const std::vector<PictureTarget>& targets, Fields fields,
+                                                          Company company);
 
 /// AAC-LC, without gaps: sound that starts late or pauses is filled with silence.
 Result<std::unique_ptr<StreamChain>> makeAudioEncodeChain(const Input& input, const AVStream& source,
-                                                          const AudioPlan& plan, MovieOutput& output);
+                                                          const AudioPlan& plan, const Outputs& outputs);
 
 /// Whether subtitles are text. Others are pictures, which the output has no place for.
 bool isTextSubtitle(const AVStream& stream);
 /// Timed text. What is no cue is left out.
-Result<std::unique_ptr<StreamChain>> makeSubtitleChain(const Input& input, const AVStream& source, MovieOutput& output);
+Result<std::unique_ptr<StreamChain>> makeSubtitleChain(const Input& input, const AVStream& source,
+                                                       const Outputs& outputs);
 
 }  // namespace quilt::platform::ffmpeg

@@ -26,13 +26,11 @@ struct Cue {
 // Cues that do not decode or come out of order are left out: no movie fails for its subtitles.
 class SubtitleChain final : public StreamChain {
  public:
-  SubtitleChain(const AVStream& source, CodecContext decoder, CodecContext encoder, MovieOutput& output,
-                const AVStream& stream)
+  SubtitleChain(const AVStream& source, CodecContext decoder, CodecContext encoder, Track track)
       : _source(source),
         _decoder(std::move(decoder)),
         _encoder(std::move(encoder)),
-        _output(output),
-        _stream(stream),
+        _track(std::move(track)),
         _text(_encoder ? kMaximumTagBytes : 0) {}
 
   Result<void> take(AVPacket& packet) override {
@@ -48,7 +46,7 @@ class SubtitleChain final : public StreamChain {
     }
     packet.pts = packet.dts = _last = start;
     packet.flags |= AV_PKT_FLAG_KEY;
-    return _output.write(packet, _stream, kThousandths);
+    return _track.write(packet, kThousandths);
   }
   Result<void> finish() override { return {}; }
   [[nodiscard]] bool hasDelivered() const override { return true; }
@@ -76,8 +74,7 @@ class SubtitleChain final : public StreamChain {
   const AVStream& _source;
   CodecContext _decoder;  // null, as is the encoder, where the text is copied
   CodecContext _encoder;
-  MovieOutput& _output;
-  const AVStream& _stream;
+  Track _track;
   std::vector<std::uint8_t> _text;
   std::int64_t _last = -1;
 };
@@ -116,21 +113,21 @@ bool isTextSubtitle(const AVStream& stream) {
 }
 
 Result<std::unique_ptr<StreamChain>> makeSubtitleChain(const Input& input, const AVStream& source,
-                                                       MovieOutput& output) {
+                                                       const Outputs& outputs) {
   if (source.codecpar->codec_id == AV_CODEC_ID_MOV_TEXT) {
-    Result<AVStream*> stream = output.addStream(source, *source.codecpar, kThousandths);
-    if (!stream) return stream.error();
+    Result<Track> track = Track::add(outputs, source, *source.codecpar, kThousandths);
+    if (!track) return track.error();
     return std::unique_ptr<StreamChain>(
-        std::make_unique<SubtitleChain>(source, CodecContext(), CodecContext(), output, **stream));
+        std::make_unique<SubtitleChain>(source, CodecContext(), CodecContext(), *std::move(track)));
   }
   Result<CodecContext> decoder = openDecoder(source, 1, input.path());
   if (!decoder) return decoder.error();
   Result<CodecContext> encoder = openEncoder(**decoder, input.path());
   if (!encoder) return encoder.error();
-  Result<AVStream*> stream = output.addStream(source, **encoder);
-  if (!stream) return stream.error();
+  Result<Track> track = Track::add(outputs, source, **encoder);
+  if (!track) return track.error();
   return std::unique_ptr<StreamChain>(
-      std::make_unique<SubtitleChain>(source, *std::move(decoder), *std::move(encoder), output, **stream));
+      std::make_unique<SubtitleChain>(source, *std::move(decoder), *std::move(encoder), *std::move(track)));
 }
 
 }  // namespace quilt::platform::ffmpeg

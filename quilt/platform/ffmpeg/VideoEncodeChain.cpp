@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <algorithm>
-#include <map>
 #include <optional>
 #include <thread>
 #include <utility>
+#include <vector>
 
 #include "quilt/platform/ffmpeg/Failure.h"
 #include "quilt/platform/ffmpeg/FilterChain.h"
@@ -53,55 +53,23 @@ Result<CodecContext> openEncoder(const VideoPlan& plan, AVRational rate, const s
   return encoder;
 }
 
-class VideoEncodeChain final : public StreamChain {
+// Makes the pictures of one file out of decoded ones.
+class PictureEncoder {
  public:
-  VideoEncodeChain(const Input& input, AVStream& source, const VideoPlan& plan, Fields fields, Company company,
-                   CodecContext decoder, CodecContext encoder, MovieOutput& output, const AVStream& stream)
+  PictureEncoder(const Input& input, const AVStream& source, VideoPlan plan, Fields fields, CodecContext encoder,
+                 Track track)
       : _file(input.path()),
-        _source(source),
-        _plan(plan),
+        _plan(std::move(plan)),
         _orientation(orientation(source)),
         _fields(fields),
-        _decoder(std::move(decoder)),
         _encoder(std::move(encoder)),
-        _clock(plan.timeBase, _encoder->framerate,
-               company == Company::Alone ? FrameClock::Start::Moved : FrameClock::Start::Lengthened),
-        _output(output),
-        _stream(stream) {}
+        _track(std::move(track)) {}
 
-  Result<void> take(AVPacket& packet) override {
-    avcodec_send_packet(_decoder.get(), &packet);  // a damaged packet is one picture less
-    return receivePictures();
-  }
-
-  Result<void> finish() override {
-    avcodec_send_packet(_decoder.get(), nullptr);
-    if (Result<void> received = receivePictures(); !received) return received;
-    if (Result<void> filtered = closeFilters(); !filtered) return filtered;
-    return encode(nullptr);
-  }
-
-  [[nodiscard]] bool hasDelivered() const override { return _hasDelivered; }
-
- private:
-  Result<void> receivePictures() {
-    while (avcodec_receive_frame(_decoder.get(), _decoded.get()) >= 0) {
-      Result<void> filtered = filter(*_decoded);
-      av_frame_unref(_decoded.get());
-      if (!filtered) return filtered;
-    }
-    return {};
-  }
-
-  Result<void> filter(AVFrame& picture) {
-    const std::int64_t shown =
-        picture.best_effort_timestamp != AV_NOPTS_VALUE ? picture.best_effort_timestamp : picture.pts;
-    const std::int64_t time =
-        _clock.place(shown == AV_NOPTS_VALUE ? shown : av_rescale_q(shown, _source.time_base, _plan.timeBase));
-    if (time == AV_NOPTS_VALUE) return {};
-    picture.pts = time;
-    _lastDuration = picture.pkt_duration > 0 ? av_rescale_q(picture.pkt_duration, _source.time_base, _plan.timeBase)
-                                             : _clock.usualDuration();
+  /// A picture to be shown for `duration`, or for `usualDuration` when it is not the last: ticks of the plan's time
+  /// base, as is the picture's time. Takes its content.
+  Result<void> take(AVFrame& picture, std::int64_t duration, std::int64_t usualDuration) {
+    _lastDuration = duration;
+    _usualDuration = usualDuration;
     if (_filters && !_filters->fits(picture)) {
       if (Result<void> closed = closeFilters(); !closed) return closed;
     }
@@ -116,6 +84,14 @@ class VideoEncodeChain final : public StreamChain {
     return pullPictures();
   }
 
+  Result<void> finish() {
+    if (Result<void> filtered = closeFilters(); !filtered) return filtered;
+    return encode(nullptr);
+  }
+
+  [[nodiscard]] bool hasDelivered() const { return _hasDelivered; }
+
+ private:
   Result<void> closeFilters() {
     if (!_filters) return {};
     _filters->push(nullptr);
@@ -140,7 +116,7 @@ class VideoEncodeChain final : public StreamChain {
   }
 
   bool startsChapter(std::int64_t time) {
-    const double soon = seconds(time + _clock.usualDuration() / 2, _plan.timeBase);
+    const double soon = seconds(time + _usualDuration / 2, _plan.timeBase);
     bool starts = false;
     for (; _nextChapter < _plan.chapterStarts.size() && _plan.chapterStarts[_nextChapter] <= soon; ++_nextChapter) {
       starts = true;
@@ -161,35 +137,97 @@ class VideoEncodeChain final : public StreamChain {
       // Only the last picture's counts; the others last until the next one.
       if (_packet->pts == _lastTime) _packet->duration = _lastDuration;
       _hasDelivered = true;
-      if (Result<void> written = _output.write(*_packet, _stream, _encoder->time_base); !written) return written;
+      if (Result<void> written = _track.write(*_packet, _encoder->time_base); !written) return written;
     }
     return code == AVERROR(EAGAIN) || code == AVERROR_EOF ? Result<void>() : conversionFailure(code, _file);
   }
 
   std::filesystem::path _file;
-  AVStream& _source;
   VideoPlan _plan;
   Orientation _orientation;
   Fields _fields;
-  CodecContext _decoder;
   CodecContext _encoder;
-  FrameClock _clock;
-  MovieOutput& _output;
-  const AVStream& _stream;
+  Track _track;
   std::optional<FilterChain> _filters;
-  Frame _decoded{av_frame_alloc()};
   Frame _filtered{av_frame_alloc()};
   Packet _packet{av_packet_alloc()};
   std::int64_t _lastTime = -1;
   std::int64_t _lastDuration = 0;
+  std::int64_t _usualDuration = 0;
   std::size_t _nextChapter = 0;
   bool _hasDelivered = false;
 };
 
+class VideoEncodeChain final : public StreamChain {
+ public:
+  VideoEncodeChain(AVStream& source, AVRational timeBase, const FrameClock& clock, CodecContext decoder,
+                   std::vector<PictureEncoder> encoders)
+      : _source(source),
+        _timeBase(timeBase),
+        _clock(clock),
+        _decoder(std::move(decoder)),
+        _encoders(std::move(encoders)) {}
+
+  Result<void> take(AVPacket& packet) override {
+    avcodec_send_packet(_decoder.get(), &packet);  // a damaged packet is one picture less
+    return receivePictures();
+  }
+
+  Result<void> finish() override {
+    avcodec_send_packet(_decoder.get(), nullptr);
+    if (Result<void> received = receivePictures(); !received) return received;
+    for (PictureEncoder& encoder : _encoders) {
+      if (Result<void> finished = encoder.finish(); !finished) return finished;
+    }
+    return {};
+  }
+
+  [[nodiscard]] bool hasDelivered() const override {
+    return std::ranges::all_of(_encoders, &PictureEncoder::hasDelivered);
+  }
+
+ private:
+  Result<void> receivePictures() {
+    while (avcodec_receive_frame(_decoder.get(), _decoded.get()) >= 0) {
+      Result<void> encoded = encode(*_decoded);
+      av_frame_unref(_decoded.get());
+      if (!encoded) return encoded;
+    }
+    return {};
+  }
+
+  Result<void> encode(AVFrame& picture) {
+    const std::int64_t shown =
+        picture.best_effort_timestamp != AV_NOPTS_VALUE ? picture.best_effort_timestamp : picture.pts;
+    const std::int64_t time =
+        _clock.place(shown == AV_NOPTS_VALUE ? shown : av_rescale_q(shown, _source.time_base, _timeBase));
+    if (time == AV_NOPTS_VALUE) return {};
+    picture.pts = time;
+    const std::int64_t duration = picture.pkt_duration > 0
+                                      ? av_rescale_q(picture.pkt_duration, _source.time_base, _timeBase)
+                                      : _clock.usualDuration();
+    for (PictureEncoder& encoder : _encoders) {
+      if (&encoder == &_encoders.back()) return encoder.take(picture, duration, _clock.usualDuration());
+      const Frame same(av_frame_clone(&picture));
+      if (!same) return failure(AVERROR(ENOMEM), {});
+      if (Result<void> taken = encoder.take(*same, duration, _clock.usualDuration()); !taken) return taken;
+    }
+    return {};
+  }
+
+  AVStream& _source;
+  AVRational _timeBase;
+  FrameClock _clock;
+  CodecContext _decoder;
+  std::vector<PictureEncoder> _encoders;
+  Frame _decoded{av_frame_alloc()};
+};
+
 }  // namespace
 
-Result<std::unique_ptr<StreamChain>> makeVideoEncodeChain(const Input& input, AVStream& source, const VideoPlan& plan,
-                                                          Fields fields, Company company, MovieOutput& output) {
+Result<std::unique_ptr<StreamChain>> makeVideoEncodeChain(const Input& input, AVStream& source,
+                                                          const std::vector<PictureTarget>& targets, Fields fields,
+                                                          Company company) {
   const std::filesystem::path& file = input.path();
   // Better to be told now than at the first picture.
   if (!hasFiltersFor(source.codecpar->color_trc, source.codecpar->color_primaries)) {
@@ -197,12 +235,20 @@ Result<std::unique_ptr<StreamChain>> makeVideoEncodeChain(const Input& input, AV
   }
   Result<CodecContext> decoder = openDecoder(source, decoderThreads(*source.codecpar), file);
   if (!decoder) return decoder.error();
-  Result<CodecContext> encoder = openEncoder(plan, videoTraits(input, source).frameRate, file);
-  if (!encoder) return encoder.error();
-  Result<AVStream*> stream = output.addStream(source, **encoder);
-  if (!stream) return stream.error();
-  return std::unique_ptr<StreamChain>(std::make_unique<VideoEncodeChain>(
-      input, source, plan, fields, company, *std::move(decoder), *std::move(encoder), output, **stream));
+  const AVRational rate = videoTraits(input, source).frameRate;
+  std::vector<PictureEncoder> encoders;
+  for (const auto& [plan, output] : targets) {
+    Result<CodecContext> encoder = openEncoder(plan, rate, file);
+    if (!encoder) return encoder.error();
+    Result<Track> track = Track::add({output}, source, **encoder);
+    if (!track) return track.error();
+    encoders.emplace_back(input, source, plan, fields, *std::move(encoder), *std::move(track));
+  }
+  const AVRational timeBase = targets.front().plan.timeBase;
+  const FrameClock clock(timeBase, rate,
+                         company == Company::Alone ? FrameClock::Start::Moved : FrameClock::Start::Lengthened);
+  return std::unique_ptr<StreamChain>(
+      std::make_unique<VideoEncodeChain>(source, timeBase, clock, *std::move(decoder), std::move(encoders)));
 }
 
 }  // namespace quilt::platform::ffmpeg

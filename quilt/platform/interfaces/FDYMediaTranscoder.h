@@ -27,6 +27,9 @@ class QUILT_EXPORT FDYMediaTranscoder {
   /// H.264 and AAC, fitted into 640 × 480.
   virtual Result<void> transcodeToSD(const Url& source, const Url& toDestination,
                                      const TranscoderProgressBlock& withProgressionBlock) = 0;
+  /// Both of these, decoding the source once. Neither file is there unless both are made.
+  virtual Result<void> transcodeToHDAndSD(const Url& source, const Url& toHDDestination, const Url& toSDDestination,
+                                          const TranscoderProgressBlock& withProgressionBlock) = 0;
 };
 
 }  // namespace quilt::platform

@@ -481,6 +481,92 @@ TEST_F(Conversion, ACopyStopsToo) {
   EXPECT_EQ(failureOf(makeMedia({}), [](float, bool& stop) { stop = true; }).kind, ErrorKind::Cancelled);
 }
 
+// Both sizes in one pass
+
+class BothGrades : public Conversion {
+ protected:
+  Result<void> convert(const fs::path& source, const TranscoderProgressBlock& block = {}) {
+    return FfmpegTranscoder().transcodeToHDAndSD(Url::fileUrl(source), Url::fileUrl(high), Url::fileUrl(standard),
+                                                 block);
+  }
+  // Packet by packet what the conversion of its own makes.
+  static void expectSame(const fs::path& made, const fs::path& alone) {
+    for (const char* streams : {"v", "a"})
+      EXPECT_EQ(support::packetChecksums(made, streams), support::packetChecksums(alone, streams)) << streams;
+    EXPECT_EQ(pictureTimes(made), pictureTimes(alone));
+    EXPECT_EQ(judge(made).chapters.size(), judge(alone).chapters.size());
+    EXPECT_EQ(judge(made).tags, judge(alone).tags);
+  }
+
+  const fs::path high = _folder / "high.m4v";
+  const fs::path standard = _folder / "standard.m4v";
+};
+
+TEST_F(BothGrades, AreWhatEachWouldBeAlone) {
+  MediaSpec spec = clip(1);
+  spec.width = 1440;
+  spec.height = 810;
+  spec.sound = "sine=frequency=440";
+  spec.audioCodec = "pcm_s16le";
+  const fs::path source = makeMedia(spec);
+  ASSERT_TRUE(convert(source));
+  expectSize(high, 1280, 720);
+  expectSize(standard, 640, 360);
+  expectSame(high, hd(source));
+  expectSame(standard, sd(source));
+}
+
+TEST_F(BothGrades, AreWhatEachWouldBeAloneForARealMovie) {
+  QUILT_CORPUS_FILE(source, "h264-aac-chapters-qt.mp4");
+  ASSERT_TRUE(convert(source));
+  expectSame(high, hd(source));
+  expectSame(standard, sd(source));
+}
+
+TEST_F(BothGrades, OneIsCopiedBesideOneThatIsEncoded) {
+  MediaSpec spec;
+  spec.width = 960;
+  spec.height = 540;
+  spec.sound = "sine=frequency=440";
+  const fs::path source = makeMedia(spec);
+  ASSERT_TRUE(convert(source));
+  EXPECT_EQ(support::packetChecksums(high, "v"), support::packetChecksums(source, "v"));
+  expectSize(standard, 640, 360);
+  expectSame(standard, sd(source));
+}
+
+TEST_F(BothGrades, ReportOnceFromZeroToAHundred) {
+  std::vector<float> reports;
+  ASSERT_TRUE(convert(longMovie(), [&](float progress, bool&) { reports.push_back(progress); }));
+  EXPECT_EQ(reports.front(), 0);
+  EXPECT_EQ(reports.back(), 100);
+  EXPECT_TRUE(std::ranges::is_sorted(reports));
+  EXPECT_EQ(std::ranges::count(reports, 100.0F), 1);
+}
+
+TEST_F(BothGrades, AreThereTogetherOrNotAtAll) {
+  const fs::path source = makeMedia(clip());
+  fs::create_directory(standard);  // the second file cannot take its place
+  ASSERT_FALSE(convert(source));
+  EXPECT_THAT(leftovers(), ElementsAre("standard.m4v"));
+  fs::remove(standard);
+  const Result<void> stopped = convert(longMovie(), [](float progress, bool& stop) { stop = progress > 0; });
+  ASSERT_FALSE(stopped);
+  EXPECT_EQ(stopped.error().kind, ErrorKind::Cancelled);
+  EXPECT_THAT(leftovers(), IsEmpty());
+}
+
+TEST_F(BothGrades, NeitherReplacesTheSource) {
+  const fs::path file = support::copyOf(makeMedia(clip()));
+  const std::string before = support::readBytes(file);
+  const Result<void> done =
+      FfmpegTranscoder().transcodeToHDAndSD(Url::fileUrl(file), Url::fileUrl(high), Url::fileUrl(file), {});
+  ASSERT_FALSE(done);
+  EXPECT_EQ(done.error().kind, ErrorKind::AlreadyExists);
+  EXPECT_EQ(support::readBytes(file), before);
+  EXPECT_THAT(leftovers(), IsEmpty());
+}
+
 TEST_F(Conversion, WorksWithoutABlock) {
   EXPECT_TRUE(
       FfmpegTranscoder().transcodeToHD(Url::fileUrl(makeMedia(clip())), Url::fileUrl(_folder / "movie.m4v"), {}));
