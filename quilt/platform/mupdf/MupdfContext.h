@@ -3,24 +3,16 @@
 
 #include <mupdf/fitz.h>
 
-#include <chrono>
-#include <cstddef>
 #include <filesystem>
 #include <functional>
-#include <memory>
 #include <string>
 #include <string_view>
 #include <utility>
 
 #include "quilt/platform/base/Result.h"
+#include "quilt/platform/mupdf/Budget.h"
 
 namespace quilt::platform::mupdf {
-
-/// The most memory that one document may take while it is looked at.
-inline constexpr std::size_t kMaximumMemory = 256 << 20;
-
-/// The longest that one step of the work on a document may take.
-inline constexpr std::chrono::seconds kMaximumTime{20};
 
 /// A use of MuPDF, which reports failures by long jumps. Shares nothing with other contexts, so any number may
 /// be used at once, each by one thread at a time. Scripts in documents are never run, and nothing is written to
@@ -38,7 +30,7 @@ class MupdfContext {
                    const std::function<void(fz_context*)>& body);
 
   /// What stops a page that is being drawn or read for text once it takes too long. For `body`.
-  fz_cookie* cookie() { return &_budget.cookie; }
+  fz_cookie* cookie() { return _budget.cookie(); }
 
   /// The C object's owner: drops it with MuPDF's function. Must not outlive the context.
   template <class T>
@@ -61,23 +53,7 @@ class MupdfContext {
   };
 
  private:
-  static constexpr auto kNever = std::chrono::steady_clock::time_point::max();
-
-  struct Budget {
-    std::size_t used = 0;
-    unsigned count = 0;
-    std::chrono::steady_clock::time_point deadline = kNever;
-    bool isLate = false;
-    fz_cookie cookie{};
-
-    bool isOver();
-  };
-  static void* allocate(void* user, std::size_t size);
-  static void* reallocate(void* user, void* old, std::size_t size);
-  static void release(void* user, void* old);
-
   Budget _budget;
-  fz_alloc_context _allocator;
   fz_context* _context;
 };
 

@@ -5,13 +5,11 @@
 #include <utility>
 
 #include "quilt/platform/interfaces/Services.h"
+#include "quilt/platform/vips/JpegWriter.h"
 
 namespace quilt::platform::vips {
 
 namespace {
-
-// At 85 a still from a movie and its JPEG cannot be told apart at viewing distance, at a tenth of the size of 100.
-constexpr int kJPEGQuality = 85;
 
 // Of 0 to 9. With differences of neighbours (the filter) a photograph takes three quarters of the bytes that level 6
 // needs without them, in less time; higher levels gain nothing on photographs.

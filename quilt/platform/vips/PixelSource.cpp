@@ -7,6 +7,7 @@
 
 #include "quilt/platform/vips/BmpReader.h"
 #include "quilt/platform/vips/IcnsReader.h"
+#include "quilt/platform/vips/JpegWriter.h"
 
 namespace quilt::platform::vips {
 
@@ -90,6 +91,8 @@ class BitmapSource final : public PixelSource {
     if (!image) return failure(ErrorKind::Damaged, "The image cannot be scaled", {});
     return image;
   }
+
+  [[nodiscard]] Result<std::optional<std::string>> plainJPEG() const override { return jpegOf(_bitmap); }
 
  private:
   [[nodiscard]] bool isOpaque() const {

@@ -95,6 +95,20 @@ TEST_F(MupdfDocumentsTest, TransparencyIsMixedWithWhite) {
   EXPECT_LE(distance(pixelAt(page, 5, 5), {128, 128, 255, 255}), 2);
 }
 
+TEST_F(MupdfDocumentsTest, APageOfTransparentGroupsIsOpaque) {
+  const std::string states = "/ExtGState << /A << /ca 0.5 >> /B << /ca 0.4 >> /C << /ca 0.3 >> >>";
+  std::vector<std::string> objects =
+      onePage("/MediaBox [0 0 100 100] /Contents 4 0 R /Resources << " + states + " /XObject << /X 5 0 R >> >>");
+  objects.push_back(streamObject("/A gs /X Do /C gs /X Do"));
+  objects.push_back(
+      streamObject("0 0 1 rg 10 10 70 70 re f /B gs 1 0 0 rg 0 0 50 50 re f",
+                   "/Type /XObject /Subtype /Form /BBox [0 0 100 100] /Group << /S /Transparency >> /Resources << " +
+                       states + " >>"));
+  const Bitmap page = draw(*openPdf(objects), 0, {100, 100});
+  for (std::size_t i = 3; i < page.pixels.size(); i += 4) ASSERT_EQ(page.pixels[i], 255) << "pixel " << i / 4;
+  EXPECT_LE(distance(pixelAt(page, 70, 50), {89, 89, 255, 255}), 2) << "0.5 × 0.7 of the white is left";
+}
+
 TEST_F(MupdfDocumentsTest, AnnotationsAreDrawn) {
   std::vector<std::string> objects = drawnPage("/MediaBox [0 0 100 100] /Annots [5 0 R]", "");
   objects.push_back("<< /Type /Annot /Subtype /Stamp /Rect [0 0 50 100] /F 4 /AP << /N 6 0 R >> >>");
@@ -145,6 +159,17 @@ TEST_F(MupdfDocumentsTest, ColumnsUnderATitleThatIsDrawnLast) {
 TEST_F(MupdfDocumentsTest, APageOfPicturesHasNoText) {
   EXPECT_EQ(textDrawn("1 0 0 rg 0 0 50 50 re f"), "");
   EXPECT_EQ(textDrawn(textAt(72, 5000, "Far off the page")), "");
+}
+
+TEST_F(MupdfDocumentsTest, OnlyWhatLiesOnThePageIsRead) {
+  const std::string onPage = textAt(72, 700, "Here");
+  for (const std::string& beyond :
+       {textAt(72, 5000, "Above"), textAt(72, -40, "Below"), textAt(-200, 400, "Left"), textAt(700, 400, "Right")}) {
+    EXPECT_EQ(textDrawn(onPage + beyond), "Here");
+    EXPECT_EQ(textDrawn(beyond + onPage), "Here");
+  }
+  // Of a line that leaves the page, the letters on it.
+  EXPECT_EQ(textDrawn(textAt(560, 700, "Cut at the edge")), "Cut at the");
 }
 
 TEST_F(MupdfDocumentsTest, LongTextIsCutAtAWholeCharacter) {
