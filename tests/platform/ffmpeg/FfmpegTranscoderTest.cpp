@@ -14,6 +14,7 @@
 #include "tests/support/ConversionTest.h"
 #include "tests/support/MediaFixtures.h"
 #include "tests/support/MediaJudge.h"
+#include "tests/support/Stopwatch.h"
 
 namespace quilt::platform {
 namespace {
@@ -419,19 +420,17 @@ class Conversion : public FfmpegTranscoderTest {
     spec.audioCodec = "pcm_s16le";
     return makeMedia(spec);
   }
-  using Clock = std::chrono::steady_clock;
-  static double since(Clock::time_point start) { return std::chrono::duration<double>(Clock::now() - start).count(); }
 };
 
 TEST_F(Conversion, ReportsFromZeroToAHundredOftenAndNeverBackwards) {
   std::vector<float> reports;
   double longest = 0;
-  auto last = Clock::now();
+  support::Stopwatch last;
   const Result<void> done = FfmpegTranscoder().transcodeToSD(
       Url::fileUrl(longMovie()), Url::fileUrl(_folder / "movie.m4v"), [&](float progress, bool&) {
         reports.push_back(progress);
-        longest = std::max(longest, since(last));
-        last = Clock::now();
+        longest = std::max(longest, last.seconds());
+        last.start();
       });
   ASSERT_TRUE(done) << done.error().text;
   EXPECT_EQ(reports.front(), 0);
@@ -445,13 +444,13 @@ TEST_F(Conversion, ReportsFromZeroToAHundredOftenAndNeverBackwards) {
 TEST_F(Conversion, StopsSoonAndLeavesNothing) {
   const fs::path source = longMovie();
   for (const float limit : {0.0F, 5.0F, 70.0F}) {
-    auto asked = Clock::now();
+    support::Stopwatch asked;
     const Error error = failureOf(source, [&](float progress, bool& stop) {
       if (progress < limit) return;
-      asked = Clock::now();
+      asked.start();
       stop = true;
     });
-    EXPECT_LT(since(asked), 0.5) << limit;
+    EXPECT_LT(asked.seconds(), 0.5) << limit;
     EXPECT_EQ(error.kind, ErrorKind::Cancelled);
     EXPECT_EQ(error.text, "The conversion was stopped.");
   }
