@@ -7,7 +7,7 @@ import {after, before, describe, test} from 'node:test';
 import {fileUrl} from './browser.mjs';
 import {launchFirefox} from './firefox.mjs';
 import {Served, whyNoProgram} from './served.mjs';
-import {fixtures, kShots} from './support.mjs';
+import {fixtures, inRealTime, kShots} from './support.mjs';
 
 const kProgram = process.env.FIREFOX || '/usr/bin/firefox-esr';
 
@@ -40,7 +40,7 @@ describe('in Firefox', {skip: existsSync(kProgram) ? false : `${kProgram} is not
     assert.deepEqual(firefox.requests, []);
   });
 
-  test('two streams stay together', async () => {
+  test('two streams stay together', (context) => inRealTime(context, async () => {
     await firefox.goto(fileUrl(course.folder, '#item=' + course.items[1]));
     await firefox.until(() => document.querySelector('.big-play'));
     await firefox.click('.big-play');
@@ -49,7 +49,7 @@ describe('in Firefox', {skip: existsSync(kProgram) ? false : `${kProgram} is not
     await new Promise((resolve) => setTimeout(resolve, 3500));
     const apart = await firefox.evaluate(() => { const [first, second] = document.querySelectorAll('video'); return Math.abs(first.currentTime - second.currentTime); });
     assert.ok(apart <= 0.08, `${apart} s`);
-  });
+  }));
 
   test('a served document is edited in its page, and shows what is edited elsewhere', {skip: whyNoProgram}, async () => {
     const media = (name) => join(process.env.QUILT_BROWSER_BUILD, 'media', name);

@@ -132,7 +132,7 @@ describe('a served document', {skip: whyNoProgram}, () => {
 
   test('is edited in the titles of its sources', () => visit(async (page) => {
     await page.click('.part-box summary');
-    assert.equal(await page.locator('.part').count(), 3, 'two pictures and the voice');
+    await until(page, () => document.querySelectorAll('.part').length === 3);  // two pictures and the voice
     await edit(page, '.part:nth-child(2) .of-title', 'The old gate');
     assert.equal(itemOnDisk(2).Sources[1].Title, 'The old gate');
     await until(page, () => [...document.querySelectorAll('#panel-chapters .row-title')].some((row) => row.textContent === 'The old gate'));

@@ -2,14 +2,14 @@
 // Large packages stay quick.
 import assert from 'node:assert/strict';
 import {describe, test} from 'node:test';
-import {fixtures, useBrowser} from './support.mjs';
+import {fixtures, inRealTime, useBrowser} from './support.mjs';
 
 const shared = useBrowser();
 
 describe('five hundred items', () => {
   const many = fixtures.many();
 
-  test('appear within a second, scroll and are searched at once', (context) => shared.visit(many, async (page) => {
+  test('appear within a second, scroll and are searched at once', (context) => inRealTime(context, () => shared.visit(many, async (page) => {
     const paint = await page.evaluate(() => new Promise((resolve) => new PerformanceObserver((list) => resolve(list.getEntries()[0].startTime)).observe({type: 'paint', buffered: true})));
     assert.equal(await page.locator('.card').count(), 500);
     const timing = await page.evaluate(() => {
@@ -41,9 +41,9 @@ describe('five hundred items', () => {
     });
     context.diagnostic(`scrolling: middle ${frames[20].toFixed(0)} ms, worst ${frames[39].toFixed(0)} ms a frame`);
     assert.ok(frames[20] < 100, `${frames[20]} ms a frame`);
-  }));
+  })));
 
-  test('open quickly, with the list at the present one', (context) => shared.visit(many, async (page) => {
+  test('open quickly, with the list at the present one', (context) => inRealTime(context, () => shared.visit(many, async (page) => {
     await page.waitForSelector('.side .row[aria-current]');
     const row = await page.locator('.side .row[aria-current]').boundingBox();
     assert.ok(row.y > 0 && row.y < 800, `${row.y}`);
@@ -55,5 +55,5 @@ describe('five hundred items', () => {
     }, many.items[10]);
     context.diagnostic(`next item after ${took.toFixed(0)} ms`);
     assert.ok(took < 500, `${took} ms`);
-  }, {hash: '#item=' + many.items[400]}));
+  }, {hash: '#item=' + many.items[400]})));
 });

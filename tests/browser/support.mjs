@@ -32,6 +32,18 @@ export function useBrowser() {
   return shared;
 }
 
+/// Runs what a machine has to keep up with. Others may hold it up in the middle, so a failure is tried again, twice.
+export async function inRealTime(context, body) {
+  for (let attempt = 1; ; ++attempt) {
+    try {
+      return await body();
+    } catch (error) {
+      if (attempt === 3) throw error;
+      context.diagnostic(`tried again: ${error.message}`);
+    }
+  }
+}
+
 /// What the player says.
 export const playerState = (page) => page.evaluate(() => {
   const player = window.Olive.app.stage.player;

@@ -4,7 +4,7 @@ import assert from 'node:assert/strict';
 import {dirname} from 'node:path';
 import {describe, test} from 'node:test';
 import {serve} from './browser.mjs';
-import {fixtures, start, until, useBrowser} from './support.mjs';
+import {fixtures, inRealTime, start, until, useBrowser} from './support.mjs';
 
 const kOffset = 2;      // seconds at which the second stream begins
 const kBound = 0.08;    // seconds
@@ -55,9 +55,11 @@ const stall = (page, index) => page.evaluate((i) => {
   video.currentTime -= 0.3 * window.Olive.app.stage.player.speed;
 }, index);
 
+const testInRealTime = (name, body) => test(name, (context) => inRealTime(context, () => body(context)));
+
 describe('a lecture', () => {
   for (const speed of [0.5, 1, 2]) {
-    test(`is together again 3 s after either stream stalled for 300 ms at ${speed}x`, (context) => shared.visit(lecture, async (page) => {
+    testInRealTime(`is together again 3 s after either stream stalled for 300 ms at ${speed}x`, (context) => shared.visit(lecture, async (page) => {
       await playAt(page, speed);
       const before = await distances(page);
       assert.ok(Math.abs(middle(before)) <= kBound, 'together before');
@@ -74,7 +76,7 @@ describe('a lecture', () => {
     }));
   }
 
-  test('is brought back by one seek when it is far off', () => shared.visit(lecture, async (page) => {
+  testInRealTime('is brought back by one seek when it is far off', () => shared.visit(lecture, async (page) => {
     await playAt(page, 1);
     await page.evaluate(() => {
       const video = document.querySelectorAll('video')[1];
@@ -87,7 +89,7 @@ describe('a lecture', () => {
     assert.equal(await page.evaluate(() => window.seeks), 1);
   }));
 
-  test('waits as a whole while one stream has no data', async () => {
+  testInRealTime('waits as a whole while one stream has no data', async () => {
     let goOn;
     const gate = new Promise((resolve) => { goOn = resolve; });
     const server = await serve(dirname(lecture.folder), {}, {file: lecture.data.Media[0].Sources[1].Derivatives[0].Filename, share: 0.2, gate});
@@ -114,7 +116,7 @@ describe('a lecture', () => {
     }
   });
 
-  test('keeps the last picture of the shorter stream while the longer one ends', () => shared.visit(lecture, async (page) => {
+  testInRealTime('keeps the last picture of the shorter stream while the longer one ends', () => shared.visit(lecture, async (page) => {
     await page.evaluate(() => window.Olive.app.stage.player.seek(81));
     await start(page);
     await until(page, () => window.Olive.app.stage.player.time > 83.5);
@@ -124,7 +126,7 @@ describe('a lecture', () => {
     assert.ok(second.time > 79.5);
   }));
 
-  test('rests the stream that is not shown and takes it to the present time', () => shared.visit(lecture, async (page) => {
+  testInRealTime('rests the stream that is not shown and takes it to the present time', () => shared.visit(lecture, async (page) => {
     await playAt(page, 1);
     await page.click('button[data-view="first"]');
     assert.deepEqual(await page.evaluate(() => [...document.querySelectorAll('video')].map((video) => video.paused)), [false, true]);
