@@ -66,11 +66,11 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
   void setUuid(std::string uuid) { _uuid.set(std::move(uuid)); }
   /// The package folder; empty while the document has none. Setting moves nothing on disk.
   Path path() const { return _path.get(); }
+  void setPath(Path path) { _path.set(std::move(path)); }
   /// path() as text, which is a tenth of the cost.
   std::string folder() const {
     return _path.with([](const Path& path) { return path.native(); });
   }
-  void setPath(Path path) { _path.set(std::move(path)); }
   /// The extension of the package's folder, as initWithPath() found it; none otherwise.
   Text uti() const { return _uti.get(); }
   void setUti(Text uti) { _uti.set(std::move(uti)); }
