@@ -38,12 +38,6 @@ double milliseconds(const std::function<void()>& job) {
   return std::chrono::duration<double, std::milli>(std::chrono::steady_clock::now() - start).count();
 }
 
-double bestOf(int runs, const std::function<void()>& job) {
-  double best = 1e12;
-  for (int run = 0; run < runs; ++run) best = std::min(best, milliseconds(job));
-  return best;
-}
-
 /// A property list as libplist holds it; nothing where that is not installed.
 class Peer {
  public:
@@ -222,7 +216,7 @@ void compareSaving(const fs::path& folder, int items) {
   }
   std::printf("%d items, dictionary to JSON: %.3f ms", items, best[4]);
   printRatio("nlohmann", best[4], best[5]);
-  std::printf("\n%d items, save: %.3f ms\n", items, bestOf(5, [&] { opened->update(); }));
+  std::printf("\n%d items, save: %.3f ms\n", items, bestOfEach(5, {[&] { opened->update(); }})[0]);
 }
 
 }  // namespace

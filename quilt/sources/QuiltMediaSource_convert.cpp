@@ -136,14 +136,17 @@ bool QuiltMediaSource::convertMovie(const std::string& format, const Progression
   const bool isOtherNext = std::find(followedBy.begin(), followedBy.end(), other) != followedBy.end();
   Path otherFile;
   if (isOtherNext && !derivativeWithFormat(other) && isBetter(*main, other)) otherFile = newHiddenFile("m4v");
-  const Url otherDestination = Url::fileUrl(otherFile);
 
-  const auto made =
-      otherFile.empty()
-          ? (format == k720p ? transcoder.transcodeToHD(*url, destination, stopWhenCancelled(block))
-                             : transcoder.transcodeToSD(*url, destination, stopWhenCancelled(block)))
-          : transcoder.transcodeToHDAndSD(*url, format == k720p ? destination : otherDestination,
-                                          format == k720p ? otherDestination : destination, stopWhenCancelled(block));
+  const auto transcode = [&, stop = stopWhenCancelled(block)] {
+    const bool isHigh = format == k720p;
+    if (otherFile.empty())
+      return isHigh ? transcoder.transcodeToHD(*url, destination, stop)
+                    : transcoder.transcodeToSD(*url, destination, stop);
+    const Url otherDestination = Url::fileUrl(otherFile);
+    return transcoder.transcodeToHDAndSD(*url, isHigh ? destination : otherDestination,
+                                         isHigh ? otherDestination : destination, stop);
+  };
+  const auto made = transcode();
   if (!made) {
     // The line names HD for both sizes.
     FDYLogger::logCritical("Failed to convert video at URL \"%@\" to HD: \"%@\"", url, made.error());

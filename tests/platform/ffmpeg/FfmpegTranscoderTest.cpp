@@ -32,14 +32,19 @@ using ::testing::SizeIs;
 
 using FfmpegTranscoderTest = support::ConversionTest;
 
-// What comes out
-
-TEST_F(FfmpegTranscoderTest, AMovieBecomesH264AndAacInEachSize) {
-  MediaSpec spec = clip(1);
+// The clip with sound, as a movie of which both sizes have to be encoded.
+MediaSpec largerThanBothSizes(MediaSpec spec) {
   spec.width = 1440;
   spec.height = 810;
   spec.sound = "sine=frequency=440";
   spec.audioCodec = "pcm_s16le";
+  return spec;
+}
+
+// What comes out
+
+TEST_F(FfmpegTranscoderTest, AMovieBecomesH264AndAacInEachSize) {
+  const MediaSpec spec = largerThanBothSizes(clip(1));
   for (const bool isHigh : {true, false}) {
     const fs::path file = isHigh ? hd(spec) : sd(spec);
     expectSize(file, isHigh ? 1280 : 640, isHigh ? 720 : 360);
@@ -502,12 +507,7 @@ class BothGrades : public Conversion {
 };
 
 TEST_F(BothGrades, AreWhatEachWouldBeAlone) {
-  MediaSpec spec = clip(1);
-  spec.width = 1440;
-  spec.height = 810;
-  spec.sound = "sine=frequency=440";
-  spec.audioCodec = "pcm_s16le";
-  const fs::path source = makeMedia(spec);
+  const fs::path source = makeMedia(largerThanBothSizes(clip(1)));
   ASSERT_TRUE(convert(source));
   expectSize(high, 1280, 720);
   expectSize(standard, 640, 360);
