@@ -2,14 +2,24 @@
 // The page: its head, the opening page, the page of an item, and the way between them.
 'use strict';
 
-(function (Olive) {
+((Olive) => {
   const {make, say} = Olive;
-  const kNoteEvery = 1000;  // ms
+  const kNoteEvery = 1000; // ms
 
-  Olive.start = function (data) {
-    const root = document.documentElement, app = document.getElementById('app');
+  Olive.start = (data) => {
+    const root = document.documentElement,
+      app = document.getElementById('app');
     const memory = Olive.openMemory(typeof data.UUID === 'string' ? data.UUID : 'package');
-    let pack, find, printAll, stage = null, current = null, frame = null, query = '', terms = [], lastNote = 0, view;
+    let pack,
+      find,
+      printAll,
+      stage = null,
+      current = null,
+      frame = null,
+      query = '',
+      terms = [],
+      lastNote = 0,
+      view;
 
     const screen = Olive.makeFrameControl(() => (stage ? {stage, frame} : {stage: null, frame: null}));
     const isLonely = () => pack.items.length === 1;
@@ -26,16 +36,39 @@
     // --- the head
 
     function makeHead() {
-      const head = make('header', {class: 'head'},
-        make('a', {class: 'brand', href: '#', onclick: (event) => {
-          event.preventDefault();
-          goHome();
-        }}, Olive.icon('home'), make('span', {dir: 'auto', 'data-title-of': pack.id, text: pack.title || say('untitledPackage')})),
-        make('div', {class: 'head-tools'},
-          make('button', {type: 'button', class: 'search-button', onclick: openSearch, 'aria-label': say('search')}, Olive.icon('search'), make('span', {text: say('search')}), make('kbd', {text: '/', 'aria-hidden': 'true'})),
+      const head = make(
+        'header',
+        {class: 'head'},
+        make(
+          'a',
+          {
+            class: 'brand',
+            href: '#',
+            onclick: (event) => {
+              event.preventDefault();
+              goHome();
+            },
+          },
+          Olive.icon('home'),
+          make('span', {dir: 'auto', 'data-title-of': pack.id, text: pack.title || say('untitledPackage')}),
+        ),
+        make(
+          'div',
+          {class: 'head-tools'},
+          make(
+            'button',
+            {type: 'button', class: 'search-button', onclick: openSearch, 'aria-label': say('search')},
+            Olive.icon('search'),
+            make('span', {text: say('search')}),
+            make('kbd', {text: '/', 'aria-hidden': 'true'}),
+          ),
           Olive.iconButton('print', say('print'), () => printAll(), {class: 'icon-button wide-only'}),
-          Olive.iconButton('settings', say('settings'), () => Olive.openSettings(memory, apply), {class: 'icon-button settings-button'}),
-          Olive.iconButton('help', say('help'), () => api.openHelp())));
+          Olive.iconButton('settings', say('settings'), () => Olive.openSettings(memory, apply), {
+            class: 'icon-button settings-button',
+          }),
+          Olive.iconButton('help', say('help'), () => api.openHelp()),
+        ),
+      );
       return head;
     }
 
@@ -45,10 +78,19 @@
       find = Olive.makeFinder(pack.items);
       printAll = Olive.preparePrinting(pack);
       view = make('main', {id: 'main', tabindex: -1});
-      app.replaceChildren(make('a', {class: 'skip', href: '#main', text: say('skip'), onclick: (event) => {
-        event.preventDefault();
-        view.focus();
-      }}), makeHead(), view);
+      app.replaceChildren(
+        make('a', {
+          class: 'skip',
+          href: '#main',
+          text: say('skip'),
+          onclick: (event) => {
+            event.preventDefault();
+            view.focus();
+          },
+        }),
+        makeHead(),
+        view,
+      );
     }
 
     // Shows the choices of the reader; anew when words or marks on the page change.
@@ -56,7 +98,8 @@
       const appearance = memory.choice('appearance', 'system');
       root.dataset.appearance = appearance;
       root.dataset.motion = memory.choice('motion', true) ? 'on' : 'off';
-      document.querySelector('meta[name=color-scheme]').content = appearance === 'light' ? 'light' : appearance === 'system' ? 'light dark' : 'dark';
+      document.querySelector('meta[name=color-scheme]').content =
+        appearance === 'light' ? 'light' : appearance === 'system' ? 'light dark' : 'dark';
       if (!isAnew) return;
       tell('leave');
       note(true);
@@ -87,26 +130,42 @@
       const panels = [];
       const lists = {};
       stage = Olive.makeStage(item, {
-        memory, start, frameButtons: screen.buttons, note: () => note(true), focus: () => frame.focus({preventScroll: true}), terms: () => terms,
+        memory,
+        start,
+        frameButtons: screen.buttons,
+        note: () => note(true),
+        focus: () => frame.focus({preventScroll: true}),
+        terms: () => terms,
         again: () => showItem(item, {...Olive.address.read(), play: false}),
-        onPage: (index) => lists.pages && lists.pages.follow(index),
+        onPage: (index) => lists.pages?.follow(index),
       });
       const chapters = stage.player ? item.chapters : [];
       if (chapters.length > 1) {
         lists.chapters = Olive.makeChapters(chapters, (seconds) => stage.player.seek(seconds));
-        panels.push({name: 'chapters', label: say(item.category === 'Montage' ? 'stills' : 'chapters'), content: lists.chapters.element});
+        panels.push({
+          name: 'chapters',
+          label: say(item.category === 'Montage' ? 'stills' : 'chapters'),
+          content: lists.chapters.element,
+        });
       }
       if (stage.pager && item.pages.length > 1) {
         lists.pages = Olive.makePages(item.pages, (index) => stage.pager.go(index));
         panels.push({name: 'pages', label: say('pages'), content: lists.pages.element});
       }
-      if (!isLonely()) panels.push({name: 'contents', label: say('contents'), content: Olive.makeContents(pack.items, item, memory)});
+      if (!isLonely())
+        panels.push({name: 'contents', label: say('contents'), content: Olive.makeContents(pack.items, item, memory)});
 
-      frame = make('section', {class: 'player', tabindex: -1, 'aria-label': say('player')}, stage.element, stage.controls);
+      frame = make(
+        'section',
+        {class: 'player', tabindex: -1, 'aria-label': say('player')},
+        stage.element,
+        stage.controls,
+      );
       view.className = 'item' + (panels.length ? '' : ' alone');
       view.replaceChildren(
         make('div', {class: 'main-column'}, frame, makeAbout(item)),
-        ...(panels.length ? [makePanels(panels)] : []));
+        ...(panels.length ? [makePanels(panels)] : []),
+      );
       if (stage.player) watch(stage.player, lists.chapters);
       mediaSession(item);
       tell('shown');
@@ -118,28 +177,96 @@
     function makeAbout(item) {
       const [previous, next] = [neighbour(-1), neighbour(1)];
       const extras = item.extras.filter((extra) => extra.files.some((file) => file.address || file.link));
-      const link = (other, label, icon) => other && make('a', {class: 'neighbour ' + label, href: Olive.address.to({item: other.id}), rel: label === 'nextItem' ? 'next' : 'prev'},
-        Olive.icon(icon), make('span', null, make('span', {class: 'meta', text: say(label)}), make('span', {class: 'row-title', dir: 'auto', 'data-title-of': other.id, text: other.title})));
-      return make('section', {class: 'about', 'aria-labelledby': 'item-title'},
-        make('div', {class: 'about-head'},
-          make('div', null,
+      const link = (other, label, icon) =>
+        other &&
+        make(
+          'a',
+          {
+            class: 'neighbour ' + label,
+            href: Olive.address.to({item: other.id}),
+            rel: label === 'nextItem' ? 'next' : 'prev',
+          },
+          Olive.icon(icon),
+          make(
+            'span',
+            null,
+            make('span', {class: 'meta', text: say(label)}),
+            make('span', {class: 'row-title', dir: 'auto', 'data-title-of': other.id, text: other.title}),
+          ),
+        );
+      return make(
+        'section',
+        {class: 'about', 'aria-labelledby': 'item-title'},
+        make(
+          'div',
+          {class: 'about-head'},
+          make(
+            'div',
+            null,
             make('h1', {id: 'item-title', dir: 'auto', 'data-title-of': item.id, text: item.title}),
-            make('p', {class: 'meta'}, Olive.icon(item.category || 'warning'),
-                 [Olive.kindOf(item), item.duration ? Olive.clock(item.duration) : '', item.pages.length ? say('pageCount', {n: item.pages.length}) : ''].filter(Boolean).join(' · '))),
-          Olive.iconButton('link', say('copyLink'), copyLink)),
+            make(
+              'p',
+              {class: 'meta'},
+              Olive.icon(item.category || 'warning'),
+              [
+                Olive.kindOf(item),
+                item.duration ? Olive.clock(item.duration) : '',
+                item.pages.length ? say('pageCount', {n: item.pages.length}) : '',
+              ]
+                .filter(Boolean)
+                .join(' · '),
+            ),
+          ),
+          Olive.iconButton('link', say('copyLink'), copyLink),
+        ),
         make('div', {class: 'description'}, Olive.paragraphs(item.description)),
         extras.length > 0 && make('div', null, make('h2', {text: say('extras')}), Olive.makeExtras(extras)),
-        (previous || next) && make('nav', {class: 'neighbours', 'aria-label': say('neighbours')},
-          link(previous, 'previousItem', 'left') || make('span'), link(next, 'nextItem', 'right')));
+        (previous || next) &&
+          make(
+            'nav',
+            {class: 'neighbours', 'aria-label': say('neighbours')},
+            link(previous, 'previousItem', 'left') || make('span'),
+            link(next, 'nextItem', 'right'),
+          ),
+      );
     }
 
     // Tabs, when there is more than one list beside the stage.
     function makePanels(panels) {
       const name = memory.choice('panel', '');
       const open = panels.find((panel) => panel.name === name) || panels[0];
-      const boxes = panels.map((panel) => make('div', {class: 'panel', id: 'panel-' + panel.name, role: panels.length > 1 ? 'tabpanel' : 'region', 'aria-label': panel.label, hidden: panel !== open}, panel.content));
-      if (panels.length === 1) return make('aside', {class: 'side', 'aria-label': panels[0].label}, make('h2', {class: 'side-title', text: panels[0].label}), boxes);
-      const tabs = panels.map((panel, i) => make('button', {type: 'button', role: 'tab', class: 'tab', 'aria-controls': 'panel-' + panel.name, 'aria-selected': panel === open, tabindex: panel === open ? 0 : -1, text: panel.label, onclick: () => select(i)}));
+      const boxes = panels.map((panel) =>
+        make(
+          'div',
+          {
+            class: 'panel',
+            id: 'panel-' + panel.name,
+            role: panels.length > 1 ? 'tabpanel' : 'region',
+            'aria-label': panel.label,
+            hidden: panel !== open,
+          },
+          panel.content,
+        ),
+      );
+      if (panels.length === 1)
+        return make(
+          'aside',
+          {class: 'side', 'aria-label': panels[0].label},
+          make('h2', {class: 'side-title', text: panels[0].label}),
+          boxes,
+        );
+      const tabs = panels.map((panel, i) =>
+        make('button', {
+          type: 'button',
+          role: 'tab',
+          class: 'tab',
+          'aria-controls': 'panel-' + panel.name,
+          'aria-selected': panel === open,
+          tabindex: panel === open ? 0 : -1,
+          text: panel.label,
+          onclick: () => select(i),
+        }),
+      );
       function select(index) {
         memory.choose('panel', panels[index].name);
         tabs.forEach((tab, i) => {
@@ -150,14 +277,23 @@
         Olive.reveal(boxes[index].querySelector('[aria-current]'));
         tabs[index].focus();
       }
-      const bar = make('div', {class: 'tabs', role: 'tablist', 'aria-label': say('lists'), onkeydown: (event) => {
-        const forward = root.dir === 'rtl' ? -1 : 1;
-        const step = {ArrowRight: forward, ArrowLeft: -forward}[event.key];
-        if (!step) return;
-        event.preventDefault();
-        event.stopPropagation();
-        select((tabs.indexOf(document.activeElement) + step + tabs.length) % tabs.length);
-      }}, tabs);
+      const bar = make(
+        'div',
+        {
+          class: 'tabs',
+          role: 'tablist',
+          'aria-label': say('lists'),
+          onkeydown: (event) => {
+            const forward = root.dir === 'rtl' ? -1 : 1;
+            const step = {ArrowRight: forward, ArrowLeft: -forward}[event.key];
+            if (!step) return;
+            event.preventDefault();
+            event.stopPropagation();
+            select((tabs.indexOf(document.activeElement) + step + tabs.length) % tabs.length);
+          },
+        },
+        tabs,
+      );
       return make('aside', {class: 'side', 'aria-label': say('lists')}, bar, boxes);
     }
 
@@ -173,7 +309,8 @@
         if (session) session.playbackState = player.isPlaying ? 'playing' : 'paused';
       });
       player.addEventListener('ended', () => {
-        if (current.category !== 'Image' && current.category !== 'Document') memory.keep(current, {done: true, time: 0, share: 1});
+        if (current.category !== 'Image' && current.category !== 'Document')
+          memory.keep(current, {done: true, time: 0, share: 1});
         if (memory.choice('advance', false) && neighbour(1)) offerNext();
       });
     }
@@ -186,32 +323,53 @@
         clearTimeout(timer);
         box.remove();
       };
-      const box = make('div', {class: 'cover up-next', role: 'status'}, make('div', {class: 'cover-actions'},
-        make('p', {text: say('upNext', {title: next.title})}),
-        make('button', {type: 'button', class: 'primary', text: say('playNow'), onclick: () => {
-          cancel();
-          open(next, true);
-        }}),
-        make('button', {type: 'button', class: 'quiet', text: say('cancel'), onclick: cancel})));
+      const box = make(
+        'div',
+        {class: 'cover up-next', role: 'status'},
+        make(
+          'div',
+          {class: 'cover-actions'},
+          make('p', {text: say('upNext', {title: next.title})}),
+          make('button', {
+            type: 'button',
+            class: 'primary',
+            text: say('playNow'),
+            onclick: () => {
+              cancel();
+              open(next, true);
+            },
+          }),
+          make('button', {type: 'button', class: 'quiet', text: say('cancel'), onclick: cancel}),
+        ),
+      );
       stage.element.append(box);
       stage.cancelNext = cancel;
-      stage.player.addEventListener('state', () => { if (stage && stage.player && stage.player.isPlaying) cancel(); });
+      stage.player.addEventListener('state', () => {
+        if (stage?.player?.isPlaying) cancel();
+      });
     }
 
     function mediaSession(item) {
       const session = navigator.mediaSession;
       if (!session || !window.MediaMetadata) return;
-      session.metadata = stage.player ? new MediaMetadata({title: item.title, artist: pack.author, album: pack.title}) : null;
-      const act = stage.transport && stage.transport.actions, player = stage.player;
+      session.metadata = stage.player
+        ? new MediaMetadata({title: item.title, artist: pack.author, album: pack.title})
+        : null;
+      const act = stage.transport?.actions,
+        player = stage.player;
       const handlers = {
-        play: () => player.play(), pause: () => player.pause(), seekbackward: () => act.skip(-10), seekforward: () => act.skip(10),
+        play: () => player.play(),
+        pause: () => player.pause(),
+        seekbackward: () => act.skip(-10),
+        seekforward: () => act.skip(10),
         seekto: (detail) => player.seek(detail.seekTime),
-        previoustrack: neighbour(-1) && (() => step(-1)), nexttrack: neighbour(1) && (() => step(1)),
+        previoustrack: neighbour(-1) && (() => step(-1)),
+        nexttrack: neighbour(1) && (() => step(1)),
       };
       for (const [name, handler] of Object.entries(handlers)) {
         try {
           session.setActionHandler(name, player && handler ? handler : null);
-        } catch (error) {
+        } catch {
           // an action that this browser does not know
         }
       }
@@ -221,7 +379,7 @@
       if (!stage) return;
       keepPlace();
       const left = stage;
-      stage = null;  // what it still says is no news
+      stage = null; // what it still says is no news
       if (left.cancelNext) left.cancelNext();
       left.close();
       current = null;
@@ -236,8 +394,12 @@
       if (!stage || !stage.element.isConnected || (!isAtOnce && now - lastNote < kNoteEvery)) return;
       lastNote = now;
       const seconds = stage.player ? Math.round(stage.player.time * 10) / 10 : 0;
-      Olive.address.note({item: isLonely() && !seconds && !stage.pager ? '' : current.id, t: seconds || undefined,
-                          page: stage.pager && stage.pager.index >= 0 ? stage.pager.index + 1 : undefined, view: stage.view ? stage.view.value : undefined});
+      Olive.address.note({
+        item: isLonely() && !seconds && !stage.pager ? '' : current.id,
+        t: seconds || undefined,
+        page: stage.pager && stage.pager.index >= 0 ? stage.pager.index + 1 : undefined,
+        view: stage.view ? stage.view.value : undefined,
+      });
       keepPlace();
     }
 
@@ -245,7 +407,11 @@
       const player = stage.player;
       if (player && player.time > 0 && !stage.pager && !player.hasEnded) {
         const share = player.duration ? player.time / player.duration : 0;
-        memory.keep(current, {time: player.time, share, ...(share > 0.97 ? {done: true} : player.isPlaying ? {done: false} : {})});
+        memory.keep(current, {
+          time: player.time,
+          share,
+          ...(share > 0.97 ? {done: true} : player.isPlaying ? {done: false} : {}),
+        });
       }
     }
 
@@ -274,7 +440,7 @@
 
     function step(by) {
       const other = neighbour(by);
-      if (other) open(other, stage && stage.player && stage.player.isPlaying);
+      if (other) open(other, stage?.player?.isPlaying);
     }
 
     function goHome() {
@@ -290,7 +456,7 @@
         await navigator.clipboard.writeText(location.href);
         Olive.announce(say('linkCopied'));
         toast(say('linkCopied'));
-      } catch (error) {
+      } catch {
         Olive.openLink(location.href);
       }
     }
@@ -316,7 +482,15 @@
     }
 
     const api = {
-      ...screen, stage: () => stage, frame: () => frame, isOn: () => memory.choice('keys', true), step, copyLink, openSearch, goHome, leave,
+      ...screen,
+      stage: () => stage,
+      frame: () => frame,
+      isOn: () => memory.choice('keys', true),
+      step,
+      copyLink,
+      openSearch,
+      goHome,
+      leave,
       nextView() {
         if (!stage || !stage.view) return;
         const names = ['side', 'corner', 'first', 'second'];
@@ -335,9 +509,15 @@
     // For the console, and for what lives beside the page.
     Olive.app = {
       memory,
-      get pack() { return pack; },
-      get item() { return current; },
-      get stage() { return stage; },
+      get pack() {
+        return pack;
+      },
+      get item() {
+        return current;
+      },
+      get stage() {
+        return stage;
+      },
       wordsChanged() {
         find = Olive.makeFinder(pack.items);
         nameWindow();

@@ -3,14 +3,14 @@
 // fade while nobody moves.
 'use strict';
 
-(function (Olive) {
+((Olive) => {
   const {say} = Olive;
-  const kIdleAfter = 2500;  // ms
+  const kIdleAfter = 2500; // ms
   const root = document.documentElement;
   const has = (name) => root.classList.contains(name);
 
   // now(): {frame, stage} of the item on the page, or nulls.
-  Olive.makeFrameControl = function (now) {
+  Olive.makeFrameControl = (now) => {
     let idle = 0;
 
     const control = {
@@ -21,7 +21,7 @@
         if (!frame) return;
         if (document.fullscreenElement) document.exitFullscreen();
         else if (document.fullscreenEnabled) frame.requestFullscreen().catch(control.togglePresenting);
-        else control.togglePresenting();  // the window is all that this browser gives
+        else control.togglePresenting(); // the window is all that this browser gives
       },
 
       togglePresenting() {
@@ -37,7 +37,7 @@
 
       togglePictureInPicture() {
         const {stage} = now();
-        const video = stage && stage.elements && stage.elements.find((element) => element.localName === 'video');
+        const video = stage?.elements?.find((element) => element.localName === 'video');
         if (!video || !document.pictureInPictureEnabled) return;
         if (document.pictureInPictureElement) document.exitPictureInPicture();
         else video.requestPictureInPicture().catch(() => Olive.announce(say('notPossible')));
@@ -62,7 +62,8 @@
 
       // The buttons for an item with these media elements.
       buttons: (elements) => [
-        document.pictureInPictureEnabled && elements.some((element) => element.localName === 'video') &&
+        document.pictureInPictureEnabled &&
+          elements.some((element) => element.localName === 'video') &&
           Olive.iconButton('pip', say('pip'), control.togglePictureInPicture, {class: 'icon-button pip wide-only'}),
         Olive.iconButton('present', say('present'), control.togglePresenting, {class: 'icon-button wide-only'}),
         Olive.iconButton('full', say('fullscreen'), control.toggleFullscreen, {class: 'icon-button fullscreen'}),
@@ -71,7 +72,9 @@
 
     for (const name of ['pointermove', 'pointerdown']) document.addEventListener(name, control.wake, {passive: true});
     // A clicker's keys turn pages without bringing the controls back.
-    document.addEventListener('keydown', (event) => { if (!has('presenting') || event.key === 'Tab') control.wake(); });
+    document.addEventListener('keydown', (event) => {
+      if (!has('presenting') || event.key === 'Tab') control.wake();
+    });
     document.addEventListener('fullscreenchange', () => {
       control.wake();
       const button = document.querySelector('.fullscreen');

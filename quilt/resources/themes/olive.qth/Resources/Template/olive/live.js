@@ -3,13 +3,14 @@
 // package from disk has no `conveyor`, and nothing here runs.
 'use strict';
 
-(function (Olive) {
+((Olive) => {
   if (!window.conveyor) return;
   const {make, say} = Olive;
-  const kAtOnce = 4;  // calls
-  const kRetryAfter = 500;  // ms
+  const kAtOnce = 4; // calls
+  const kRetryAfter = 500; // ms
   // What the program answers for a document without a description.
-  const kNoDescription = 'Lorem ipsum dolor sit amet, consectetur adipiscing elit. In id laoreet arcu. Sed luctus velit ac lorem tincidunt tincidunt. Pellentesque vitae diam vitae leo cursus sodales. Sed non tortor eget libero malesuada elementum eu non elit. Quisque malesuada pellentesque porttitor.';
+  const kNoDescription =
+    'Lorem ipsum dolor sit amet, consectetur adipiscing elit. In id laoreet arcu. Sed luctus velit ac lorem tincidunt tincidunt. Pellentesque vitae diam vitae leo cursus sodales. Sed non tortor eget libero malesuada elementum eu non elit. Quisque malesuada pellentesque porttitor.';
   const kMoved = ['cvMediaCount', 'cvSourcesCount', 'cvAudioCommentarySource'];
 
   // One text of one object of the model. Tells of a 'change' whenever it says something else.
@@ -19,7 +20,7 @@
       this.object = null;
       this.value = value;
       this.name = name;
-      this.again = again;  // gets the object anew
+      this.again = again; // gets the object anew
       this.reading = null;
       this.isOld = false;
     }
@@ -60,13 +61,15 @@
     }
   }
 
-  Olive.goLive = function (app) {
+  Olive.goLive = (app) => {
     const root = document.documentElement;
-    const texts = new Map();  // by the object's identity and the text's name
-    const owners = new Map();  // an object of the model → its identity
-    let items = new Map();  // an item's identity → its object
-    let shown = [];  // what the page shows editable
-    let isThere = false, binding = null, toggle = null;
+    const texts = new Map(); // by the object's identity and the text's name
+    const owners = new Map(); // an object of the model → its identity
+    let items = new Map(); // an item's identity → its object
+    let shown = []; // what the page shows editable
+    let isThere = false,
+      binding = null,
+      toggle = null;
 
     // --- the model
 
@@ -87,17 +90,19 @@
     // Lets an object of the model answer for the texts of what the page knows under the same identity.
     function hold(object, thing, names) {
       owners.set(object, thing.id);
-      return Promise.all(names.map((name) => {
-        const text = textOf(thing, name);
-        text.object = object;
-        return text.refresh();
-      }));
+      return Promise.all(
+        names.map((name) => {
+          const text = textOf(thing, name);
+          text.object = object;
+          return text.refresh();
+        }),
+      );
     }
 
     async function holdItem(document_, item) {
       if (items.has(item.id)) return;
       const object = await document_.cvMediaAtIndex(item.index);
-      if (!object || await object.cvUUID() !== item.id) {
+      if (!object || (await object.cvUUID()) !== item.id) {
         offerReload();
         return;
       }
@@ -111,9 +116,9 @@
       if (!object) return;
       const holdPart = async (part) => {
         if (!part) return;
-        const id = owners.get(part) || await part.cvUUID();
+        const id = owners.get(part) || (await part.cvUUID());
         const thing = Olive.partsOf(item).find((each) => each.id === id);
-        if (thing) await hold(part, thing, ['Title']);  // a source's description is in no record
+        if (thing) await hold(part, thing, ['Title']); // a source's description is in no record
       };
       for (let i = 0; i < item.sources.length; ++i) await holdPart(await object.cvSourceAtIndex(i));
       if (item.commentary) await holdPart(await object.cvAudioCommentarySource());
@@ -124,7 +129,7 @@
     async function holdExtras(item, each) {
       const object = items.get(item.id);
       const there = [];
-      for (let i = await object.cvExtraCount() - 1; i >= 0; --i) {
+      for (let i = (await object.cvExtraCount()) - 1; i >= 0; --i) {
         const extra = await object.cvExtraAtIndex(i);
         if (!extra) continue;
         there.push(await extra.cvUUID());
@@ -140,25 +145,29 @@
 
     // Finds the model's objects; again after the program let go of them.
     function bind() {
-      binding = binding || (async () => {
-        try {
-          const document_ = await conveyor.document();
-          owners.clear();
-          items = new Map();
-          await hold(document_, app.pack, ['Title', 'Description', 'Author']);
-          if (app.item) await holdItem(document_, app.item);
-          setThere(true);
-          if (await document_.cvMediaCount() !== app.pack.items.length) offerReload();
-          if (app.item) await holdParts(app.item);
-          const waiting = [...app.pack.items];
-          await Promise.all(Array.from({length: kAtOnce}, async () => {
-            while (waiting.length) await holdItem(document_, waiting.shift());
-          }));
-          dress();  // an item that was opened meanwhile
-        } finally {
-          binding = null;
-        }
-      })();
+      binding =
+        binding ||
+        (async () => {
+          try {
+            const document_ = await conveyor.document();
+            owners.clear();
+            items = new Map();
+            await hold(document_, app.pack, ['Title', 'Description', 'Author']);
+            if (app.item) await holdItem(document_, app.item);
+            setThere(true);
+            if ((await document_.cvMediaCount()) !== app.pack.items.length) offerReload();
+            if (app.item) await holdParts(app.item);
+            const waiting = [...app.pack.items];
+            await Promise.all(
+              Array.from({length: kAtOnce}, async () => {
+                while (waiting.length) await holdItem(document_, waiting.shift());
+              }),
+            );
+            dress(); // an item that was opened meanwhile
+          } finally {
+            binding = null;
+          }
+        })();
       return binding;
     }
 
@@ -167,7 +176,7 @@
       if (id === undefined) return;
       for (const accessor of accessors) {
         const text = texts.get(keyOf(id, accessor.slice(2)));
-        if (text && text.object === object) text.refresh().catch(() => {});  // the end of the session is told by itself
+        if (text && text.object === object) text.refresh().catch(() => {}); // the end of the session is told by itself
       }
       if (accessors.includes('cvExtraCount')) holdExtras(app.pack.items.find((item) => item.id === id)).catch(() => {});
       if (accessors.some((accessor) => kMoved.includes(accessor))) offerReload();
@@ -175,17 +184,24 @@
 
     // The program has ended, or has let go of a page that slept.
     function onClose() {
-      setTimeout(() => bind().catch(() => {
-        setThere(false);
-        showNotice(say('liveStopped'));
-      }), kRetryAfter);
+      setTimeout(
+        () =>
+          bind().catch(() => {
+            setThere(false);
+            showNotice(say('liveStopped'));
+          }),
+        kRetryAfter,
+      );
     }
 
     // --- the page
 
     // A text of the model says something else: so do all places of the page that show it.
     function changed(id, name, value) {
-      const thing = id === app.pack.id ? app.pack : app.pack.items.flatMap((item) => [item, ...Olive.partsOf(item)]).find((each) => each.id === id);
+      const thing =
+        id === app.pack.id
+          ? app.pack
+          : app.pack.items.flatMap((item) => [item, ...Olive.partsOf(item)]).find((each) => each.id === id);
       if (!thing) return;
       if (value) thing.record[name] = value;
       else delete thing.record[name];
@@ -212,7 +228,8 @@
 
     function showExtras(item) {
       const left = new Set(Olive.partsOf(item).map((part) => part.id));
-      for (const row of document.querySelectorAll('.extras > li, .part')) if (!left.has(row.dataset.id) && !row.querySelector('.editor')) row.remove();
+      for (const row of document.querySelectorAll('.extras > li, .part'))
+        if (!left.has(row.dataset.id) && !row.querySelector('.editor')) row.remove();
       const list = document.querySelector('.extras');
       if (list && !list.children.length) list.parentNode.remove();
     }
@@ -220,11 +237,18 @@
     function showNotice(words, ...actions) {
       const old = document.querySelector('.live-notice');
       if (old) old.remove();
-      document.querySelector('.head').after(make('div', {class: 'live-notice', role: 'status'}, Olive.icon('warning'), make('p', {text: words}), actions));
+      document
+        .querySelector('.head')
+        .after(
+          make('div', {class: 'live-notice', role: 'status'}, Olive.icon('warning'), make('p', {text: words}), actions),
+        );
     }
 
     function offerReload() {
-      showNotice(say('liveChanged'), make('button', {type: 'button', class: 'quiet', text: say('liveShow'), onclick: () => location.reload()}));
+      showNotice(
+        say('liveChanged'),
+        make('button', {type: 'button', class: 'quiet', text: say('liveShow'), onclick: () => location.reload()}),
+      );
     }
 
     function setThere(value) {
@@ -241,13 +265,21 @@
     }
 
     function editable(node, thing, kind, {of, render = () => {}} = {}) {
-      const made = Olive.makeEditable({node, text: textOf(thing, kind[0].toUpperCase() + kind.slice(1)), kind, of, render});
+      const made = Olive.makeEditable({
+        node,
+        text: textOf(thing, kind[0].toUpperCase() + kind.slice(1)),
+        kind,
+        of,
+        render,
+      });
       shown.push(made);
       return made.element;
     }
 
     const withParagraphs = (node) => (value) => node.replaceChildren(...Olive.paragraphs(value));
-    const asLine = (node) => (value) => { node.textContent = value; };
+    const asLine = (node) => (value) => {
+      node.textContent = value;
+    };
 
     function dressPackage(title, author, description) {
       editable(title, app.pack, 'title');
@@ -263,7 +295,8 @@
     }
 
     function dressItem(view, item) {
-      const about = view.querySelector('.about'), description = about.querySelector('.description');
+      const about = view.querySelector('.about'),
+        description = about.querySelector('.description');
       editable(about.querySelector('h1'), item, 'title');
       editable(description, item, 'description', {render: withParagraphs(description)});
       const neighbours = about.querySelector('.neighbours');
@@ -275,10 +308,22 @@
 
     // A package of one item has no opening page.
     function makePackageTexts() {
-      const title = make('p', {class: 'package-title', dir: 'auto', 'data-title-of': app.pack.id, text: app.pack.title});
-      const author = make('p', {class: 'author', dir: 'auto'}), description = make('div', {class: 'description'});
-      const section = make('section', {class: 'live-only package-texts', 'aria-labelledby': 'package-texts'},
-        make('h2', {id: 'package-texts', text: say('packageTexts')}), title, author, description);
+      const title = make('p', {
+        class: 'package-title',
+        dir: 'auto',
+        'data-title-of': app.pack.id,
+        text: app.pack.title,
+      });
+      const author = make('p', {class: 'author', dir: 'auto'}),
+        description = make('div', {class: 'description'});
+      const section = make(
+        'section',
+        {class: 'live-only package-texts', 'aria-labelledby': 'package-texts'},
+        make('h2', {id: 'package-texts', text: say('packageTexts')}),
+        title,
+        author,
+        description,
+      );
       dressPackage(title, author, description);
       return section;
     }
@@ -286,15 +331,35 @@
     // The files of an item, with what each is called.
     function makeParts(item) {
       const list = make('ul', {class: 'parts'});
-      const box = make('details', {class: 'live-only part-box'}, make('summary', null, make('h2', {text: say('parts')})), list);
-      const fill = () => list.replaceChildren(...Olive.partsOf(item).map((part) => {
-        const of = part === item.commentary ? say('commentary') : Olive.titleOfPart(part);
-        const title = make('p', {class: 'row-title', dir: 'auto', 'data-title-of': part.id, text: Olive.titleOfPart(part)});
-        const row = make('li', {class: 'part', 'data-id': part.id}, Olive.icon(part === item.commentary ? 'voice' : part.category || 'warning'), title);
-        editable(title, part, 'title', {of});
-        return row;
-      }));
-      box.addEventListener('toggle', () => { if (box.open && !list.children.length) fill(); });
+      const box = make(
+        'details',
+        {class: 'live-only part-box'},
+        make('summary', null, make('h2', {text: say('parts')})),
+        list,
+      );
+      const fill = () =>
+        list.replaceChildren(
+          ...Olive.partsOf(item).map((part) => {
+            const of = part === item.commentary ? say('commentary') : Olive.titleOfPart(part);
+            const title = make('p', {
+              class: 'row-title',
+              dir: 'auto',
+              'data-title-of': part.id,
+              text: Olive.titleOfPart(part),
+            });
+            const row = make(
+              'li',
+              {class: 'part', 'data-id': part.id},
+              Olive.icon(part === item.commentary ? 'voice' : part.category || 'warning'),
+              title,
+            );
+            editable(title, part, 'title', {of});
+            return row;
+          }),
+        );
+      box.addEventListener('toggle', () => {
+        if (box.open && !list.children.length) fill();
+      });
       return box;
     }
 
@@ -303,28 +368,48 @@
         const extra = item.extras.find((each) => each.id === row.dataset.id);
         if (!extra || row.querySelector('.remove')) continue;
         const title = Olive.titleOfPart(extra);
-        row.append(make('button', {type: 'button', class: 'icon-button remove live-only', 'aria-label': say('removeExtra', {title}), title: say('removeExtra', {title}), 'data-remove': extra.id, onclick: () => askToRemove(item, extra)}, Olive.icon('remove')));
+        row.append(
+          make(
+            'button',
+            {
+              type: 'button',
+              class: 'icon-button remove live-only',
+              'aria-label': say('removeExtra', {title}),
+              title: say('removeExtra', {title}),
+              'data-remove': extra.id,
+              onclick: () => askToRemove(item, extra),
+            },
+            Olive.icon('remove'),
+          ),
+        );
       }
     }
 
     function askToRemove(item, extra) {
       const title = Olive.titleOfPart(extra);
-      Olive.ask({title: say('removeExtra', {title}), text: say('removeExtraAsk'), yes: say('remove'), why: Olive.whyNotSaved, act: async (close) => {
-        const rows = [...document.querySelectorAll('[data-remove]')], place = rows.findIndex((row) => row.dataset.remove === extra.id);
-        await removeExtra(item, extra);
-        close();
-        const next = [...document.querySelectorAll('[data-remove]')];
-        (next[Math.min(place, next.length - 1)] || document.getElementById('main')).focus();
-        Olive.announce(say('removed', {title}));
-      }});
+      Olive.ask({
+        title: say('removeExtra', {title}),
+        text: say('removeExtraAsk'),
+        yes: say('remove'),
+        why: Olive.whyNotSaved,
+        act: async (close) => {
+          const rows = [...document.querySelectorAll('[data-remove]')],
+            place = rows.findIndex((row) => row.dataset.remove === extra.id);
+          await removeExtra(item, extra);
+          close();
+          const next = [...document.querySelectorAll('[data-remove]')];
+          (next[Math.min(place, next.length - 1)] || document.getElementById('main')).focus();
+          Olive.announce(say('removed', {title}));
+        },
+      });
     }
 
     // By its identity, wherever it stands by now.
     async function removeExtra(item, extra) {
       const object = items.get(item.id);
-      for (let i = await object.cvExtraCount() - 1; i >= 0; --i) {
+      for (let i = (await object.cvExtraCount()) - 1; i >= 0; --i) {
         const each = await object.cvExtraAtIndex(i);
-        if (!each || await each.cvUUID() !== extra.id) continue;
+        if (!each || (await each.cvUUID()) !== extra.id) continue;
         await object.cvRemoveExtraAtIndex(i);
         break;
       }

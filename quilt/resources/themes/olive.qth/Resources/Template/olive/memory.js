@@ -3,15 +3,15 @@
 // pages. Without a store (or a full one) everything works but is forgotten.
 'use strict';
 
-(function (Olive) {
-  Olive.openMemory = function (packageId) {
+((Olive) => {
+  Olive.openMemory = (packageId) => {
     const prefix = 'quilt.olive.' + packageId + '.';
 
     function read(name) {
       try {
         const value = JSON.parse(localStorage.getItem(prefix + name));
         return value && typeof value === 'object' ? value : {};
-      } catch (error) {
+      } catch {
         return {};
       }
     }
@@ -22,7 +22,7 @@
     function write(name, value) {
       try {
         localStorage.setItem(prefix + name, JSON.stringify(value));
-      } catch (error) {
+      } catch {
         // forgotten when the page closes
       }
     }

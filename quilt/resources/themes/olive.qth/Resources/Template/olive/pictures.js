@@ -2,14 +2,14 @@
 // Pictures: a montage of stills, an image, the pages of a document; and a voice over those that stand still.
 'use strict';
 
-(function (Olive) {
+((Olive) => {
   const {make, say, clamp} = Olive;
 
   const pictureFile = (source, width) => {
     const grades = new Olive.Grades({files: source.files.filter(Olive.isPicture)}, '');
     return grades.pick(width);
   };
-  const largestPicture = (source) => pictureFile(source, Infinity);
+  const largestPicture = (source) => pictureFile(source, Number.POSITIVE_INFINITY);
 
   // The address that shows a still at this width: a file that the browser can draw, else the preview.
   function stillAddress(source, width) {
@@ -17,17 +17,20 @@
     return file ? file.address : source.previews[0] ? source.previews[0].picture : '';
   }
 
-  Olive.stages.Montage = function (item, context) {
+  Olive.stages.Montage = (item, context) => {
     const voice = item.commentary;
     const parts = voice ? [{source: voice, kind: 'audio', leads: true}] : [];
     const stills = item.chapters;
     const images = [make('img', {alt: '', draggable: 'false'}), make('img', {alt: '', draggable: 'false'})];
     const caption = make('p', {class: 'caption', dir: 'auto'});
     const preload = new Image();
-    let shown = -1, front = 0, player;
+    let shown = -1,
+      front = 0,
+      player;
 
     const indexAt = (time) => Math.max(0, stills.filter((still) => still.start <= time + 0.01).length - 1);
-    const address = (index) => stillAddress(stills[index].source, Olive.pixelsAcross(images[0].parentNode || document.body));
+    const address = (index) =>
+      stillAddress(stills[index].source, Olive.pixelsAcross(images[0].parentNode || document.body));
     function follow() {
       const index = indexAt(player.time);
       if (index === shown || !stills.length) return;
@@ -47,11 +50,13 @@
       content: (elements, made) => {
         player = made;
         player.addEventListener('time', follow);
-        images.forEach((image) => image.addEventListener('error', () => {
-          const spare = stills[shown] && stills[shown].picture;
-          if (spare && !image.src.endsWith(spare)) image.src = spare;
-          else if (image === images[front]) caption.textContent = say('cannotShow');
-        }));
+        images.forEach((image) =>
+          image.addEventListener('error', () => {
+            const spare = stills[shown]?.picture;
+            if (spare && !image.src.endsWith(spare)) image.src = spare;
+            else if (image === images[front]) caption.textContent = say('cannotShow');
+          }),
+        );
         return [make('div', {class: 'stills'}, images), caption, elements];
       },
       chapters: stills,
@@ -64,8 +69,12 @@
   // A voice over pictures that stand still by themselves: the author's commentary on an image or a document.
   function voiceOver(item, context, stage, onTime) {
     if (!item.commentary) return stage;
-    const spoken = Olive.timedStage({...item, duration: 0}, context, [{source: item.commentary, kind: 'audio', leads: true}],
-                                    {content: (elements) => elements, host: stage.element.querySelector('.sheet').parentNode});
+    const spoken = Olive.timedStage(
+      {...item, duration: 0},
+      context,
+      [{source: item.commentary, kind: 'audio', leads: true}],
+      {content: (elements) => elements, host: stage.element.querySelector('.sheet').parentNode},
+    );
     spoken.player.addEventListener('time', () => onTime(spoken.player));
     stage.player = spoken.player;
     stage.transport = spoken.transport;
@@ -78,7 +87,7 @@
     return stage;
   }
 
-  Olive.stages.Image = function (item, context) {
+  Olive.stages.Image = (item, context) => {
     const source = item.sources[0];
     const sheet = Olive.makeSheet();
     const element = make('div', {class: 'stage image'}, sheet.element);
@@ -87,13 +96,23 @@
     const stage = {
       element,
       sheet,
-      controls: make('div', {class: 'controls'}, make('div', {class: 'buttons'}, sheet.tools, make('span', {class: 'gap'}),
-        item.commentary ? [] : context.frameButtons([]))),
+      controls: make(
+        'div',
+        {class: 'controls'},
+        make(
+          'div',
+          {class: 'buttons'},
+          sheet.tools,
+          make('span', {class: 'gap'}),
+          item.commentary ? [] : context.frameButtons([]),
+        ),
+      ),
       player: null,
       close: sheet.close,
     };
     queueMicrotask(() => {
-      const file = pictureFile(source, Olive.pixelsAcross(element)), larger = largestPicture(source);
+      const file = pictureFile(source, Olive.pixelsAcross(element)),
+        larger = largestPicture(source);
       const label = item.description || item.title;
       sheet.onFail = () => {
         sheet.onFail = complain;
@@ -101,25 +120,40 @@
         else complain();
       };
       if (!file && !spare) return complain();
-      sheet.show(file ? file.address : spare, {label, width: file && file.width, height: file && file.height,
-                                              larger: larger && larger !== file ? larger.address : ''});
+      sheet.show(file ? file.address : spare, {
+        label,
+        width: file?.width,
+        height: file?.height,
+        larger: larger && larger !== file ? larger.address : '',
+      });
       context.memory.keep(item, {done: true});
     });
     return voiceOver(item, context, stage, () => {});
   };
 
-  Olive.stages.Document = function (item, context) {
+  Olive.stages.Document = (item, context) => {
     const pages = item.pages;
     const sheet = Olive.makeSheet();
     const element = make('div', {class: 'stage document'}, sheet.element);
     const file = Olive.bestFile(item);
     const words = make('section', {class: 'page-text', hidden: true, tabindex: 0, 'aria-label': say('pageText')});
-    const number = make('input', {type: 'text', inputmode: 'numeric', class: 'page-number', 'aria-label': say('pageNumber'),
-                                  onchange: () => pager.go(Math.round(Number(number.value)) - 1 || 0), onfocus: () => number.select()});
-    const textButton = Olive.iconButton('text', say('pageText'), () => {
-      showText(words.hidden);
-      context.memory.choose('pageText', !words.hidden);
-    }, {'aria-pressed': 'false'});
+    const number = make('input', {
+      type: 'text',
+      inputmode: 'numeric',
+      class: 'page-number',
+      'aria-label': say('pageNumber'),
+      onchange: () => pager.go(Math.round(Number(number.value)) - 1 || 0),
+      onfocus: () => number.select(),
+    });
+    const textButton = Olive.iconButton(
+      'text',
+      say('pageText'),
+      () => {
+        showText(words.hidden);
+        context.memory.choose('pageText', !words.hidden);
+      },
+      {'aria-pressed': 'false'},
+    );
     const previous = Olive.iconButton('left', say('previousPage'), () => pager.go(pager.index - 1));
     const next = Olive.iconButton('right', say('nextPage'), () => pager.go(pager.index + 1));
 
@@ -140,13 +174,26 @@
         const page = pages[target];
         sheet.onFail = () => element.append(Olive.makeMessage(say('cannotShow'), file, context.again));
         element.querySelectorAll('.message').forEach((node) => node.remove());
-        sheet.show(page.picture, {label: say('pageOf', {page: target + 1, pages: pages.length}), width: page.width, height: page.height});
-        words.replaceChildren(...(page.text ? page.text.split(/\n{2,}/).map((part) => make('p', {dir: 'auto'}, Olive.highlighted(part, context.terms(), true)))
-                                            : [make('p', {text: say('noText')})]));
+        sheet.show(page.picture, {
+          label: say('pageOf', {page: target + 1, pages: pages.length}),
+          width: page.width,
+          height: page.height,
+        });
+        words.replaceChildren(
+          ...(page.text
+            ? page.text
+                .split(/\n{2,}/)
+                .map((part) => make('p', {dir: 'auto'}, Olive.highlighted(part, context.terms(), true)))
+            : [make('p', {text: say('noText')})]),
+        );
         previous.disabled = target === 0;
         next.disabled = target === pages.length - 1;
         if (pages[target + 1]) new Image().src = pages[target + 1].picture;
-        context.memory.keep(item, {page: target, share: (target + 1) / pages.length, ...(target === pages.length - 1 ? {done: true} : {})});
+        context.memory.keep(item, {
+          page: target,
+          share: (target + 1) / pages.length,
+          ...(target === pages.length - 1 ? {done: true} : {}),
+        });
         context.note();
         context.onPage(target);
       },
@@ -155,12 +202,39 @@
     const stage = {
       element: make('div', {class: 'reader'}, element, words),
       sheet,
-      controls: make('div', {class: 'controls'}, make('div', {class: 'buttons'},
-        make('div', {class: 'tools', role: 'group', 'aria-label': say('pages')}, previous, number,
-             make('span', {class: 'count', text: '/ ' + pages.length}), next),
-        sheet.tools, hasText && textButton, make('span', {class: 'gap'}),
-        file && make('a', {class: 'icon-button', href: file.address, target: '_blank', rel: 'noopener', 'aria-label': say('openFile'), title: say('openFile')}, Olive.icon('open')),
-        item.commentary ? [] : context.frameButtons([]))),
+      controls: make(
+        'div',
+        {class: 'controls'},
+        make(
+          'div',
+          {class: 'buttons'},
+          make(
+            'div',
+            {class: 'tools', role: 'group', 'aria-label': say('pages')},
+            previous,
+            number,
+            make('span', {class: 'count', text: '/ ' + pages.length}),
+            next,
+          ),
+          sheet.tools,
+          hasText && textButton,
+          make('span', {class: 'gap'}),
+          file &&
+            make(
+              'a',
+              {
+                class: 'icon-button',
+                href: file.address,
+                target: '_blank',
+                rel: 'noopener',
+                'aria-label': say('openFile'),
+                title: say('openFile'),
+              },
+              Olive.icon('open'),
+            ),
+          item.commentary ? [] : context.frameButtons([]),
+        ),
+      ),
       player: null,
       pager: pages.length ? pager : null,
       toggleText: () => hasText && textButton.click(),
@@ -169,7 +243,9 @@
     if (!pages.length) element.append(Olive.makeMessage(say('noPages'), file, null));
     else {
       showText(context.memory.choice('pageText', false));
-      queueMicrotask(() => pager.go(context.start.page === null ? context.memory.place(item).page || 0 : context.start.page - 1));
+      queueMicrotask(() =>
+        pager.go(context.start.page === null ? context.memory.place(item).page || 0 : context.start.page - 1),
+      );
     }
     return voiceOver(item, context, stage, (player) => {
       if (!player.isPlaying) return;

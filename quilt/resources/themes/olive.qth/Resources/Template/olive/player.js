@@ -4,48 +4,52 @@
 // are far off.
 'use strict';
 
-(function (Olive) {
-  const kTolerance = 0.04;      // seconds that nobody notices
-  const kSettled = 0.02;        // correction ends here
-  const kFar = 0.4;             // beyond, speed would take too long
-  const kStrongest = 0.1;       // of the speed
-  const kSeekPause = 2000;      // ms between two corrections by seeking
-  const kBeat = 100;            // ms between two looks
-  const kFreshFrame = 250;      // ms for which a frame's time tells more than the element's clock
+((Olive) => {
+  const kTolerance = 0.04; // seconds that nobody notices
+  const kSettled = 0.02; // correction ends here
+  const kFar = 0.4; // beyond, speed would take too long
+  const kStrongest = 0.1; // of the speed
+  const kSeekPause = 2000; // ms between two corrections by seeking
+  const kBeat = 100; // ms between two looks
+  const kFreshFrame = 250; // ms for which a frame's time tells more than the element's clock
 
   // One media element on the common time line.
   class Stream {
     constructor(element, grades, offset) {
       this.element = element;
       this.grades = grades;
-      this.offset = offset;        // where its beginning lies
-      this.isEnabled = true;       // a follower that nobody sees rests
+      this.offset = offset; // where its beginning lies
+      this.isEnabled = true; // a follower that nobody sees rests
       this.hasFailed = false;
       this.isCorrecting = false;
       this.isClosed = false;
-      this.lastSeek = -Infinity;
-      this.pending = null;         // seconds to go to once the file is known
+      this.lastSeek = Number.NEGATIVE_INFINITY;
+      this.pending = null; // seconds to go to once the file is known
       this.frame = null;
       if (element.requestVideoFrameCallback) this.watchFrames();
     }
 
     watchFrames() {
-      this.element.requestVideoFrameCallback((now, data) => {
+      this.element.requestVideoFrameCallback((_now, data) => {
         this.frame = {media: data.mediaTime, at: data.expectedDisplayTime};
         if (!this.isClosed) this.watchFrames();
       });
     }
 
-    get duration() { return Number.isFinite(this.element.duration) ? this.element.duration : (this.grades.current || {}).duration || 0; }
-    get end() { return this.offset + this.duration; }
+    get duration() {
+      return Number.isFinite(this.element.duration) ? this.element.duration : this.grades.current?.duration || 0;
+    }
+    get end() {
+      return this.offset + this.duration;
+    }
 
     // Seconds of the stream itself, as seen on the screen.
     get position() {
       if (this.pending !== null) return this.pending;
       const element = this.element;
-      const age = this.frame ? performance.now() - this.frame.at : Infinity;
+      const age = this.frame ? performance.now() - this.frame.at : Number.POSITIVE_INFINITY;
       if (element.paused || element.seeking || element.ended || age > kFreshFrame) return element.currentTime;
-      return this.frame.media + age / 1000 * element.playbackRate;
+      return this.frame.media + (age / 1000) * element.playbackRate;
     }
 
     load(file, at) {
@@ -81,25 +85,39 @@
       this.streams = parts.map((part) => new Stream(part.element, part.grades, part.offset || 0));
       const first = Math.min(...this.streams.map((stream) => stream.offset));
       for (const stream of this.streams) stream.offset -= first;
-      this.leader = this.streams[Math.max(0, parts.findIndex((part) => part.leads))] || null;
+      this.leader =
+        this.streams[
+          Math.max(
+            0,
+            parts.findIndex((part) => part.leads),
+          )
+        ] || null;
       this.told = duration;
       this.wanted = false;
       this.speed = 1;
       this.loudness = 1;
       this.isMuted = false;
       this.stalled = new Set();
-      this.virtual = 0;            // seconds, the clock without streams
+      this.virtual = 0; // seconds, the clock without streams
       this.hasEnded = false;
       this.removals = [];
       for (const stream of this.streams) this.listen(stream);
       this.applySound();
     }
 
-    emit(name, detail) { this.dispatchEvent(new CustomEvent(name, {detail})); }
+    emit(name, detail) {
+      this.dispatchEvent(new CustomEvent(name, {detail}));
+    }
 
-    get isPlaying() { return this.wanted; }
-    get isWaiting() { return this.wanted && this.stalled.size > 0; }
-    get live() { return this.streams.filter((stream) => !stream.hasFailed && stream.isEnabled); }
+    get isPlaying() {
+      return this.wanted;
+    }
+    get isWaiting() {
+      return this.wanted && this.stalled.size > 0;
+    }
+    get live() {
+      return this.streams.filter((stream) => !stream.hasFailed && stream.isEnabled);
+    }
 
     get duration() {
       const end = Math.max(0, ...this.streams.filter((stream) => !stream.hasFailed).map((stream) => stream.end));
@@ -108,7 +126,8 @@
 
     // The stream whose clock counts now: the leader while it runs, then whichever goes on.
     get clock() {
-      const runs = (stream) => stream && !stream.hasFailed && !(stream.element.ended && stream.end < this.duration - 0.05);
+      const runs = (stream) =>
+        stream && !stream.hasFailed && !(stream.element.ended && stream.end < this.duration - 0.05);
       if (runs(this.leader)) return this.leader;
       return this.live.find((stream) => runs(stream)) || this.leader;
     }
@@ -141,7 +160,15 @@
       for (const name of ['playing', 'canplay', 'canplaythrough']) on(name, () => this.release(stream));
       on('pause', () => {
         // Unplugged headphones, a media key, another window: whoever pauses the leader pauses all of it.
-        if (this.wanted && stream === this.leader && !element.ended && !element.seeking && !this.stalled.size && stream.pending === null) this.pause();
+        if (
+          this.wanted &&
+          stream === this.leader &&
+          !element.ended &&
+          !element.seeking &&
+          !this.stalled.size &&
+          stream.pending === null
+        )
+          this.pause();
       });
       on('ended', () => this.finish());
       on('error', () => this.tryNext(stream));
@@ -214,7 +241,9 @@
       this.emit('time');
     }
 
-    toggle() { this.wanted ? this.pause() : this.play(); }
+    toggle() {
+      this.wanted ? this.pause() : this.play();
+    }
 
     seek(seconds) {
       const target = Olive.clamp(seconds, 0, this.duration);
@@ -237,7 +266,7 @@
     }
 
     run(stream) {
-      if (!stream.element.paused || stream.element.ended) return;  // what has ended would begin again
+      if (!stream.element.paused || stream.element.ended) return; // what has ended would begin again
       const promise = stream.element.play();
       if (!promise) return;
       promise.catch((error) => {
@@ -280,7 +309,7 @@
 
     advance() {
       const now = performance.now();
-      this.virtual += (now - this.started) / 1000 * this.speed;
+      this.virtual += ((now - this.started) / 1000) * this.speed;
       this.started = now;
       if (this.virtual >= this.duration) this.finish();
     }
@@ -289,7 +318,8 @@
       const element = stream.element;
       if (element.readyState === 0) return;
       const target = now - stream.offset;
-      if (target < 0 || target >= stream.duration - kTolerance) {  // not begun, or over: its first or last picture stays
+      if (target < 0 || target >= stream.duration - kTolerance) {
+        // not begun, or over: its first or last picture stays
         if (!element.paused) element.pause();
         return;
       }
@@ -315,7 +345,7 @@
 
     finish() {
       const clock = this.clock;
-      if (clock && !clock.element.ended && this.time < this.duration - 0.25) return;  // another one goes on
+      if (clock && !clock.element.ended && this.time < this.duration - 0.25) return; // another one goes on
       this.hasEnded = true;
       this.virtual = this.duration;
       this.pause();

@@ -4,7 +4,7 @@
 // player is a Player or null; pager {count, index, go(index)} or null; view {value, set(name), swap()} of two pictures.
 'use strict';
 
-(function (Olive) {
+((Olive) => {
   const {make, say} = Olive;
   Olive.stages = {};
 
@@ -23,38 +23,60 @@
   };
 
   // What went wrong, and what can be done about it.
-  Olive.makeMessage = function (text, file, retry) {
-    return make('div', {class: 'message', role: 'alert'},
+  Olive.makeMessage = (text, file, retry) =>
+    make(
+      'div',
+      {class: 'message', role: 'alert'},
       Olive.icon('warning'),
       make('p', {text}),
-      make('div', {class: 'message-actions'},
+      make(
+        'div',
+        {class: 'message-actions'},
         retry && make('button', {type: 'button', class: 'quiet', text: say('tryAgain'), onclick: retry}),
-        file && make('a', {class: 'quiet', href: file.address, target: '_blank', rel: 'noopener', text: say('openFile')})));
-  };
+        file &&
+          make('a', {class: 'quiet', href: file.address, target: '_blank', rel: 'noopener', text: say('openFile')}),
+      ),
+    );
 
-  const posterOf = (item) => item.poster || (item.sources[0] && item.sources[0].previews[0] ? item.sources[0].previews[0].picture : '');
+  const posterOf = (item) => item.poster || (item.sources[0]?.previews[0] ? item.sources[0].previews[0].picture : '');
 
   // What lies over the stage until the first start; startHere(seconds) begins there, or where the player stands for null.
   function makeCover(poster, resumeAt, startHere) {
     const again = resumeAt ? say('continueAt', {time: Olive.clock(resumeAt)}) : '';
     const begin = () => startHere(resumeAt || null);
-    const cover = make('div', {class: 'cover'},
+    const cover = make(
+      'div',
+      {class: 'cover'},
       poster && Olive.picture(poster, {class: 'cover-picture', loading: 'eager'}),
-      make('div', {class: 'cover-actions'},
-        make('button', {type: 'button', class: 'big-play', onclick: begin, 'aria-label': again || say('play')}, Olive.icon('play'), again && make('span', {text: again})),
-        again && make('button', {type: 'button', class: 'quiet', text: say('startOver'), onclick: () => startHere(0)})));
-    cover.addEventListener('click', (event) => { if (event.target === cover || event.target.localName === 'img') begin(); });
+      make(
+        'div',
+        {class: 'cover-actions'},
+        make(
+          'button',
+          {type: 'button', class: 'big-play', onclick: begin, 'aria-label': again || say('play')},
+          Olive.icon('play'),
+          again && make('span', {text: again}),
+        ),
+        again && make('button', {type: 'button', class: 'quiet', text: say('startOver'), onclick: () => startHere(0)}),
+      ),
+    );
+    cover.addEventListener('click', (event) => {
+      if (event.target === cover || event.target.localName === 'img') begin();
+    });
     return cover;
   }
 
   // Player, transport, cover and messages, alike for everything that runs in time.
   // parts: [{source, kind, offset, leads}]; options: {content(elements, player), extras(player, elements), chapters,
   // cover (false: what lies under it is worth seeing), host (a stage that has its own content and no cover)}
-  Olive.timedStage = function (item, context, parts, options) {
+  Olive.timedStage = (item, context, parts, options) => {
     const elements = parts.map((part) => takeElement(part.kind));
     const wanted = context.memory.choice('grade', '');
     const grades = parts.map((part) => new Olive.Grades(part.source, wanted));
-    const player = new Olive.Player(parts.map((part, i) => ({element: elements[i], grades: grades[i], offset: part.offset || 0, leads: part.leads})), item.duration);
+    const player = new Olive.Player(
+      parts.map((part, i) => ({element: elements[i], grades: grades[i], offset: part.offset || 0, leads: part.leads})),
+      item.duration,
+    );
     const content = options.content(elements, player);
     const under = [content].flat(2);
     const element = options.host || make('div', {class: 'stage ' + item.category.toLowerCase()});
@@ -62,7 +84,11 @@
     const spinner = make('div', {class: 'spinner', 'aria-hidden': 'true', hidden: true});
     element.append(spinner);
 
-    const choices = parts.reduce((best, part, i) => (part.kind === 'video' && grades[i].choices().length > best.length ? grades[i].choices() : best), []);
+    const choices = parts.reduce(
+      (best, part, i) =>
+        part.kind === 'video' && grades[i].choices().length > best.length ? grades[i].choices() : best,
+      [],
+    );
     const transport = Olive.makeTransport(player, {
       chapters: options.chapters || [],
       choices,
@@ -85,28 +111,50 @@
     const cover = makeCover(options.cover === false || context.start.t ? '' : posterOf(item), resumeAt, startHere);
     if (!options.host) {
       element.append(cover);
-      under.forEach((node) => { node.inert = true; });
+      under.forEach((node) => {
+        node.inert = true;
+      });
     }
 
     player.addEventListener('state', () => {
       if (player.isPlaying) {
         cover.remove();
-        under.forEach((node) => { node.inert = false; });
+        under.forEach((node) => {
+          node.inert = false;
+        });
         element.querySelectorAll('.blocked').forEach((node) => node.remove());
       }
       spinner.hidden = !player.isWaiting;
     });
-    player.addEventListener('time', () => {  // who looks for a place before the start wants to see it
+    player.addEventListener('time', () => {
+      // who looks for a place before the start wants to see it
       if (player.time > 0 && cover.querySelector('.cover-picture')) cover.querySelector('.cover-picture').remove();
     });
     player.addEventListener('blocked', () => {
-      element.append(make('div', {class: 'cover blocked'}, make('div', {class: 'cover-actions'},
-        make('button', {type: 'button', class: 'big-play', 'aria-label': say('play'), onclick: () => startHere(null)}, Olive.icon('play')))));
+      element.append(
+        make(
+          'div',
+          {class: 'cover blocked'},
+          make(
+            'div',
+            {class: 'cover-actions'},
+            make(
+              'button',
+              {type: 'button', class: 'big-play', 'aria-label': say('play'), onclick: () => startHere(null)},
+              Olive.icon('play'),
+            ),
+          ),
+        ),
+      );
     });
 
     function complain(stream) {
       const isAll = player.streams.every((each) => each.hasFailed);
-      const message = Olive.makeMessage(say(isAll ? 'cannotPlay' : 'partMissing'), stream.grades.files[0], isAll ? context.again : null);
+      const message = Olive.makeMessage(
+        say(isAll ? 'cannotPlay' : 'partMissing'),
+        stream.grades.files[0],
+        isAll ? context.again : null,
+      );
       if (isAll) {
         cover.querySelector('.cover-actions').replaceChildren();
         if (!cover.isConnected && !options.host) element.append(cover);
@@ -151,19 +199,25 @@
 
   // The voice that an author added to a movie: heard instead of the movie's own sound.
   function commentarySwitch(player) {
-    const voice = player.streams[player.streams.length - 1], own = player.leader;
+    const voice = player.streams[player.streams.length - 1],
+      own = player.leader;
     player.enable(voice, false);
-    const button = Olive.iconButton('voice', say('commentary'), () => {
-      const isOn = player.leader !== voice;
-      player.lead(isOn ? voice : own);
-      if (!isOn) player.enable(voice, false);
-      button.setAttribute('aria-pressed', isOn);
-      Olive.announce(say(isOn ? 'commentaryOn' : 'commentaryOff'));
-    }, {'aria-pressed': 'false'});
+    const button = Olive.iconButton(
+      'voice',
+      say('commentary'),
+      () => {
+        const isOn = player.leader !== voice;
+        player.lead(isOn ? voice : own);
+        if (!isOn) player.enable(voice, false);
+        button.setAttribute('aria-pressed', isOn);
+        Olive.announce(say(isOn ? 'commentaryOn' : 'commentaryOff'));
+      },
+      {'aria-pressed': 'false'},
+    );
     return button;
   }
 
-  Olive.stages.Movie = function (item, context) {
+  Olive.stages.Movie = (item, context) => {
     const parts = [{source: item.sources[0], kind: 'video', leads: true}];
     if (item.commentary) parts.push({source: item.commentary, kind: 'audio'});
     return Olive.timedStage(item, context, parts, {
@@ -173,38 +227,66 @@
     });
   };
 
-  Olive.stages.Audio = function (item, context) {
+  Olive.stages.Audio = (item, context) => {
     const poster = posterOf(item);
     return Olive.timedStage(item, context, [{source: item.sources[0], kind: 'audio', leads: true}], {
       content: ([audio]) => [
-        make('div', {class: 'record'},
-          poster ? Olive.picture(poster, {loading: 'eager'}, () => Olive.icon('Audio')) : Olive.icon('Audio')),
-        audio],
+        make(
+          'div',
+          {class: 'record'},
+          poster ? Olive.picture(poster, {loading: 'eager'}, () => Olive.icon('Audio')) : Olive.icon('Audio'),
+        ),
+        audio,
+      ],
       cover: false,
     });
   };
 
-  Olive.stages.Web = function (item, context) {
+  Olive.stages.Web = (item, context) => {
     const address = item.link;
-    const element = make('div', {class: 'stage web'},
-      make('div', {class: 'web-card'},
+    const element = make(
+      'div',
+      {class: 'stage web'},
+      make(
+        'div',
+        {class: 'web-card'},
         Olive.icon('Web'),
         make('p', {class: 'web-title', dir: 'auto', 'data-title-of': item.id, text: item.title}),
-        address && make('p', {class: 'web-address', dir: 'ltr', text: address.replace(/^https?:\/\//, '').replace(/\/$/, '')}),
-        address ? make('a', {class: 'primary', href: address, target: '_blank', rel: 'noopener noreferrer', onclick: () => context.memory.keep(item, {done: true})},
-                       say('openLink'), Olive.icon('open'))
-                : make('p', {text: say('badLink')}),
-        address && make('p', {class: 'badge', text: say('needsInternet')})));
+        address &&
+          make('p', {class: 'web-address', dir: 'ltr', text: address.replace(/^https?:\/\//, '').replace(/\/$/, '')}),
+        address
+          ? make(
+              'a',
+              {
+                class: 'primary',
+                href: address,
+                target: '_blank',
+                rel: 'noopener noreferrer',
+                onclick: () => context.memory.keep(item, {done: true}),
+              },
+              say('openLink'),
+              Olive.icon('open'),
+            )
+          : make('p', {text: say('badLink')}),
+        address && make('p', {class: 'badge', text: say('needsInternet')}),
+      ),
+    );
     return {element, controls: null, player: null, close() {}};
   };
 
-  function emptyStage(item, context) {
-    return {element: make('div', {class: 'stage'}, Olive.makeMessage(say('nothingToShow'), Olive.bestFile(item), null)), controls: null, player: null, close() {}};
+  function emptyStage(item, _context) {
+    return {
+      element: make('div', {class: 'stage'}, Olive.makeMessage(say('nothingToShow'), Olive.bestFile(item), null)),
+      controls: null,
+      player: null,
+      close() {},
+    };
   }
 
   // context: {memory, start: {t, page, view, play}, frameButtons(elements), note(), focus(), again(), terms(), onPage(index)}
-  Olive.makeStage = function (item, context) {
-    const kind = item.sources.length && Object.hasOwn(Olive.stages, item.category) ? Olive.stages[item.category] : emptyStage;
+  Olive.makeStage = (item, context) => {
+    const kind =
+      item.sources.length && Object.hasOwn(Olive.stages, item.category) ? Olive.stages[item.category] : emptyStage;
     return kind(item, context);
   };
 })(window.Olive);

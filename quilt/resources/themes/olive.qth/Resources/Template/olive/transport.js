@@ -3,7 +3,7 @@
 // every language, as the time line does.
 'use strict';
 
-(function (Olive) {
+((Olive) => {
   const {make, say, clock, clamp} = Olive;
   const kSpeeds = [0.5, 0.75, 1, 1.25, 1.5, 1.75, 2];
   const kSkip = 10;
@@ -11,21 +11,34 @@
   const speedLabel = (speed) => Olive.number(speed, 2) + '×';
 
   function seekBar(player, chapters) {
-    const range = make('input', {type: 'range', class: 'seek', min: 0, max: 1, step: 'any', value: 0, 'aria-label': say('seek')});
+    const range = make('input', {
+      type: 'range',
+      class: 'seek',
+      min: 0,
+      max: 1,
+      step: 'any',
+      value: 0,
+      'aria-label': say('seek'),
+    });
     const marks = make('div', {class: 'marks', 'aria-hidden': 'true'});
     const bubble = make('div', {class: 'bubble', hidden: true, 'aria-hidden': 'true'});
     const bar = make('div', {class: 'seek-bar'}, range, marks, bubble);
     let isDragged = false;
 
-    const chapterAt = (seconds) => chapters.filter((chapter) => chapter.start !== null && chapter.start <= seconds + 0.05).pop();
+    const chapterAt = (seconds) =>
+      chapters.filter((chapter) => chapter.start !== null && chapter.start <= seconds + 0.05).pop();
     const share = (seconds) => (player.duration ? clamp(seconds / player.duration, 0, 1) : 0);
 
     function drawMarks() {
-      marks.replaceChildren(...chapters.filter((chapter) => chapter.start > 0 && chapter.start < player.duration).map((chapter) => {
-        const mark = make('i');
-        mark.style.insetInlineStart = share(chapter.start) * 100 + '%';
-        return mark;
-      }));
+      marks.replaceChildren(
+        ...chapters
+          .filter((chapter) => chapter.start > 0 && chapter.start < player.duration)
+          .map((chapter) => {
+            const mark = make('i');
+            mark.style.insetInlineStart = share(chapter.start) * 100 + '%';
+            return mark;
+          }),
+      );
     }
 
     function update() {
@@ -38,7 +51,11 @@
       const shown = Number(range.value);
       bar.style.setProperty('--done', share(shown) * 100 + '%');
       const chapter = chapterAt(shown);
-      range.setAttribute('aria-valuetext', say('timeOf', {time: Olive.spokenTime(shown), total: Olive.spokenTime(duration)}) + (chapter ? ', ' + chapter.title : ''));
+      range.setAttribute(
+        'aria-valuetext',
+        say('timeOf', {time: Olive.spokenTime(shown), total: Olive.spokenTime(duration)}) +
+          (chapter ? ', ' + chapter.title : ''),
+      );
     }
 
     function point(event) {
@@ -47,9 +64,10 @@
       const seconds = part * player.duration;
       const chapter = chapterAt(seconds);
       bubble.replaceChildren(
-        ...(chapter && chapter.picture ? [Olive.picture(chapter.picture, {loading: 'eager'})] : []),
+        ...(chapter?.picture ? [Olive.picture(chapter.picture, {loading: 'eager'})] : []),
         ...(chapter ? [make('span', {class: 'bubble-title', dir: 'auto', text: chapter.title})] : []),
-        make('span', {text: clock(seconds)}));
+        make('span', {text: clock(seconds)}),
+      );
       bubble.hidden = !player.duration;
       const half = bubble.offsetWidth / 2;
       bubble.style.left = clamp(part * box.width, half, box.width - half) + 'px';
@@ -60,26 +78,55 @@
       player.seek(Number(range.value));
       update();
     });
-    range.addEventListener('change', () => { isDragged = false; });
+    range.addEventListener('change', () => {
+      isDragged = false;
+    });
     bar.addEventListener('pointermove', point);
-    bar.addEventListener('pointerleave', () => { bubble.hidden = true; });
+    bar.addEventListener('pointerleave', () => {
+      bubble.hidden = true;
+    });
     return {bar, range, update};
   }
 
   // options: {chapters, choices (of grades), grade, onGrade, extras (more controls), memory}
-  Olive.makeTransport = function (player, options) {
+  Olive.makeTransport = (player, options) => {
     const {memory, chapters} = options;
     const seek = seekBar(player, chapters);
     const shown = make('span', {class: 'time', 'aria-hidden': 'true'});
     const playButton = Olive.iconButton('play', say('play'), () => player.toggle(), {class: 'icon-button play'});
     const muteButton = Olive.iconButton('loud', say('mute'), () => actions.mute());
-    const volume = make('input', {type: 'range', class: 'volume', min: 0, max: 1, step: 0.05, 'aria-label': say('volume'),
-                                  oninput: () => actions.setVolume(Number(volume.value))});
-    const speed = make('select', {class: 'choice', 'aria-label': say('speed'), title: say('speed'), onchange: () => actions.setSpeed(Number(speed.value))},
-                       kSpeeds.map((value) => make('option', {value, text: speedLabel(value)})));
-    const grade = options.choices.length > 1 && make('select', {class: 'choice', 'aria-label': say('grade'), title: say('grade'), onchange: () => options.onGrade(grade.value)},
-      make('option', {value: '', text: say('automatic')}),
-      options.choices.map((choice) => make('option', {value: choice.grade, text: Olive.gradeLabel(choice)})));
+    const volume = make('input', {
+      type: 'range',
+      class: 'volume',
+      min: 0,
+      max: 1,
+      step: 0.05,
+      'aria-label': say('volume'),
+      oninput: () => actions.setVolume(Number(volume.value)),
+    });
+    const speed = make(
+      'select',
+      {
+        class: 'choice',
+        'aria-label': say('speed'),
+        title: say('speed'),
+        onchange: () => actions.setSpeed(Number(speed.value)),
+      },
+      kSpeeds.map((value) => make('option', {value, text: speedLabel(value)})),
+    );
+    const grade =
+      options.choices.length > 1 &&
+      make(
+        'select',
+        {
+          class: 'choice',
+          'aria-label': say('grade'),
+          title: say('grade'),
+          onchange: () => options.onGrade(grade.value),
+        },
+        make('option', {value: '', text: say('automatic')}),
+        options.choices.map((choice) => make('option', {value: choice.grade, text: Olive.gradeLabel(choice)})),
+      );
     const hasSound = player.streams.length > 0;
 
     const actions = {
@@ -110,16 +157,21 @@
         const starts = chapters.map((chapter) => chapter.start).filter((start) => start !== null);
         if (!starts.length) return false;
         const now = player.time;
-        const target = step > 0 ? starts.find((start) => start > now + 0.1) : starts.filter((start) => start < now - 2).pop();
+        const target =
+          step > 0 ? starts.find((start) => start > now + 0.1) : starts.filter((start) => start < now - 2).pop();
         if (target === undefined && step > 0) return false;
         player.seek(target === undefined ? starts[0] : target);
         return true;
       },
     };
 
-    const element = make('div', {class: 'transport', dir: 'ltr', role: 'group', 'aria-label': say('controls')},
+    const element = make(
+      'div',
+      {class: 'transport', dir: 'ltr', role: 'group', 'aria-label': say('controls')},
       seek.bar,
-      make('div', {class: 'buttons'},
+      make(
+        'div',
+        {class: 'buttons'},
         playButton,
         Olive.iconButton('back', say('back', {n: kSkip}), () => actions.skip(-kSkip)),
         Olive.iconButton('forward', say('forward', {n: kSkip}), () => actions.skip(kSkip)),
@@ -128,7 +180,9 @@
         make('span', {class: 'gap'}),
         options.extras,
         speed,
-        grade));
+        grade,
+      ),
+    );
 
     function update() {
       seek.update();
@@ -136,7 +190,11 @@
     }
 
     function updateState() {
-      const [icon, label] = player.isPlaying ? ['pause', 'pause'] : player.hasEnded ? ['replay', 'playAgain'] : ['play', 'play'];
+      const [icon, label] = player.isPlaying
+        ? ['pause', 'pause']
+        : player.hasEnded
+          ? ['replay', 'playAgain']
+          : ['play', 'play'];
       Olive.setIcon(playButton, icon);
       Olive.relabel(playButton, say(label));
       const isSilent = player.isMuted || player.loudness === 0;

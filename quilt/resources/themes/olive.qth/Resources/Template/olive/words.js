@@ -3,7 +3,7 @@
 // number holds its plural forms by their CLDR names.
 'use strict';
 
-(function (Olive) {
+((Olive) => {
   Olive.languages = {};
   let current = 'en';
 
@@ -16,7 +16,7 @@
     return 'en';
   }
 
-  Olive.speak = function (tag) {
+  Olive.speak = (tag) => {
     current = Olive.languages[tag] ? tag : preferred();
     document.documentElement.lang = current;
     document.documentElement.dir = Olive.languages[current].direction;
@@ -25,25 +25,30 @@
   Olive.language = () => current;
 
   // say('continueAt', {time: '4:05'}); `n` among the values chooses the plural form.
-  Olive.say = function (key, values) {
+  Olive.say = (key, values) => {
     let word = Olive.languages[current].words[key] || Olive.languages.en.words[key];
     if (typeof word === 'object') word = word[new Intl.PluralRules(current).select(values.n)] || word.other;
     return word.replace(/\{(\w+)\}/g, (whole, name) => (values && name in values ? values[name] : whole));
   };
 
   // The reader's own region of the language, for dates and numbers; digits as on the clock.
-  const region = () => ((navigator.languages || []).find((tag) => tag.toLowerCase().split('-')[0] === current) || current) + '-u-nu-latn';
+  const region = () =>
+    ((navigator.languages || []).find((tag) => tag.toLowerCase().split('-')[0] === current) || current) + '-u-nu-latn';
 
   Olive.number = (value, digits) => new Intl.NumberFormat(region(), {maximumFractionDigits: digits || 0}).format(value);
   Olive.day = (date) => new Intl.DateTimeFormat(region(), {dateStyle: 'long'}).format(date);
-  Olive.fileSize = function (megaBytes) {
+  Olive.fileSize = (megaBytes) => {
     const [value, unit] = megaBytes < 1 ? [Math.ceil(megaBytes * 1024), 'kilobyte'] : [megaBytes, 'megabyte'];
-    return new Intl.NumberFormat(region(), {style: 'unit', unit, maximumFractionDigits: value < 10 ? 1 : 0}).format(value);
+    return new Intl.NumberFormat(region(), {style: 'unit', unit, maximumFractionDigits: value < 10 ? 1 : 0}).format(
+      value,
+    );
   };
   // "1 hour 12 minutes" for those who listen; the clock form is for the eye.
-  Olive.spokenTime = function (seconds) {
-    const whole = Math.floor(seconds), parts = [];
-    const unit = (value, name) => new Intl.NumberFormat(region(), {style: 'unit', unit: name, unitDisplay: 'long'}).format(value);
+  Olive.spokenTime = (seconds) => {
+    const whole = Math.floor(seconds),
+      parts = [];
+    const unit = (value, name) =>
+      new Intl.NumberFormat(region(), {style: 'unit', unit: name, unitDisplay: 'long'}).format(value);
     if (whole >= 3600) parts.push(unit(Math.floor(whole / 3600), 'hour'));
     if (whole >= 60) parts.push(unit(Math.floor(whole / 60) % 60, 'minute'));
     parts.push(unit(whole % 60, 'second'));

@@ -20,7 +20,8 @@ window.Olive.languages.de = {
     back: '{n} Sekunden zurück',
     badLink: 'Diese Adresse lässt sich nicht öffnen.',
     cancel: 'Abbrechen',
-    cannotPlay: 'Das lässt sich hier nicht abspielen: Die Datei fehlt, ist beschädigt oder von einer Art, die dieser Browser nicht kennt.',
+    cannotPlay:
+      'Das lässt sich hier nicht abspielen: Die Datei fehlt, ist beschädigt oder von einer Art, die dieser Browser nicht kennt.',
     cannotShow: 'Dieses Bild lässt sich nicht zeigen: Die Datei fehlt oder ist beschädigt.',
     'category-Audio': 'Audio',
     'category-Document': 'Dokument',
@@ -50,11 +51,13 @@ window.Olive.languages.de = {
     editHint: 'Eingabe sichert, Esc verwirft',
     editHintLong: 'Strg+Eingabe sichert, Esc verwirft',
     editing: 'Texte dieser Seite bearbeiten',
-    editLost: 'Das Programm hinter dieser Seite läuft nicht mehr; Ihr Text steht noch hier. Kopieren Sie ihn, starten Sie das Programm neu und öffnen Sie dessen neue Adresse.',
+    editLost:
+      'Das Programm hinter dieser Seite läuft nicht mehr; Ihr Text steht noch hier. Kopieren Sie ihn, starten Sie das Programm neu und öffnen Sie dessen neue Adresse.',
     editRefused: 'Das wurde nicht gesichert: {reason}',
     editTitle: 'Titel bearbeiten',
     editTooLong: 'Dieser Text ist zu lang, um gesichert zu werden. Kürzen Sie ihn.',
-    editUnsaved: 'Das ist geändert, kann aber nicht auf die Platte geschrieben werden. Schaffen Sie Platz oder erlauben Sie das Schreiben und sichern Sie noch einmal.',
+    editUnsaved:
+      'Das ist geändert, kann aber nicht auf die Platte geschrieben werden. Schaffen Sie Platz oder erlauben Sie das Schreiben und sichern Sie noch einmal.',
     emptyPackage: 'In diesem Paket ist noch nichts.',
     extras: 'Extras',
     file: 'Datei',
@@ -84,7 +87,8 @@ window.Olive.languages.de = {
     lists: 'Listen',
     liveChanged: 'Beiträge kamen hinzu, verschwanden oder wurden verschoben.',
     liveShow: 'Zeigen',
-    liveStopped: 'Das Programm hinter dieser Seite läuft nicht mehr. Starten Sie es zum Bearbeiten neu und öffnen Sie dessen neue Adresse.',
+    liveStopped:
+      'Das Programm hinter dieser Seite läuft nicht mehr. Starten Sie es zum Bearbeiten neu und öffnen Sie dessen neue Adresse.',
     motion: 'Animationen',
     mute: 'Ton aus',
     muted: 'Ton aus',

@@ -20,7 +20,8 @@ window.Olive.languages.en = {
     back: 'Back {n} seconds',
     badLink: 'This address cannot be opened.',
     cancel: 'Cancel',
-    cannotPlay: 'This cannot be played here: its file is missing, damaged or of a kind that this browser does not know.',
+    cannotPlay:
+      'This cannot be played here: its file is missing, damaged or of a kind that this browser does not know.',
     cannotShow: 'This picture cannot be shown: its file is missing or damaged.',
     'category-Audio': 'Audio',
     'category-Document': 'Document',
@@ -50,7 +51,8 @@ window.Olive.languages.en = {
     editHint: 'Enter saves, Esc reverts',
     editHintLong: 'Ctrl+Enter saves, Esc reverts',
     editing: 'Edit the texts of this page',
-    editLost: 'The program that serves this page has stopped; your text is still here. Copy it, start the program again and open its new address.',
+    editLost:
+      'The program that serves this page has stopped; your text is still here. Copy it, start the program again and open its new address.',
     editRefused: 'This was not saved: {reason}',
     editTitle: 'Edit the title',
     editTooLong: 'This text is too long to be saved. Shorten it.',

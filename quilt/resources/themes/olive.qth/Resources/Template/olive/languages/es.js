@@ -20,7 +20,8 @@ window.Olive.languages.es = {
     back: 'Retroceder {n} segundos',
     badLink: 'Esta dirección no se puede abrir.',
     cancel: 'Cancelar',
-    cannotPlay: 'No se puede reproducir aquí: el archivo falta, está dañado o es de un tipo que este navegador no conoce.',
+    cannotPlay:
+      'No se puede reproducir aquí: el archivo falta, está dañado o es de un tipo que este navegador no conoce.',
     cannotShow: 'No se puede mostrar esta imagen: el archivo falta o está dañado.',
     'category-Audio': 'Audio',
     'category-Document': 'Documento',
@@ -50,11 +51,13 @@ window.Olive.languages.es = {
     editHint: 'Intro guarda, Esc descarta',
     editHintLong: 'Ctrl+Intro guarda, Esc descarta',
     editing: 'Editar los textos de esta página',
-    editLost: 'El programa que sirve esta página se ha detenido; su texto sigue aquí. Cópielo, inicie de nuevo el programa y abra su nueva dirección.',
+    editLost:
+      'El programa que sirve esta página se ha detenido; su texto sigue aquí. Cópielo, inicie de nuevo el programa y abra su nueva dirección.',
     editRefused: 'Esto no se ha guardado: {reason}',
     editTitle: 'Editar el título',
     editTooLong: 'Este texto es demasiado largo para guardarlo. Acórtelo.',
-    editUnsaved: 'Se ha cambiado, pero no se puede escribir en el disco. Libere espacio o permita la escritura y guarde otra vez.',
+    editUnsaved:
+      'Se ha cambiado, pero no se puede escribir en el disco. Libere espacio o permita la escritura y guarde otra vez.',
     emptyPackage: 'Todavía no hay nada en este paquete.',
     extras: 'Extras',
     file: 'Archivo',
@@ -84,7 +87,8 @@ window.Olive.languages.es = {
     lists: 'Listas',
     liveChanged: 'Se han añadido, quitado o movido elementos.',
     liveShow: 'Mostrar',
-    liveStopped: 'El programa que sirve esta página se ha detenido. Para editar, inícielo de nuevo y abra su nueva dirección.',
+    liveStopped:
+      'El programa que sirve esta página se ha detenido. Para editar, inícielo de nuevo y abra su nueva dirección.',
     motion: 'Animaciones',
     mute: 'Silenciar',
     muted: 'Silenciado',

@@ -50,11 +50,13 @@ window.Olive.languages.fr = {
     editHint: 'Entrée enregistre, Échap annule',
     editHintLong: 'Ctrl+Entrée enregistre, Échap annule',
     editing: 'Modifier les textes de cette page',
-    editLost: 'Le programme qui sert cette page s’est arrêté ; votre texte est toujours là. Copiez-le, relancez le programme et ouvrez sa nouvelle adresse.',
+    editLost:
+      'Le programme qui sert cette page s’est arrêté ; votre texte est toujours là. Copiez-le, relancez le programme et ouvrez sa nouvelle adresse.',
     editRefused: 'Cela n’a pas été enregistré : {reason}',
     editTitle: 'Modifier le titre',
     editTooLong: 'Ce texte est trop long pour être enregistré. Raccourcissez-le.',
-    editUnsaved: 'C’est modifié, mais impossible à écrire sur le disque. Libérez de la place ou autorisez l’écriture, puis enregistrez de nouveau.',
+    editUnsaved:
+      'C’est modifié, mais impossible à écrire sur le disque. Libérez de la place ou autorisez l’écriture, puis enregistrez de nouveau.',
     emptyPackage: 'Il n’y a encore rien dans ce paquet.',
     extras: 'Suppléments',
     file: 'Fichier',
@@ -84,7 +86,8 @@ window.Olive.languages.fr = {
     lists: 'Listes',
     liveChanged: 'Des éléments ont été ajoutés, retirés ou déplacés.',
     liveShow: 'Afficher',
-    liveStopped: 'Le programme qui sert cette page s’est arrêté. Pour modifier, relancez-le et ouvrez sa nouvelle adresse.',
+    liveStopped:
+      'Le programme qui sert cette page s’est arrêté. Pour modifier, relancez-le et ouvrez sa nouvelle adresse.',
     motion: 'Animations',
     mute: 'Couper le son',
     muted: 'Son coupé',
