@@ -20,18 +20,25 @@
     }
   }
 
-  /** One object of the model. Its class's accessors are its methods; two answers for one object are the same. */
+  /**
+   * One object of the model. Its class's accessors are its methods; two answers for one object are the same. Beside
+   * them, stored(accessor) answers what the object stores: null where the accessor answers something that stands in.
+   */
   class ConveyorObject {
     #call;
     constructor(className, call) {
       this.#call = call;
       this.className = className;
     }
+    async stored(accessor) {
+      const {value, standsIn} = await this.#call(accessor, []);
+      return standsIn ? null : value;
+    }
     static define(name, accessors) {
       const Class = class extends ConveyorObject {};
       for (const accessor of accessors) {
-        Class.prototype[accessor.replace(':', '')] = function (...given) {
-          return this.#call(accessor, given);
+        Class.prototype[accessor.replace(':', '')] = async function (...given) {
+          return (await this.#call(accessor, given)).value;
         };
       }
       Object.defineProperty(Class, 'name', {value: name});
@@ -128,7 +135,8 @@
         const Class = this.#classes.get(value.class);
         object = new Class(value.class, async (method, given) => {
           const call = {session: this.#identity, object: handle, method, arguments: given};
-          return this.#valueOf((await this.#post('call', call)).value);
+          const answer = await this.#post('call', call);
+          return {value: this.#valueOf(answer.value), standsIn: answer.standsIn === true};
         });
         this.#objects.set(handle, object);
       }

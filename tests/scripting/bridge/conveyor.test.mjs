@@ -85,6 +85,24 @@ test('offers exactly the accessors that are declared', async () => {
   await conveyor.close();
 });
 
+test('tells what is stored from what stands in for it', async () => {
+  const conveyor = connect(address);
+  const document = await conveyor.document();
+  assert.equal(await document.stored('cvTitle'), 'Talk');
+  assert.equal(await document.stored('cvDescription'), null);
+  const standIn = await document.cvDescription();
+  assert.match(standIn, /^Lorem ipsum/);
+  await document.cvSetDescription(standIn);
+  assert.equal(
+    await document.stored('cvDescription'),
+    standIn,
+    'the same words are a description when they are stored',
+  );
+  await document.cvSetDescription(null);
+  assert.equal(await (await document.cvMediaAtIndex(0)).stored('cvDescription'), null);
+  await conveyor.close();
+});
+
 test('refuses wrong arguments by a code', async () => {
   const conveyor = connect(address);
   const document = await conveyor.document();
