@@ -272,12 +272,14 @@ describe('languages', () => {
       ]) {
         await page.click('.head-tools .icon-button >> nth=1');
         await page.selectOption('.settings select >> nth=1', tag);
+        await until(page, (language) => document.documentElement.lang === language, tag);
         await page.keyboard.press('Escape');
         assert.equal((await page.textContent('.hero .primary')).trim(), word);
         assert.equal(await page.evaluate(() => document.documentElement.lang), tag);
       }
       await page.click('.head-tools .icon-button >> nth=1');
       await page.selectOption('.settings select >> nth=1', 'fr');
+      await until(page, () => document.documentElement.lang === 'fr');
       await page.reload();
       assert.match(await page.textContent('.facts'), /9 éléments/);
     }));

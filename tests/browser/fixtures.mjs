@@ -184,7 +184,18 @@ export class Fixtures {
   }
 
   all() {
-    for (const name of ['course', 'single', 'portrait', 'lecture', 'many', 'broken', 'hostile']) this[name]();
+    for (const name of [
+      'course',
+      'single',
+      'portrait',
+      'lecture',
+      'voiceAndSlides',
+      'shortVoice',
+      'many',
+      'broken',
+      'hostile',
+    ])
+      this[name]();
   }
 
   course() {
@@ -224,6 +235,32 @@ export class Fixtures {
           },
         ],
       };
+    });
+  }
+
+  /// A lecture of a voice and slides.
+  voiceAndSlides() {
+    return this.made('voice-and-slides', () => {
+      const voice = this.media.sound('voice.m4a', {seconds: 20});
+      const slides = this.media.movie('slides.mp4', {seconds: 20, colour: '0x5b4a2a', silent: true, size: '640x360'});
+      const sources = [
+        {category: 'Audio', hasSound: true, files: [{path: voice, duration: 20}]},
+        {category: 'Movie', files: [{path: slides, width: 640, height: 360, duration: 20}]},
+      ];
+      return {title: 'Spoken', media: [{category: 'DualSource', title: 'Spoken', sources}]};
+    });
+  }
+
+  /// A film with a voice over it that ends after four seconds.
+  shortVoice() {
+    return this.made('short-voice', () => {
+      const film = this.media.movie('grove-480p.mp4', {seconds: 12, size: '640x360'});
+      const voice = this.media.sound('short-voice.m4a', {seconds: 4});
+      const sources = [
+        {category: 'Movie', hasSound: true, files: [{path: film, width: 640, height: 360, duration: 12}]},
+      ];
+      const commentary = {category: 'Audio', hasSound: true, files: [{path: voice, duration: 4}]};
+      return {title: 'Commented', media: [{category: 'Movie', title: 'Commented', sources, commentary}]};
     });
   }
 

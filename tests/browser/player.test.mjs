@@ -3,7 +3,7 @@
 import assert from 'node:assert/strict';
 import {describe, test} from 'node:test';
 import {fileUrl} from './browser.mjs';
-import {fixtures, playerState, playing, start, until, useBrowser} from './support.mjs';
+import {choose, fixtures, playerState, playing, start, until, useBrowser} from './support.mjs';
 
 const shared = useBrowser();
 const course = fixtures.course();
@@ -254,7 +254,7 @@ describe('the player', () => {
         await page.evaluate(() => window.Olive.app.stage.transport.actions.setSpeed(1.5));
         const before = await time(page);
         const began = Date.now();
-        await page.selectOption('select[aria-label="Quality"]', '480p');
+        await choose(page, '480p · 640 × 360');
         await until(
           page,
           () =>
@@ -279,7 +279,7 @@ describe('the player', () => {
       course,
       async (page) => {
         await page.evaluate(() => window.Olive.app.stage.player.seek(7.3));
-        await page.selectOption('select[aria-label="Quality"]', '480p');
+        await choose(page, '480p · 640 × 360');
         await until(page, () => window.Olive.app.stage.player.leader.element.videoHeight === 360);
         near(await page.evaluate(() => window.Olive.app.stage.player.leader.element.currentTime), 7.3, 0.1);
         assert.equal((await playerState(page)).isPlaying, false);
@@ -314,7 +314,7 @@ describe('the player', () => {
     shared.visit(
       course,
       async (page) => {
-        await page.selectOption('select[aria-label="Speed"]', '1.5');
+        await choose(page, '1.5×');
         await page.keyboard.press('n');
         await until(page, () => document.querySelector('#item-title').textContent === 'A song from the harvest');
         await start(page);

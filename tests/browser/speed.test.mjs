@@ -22,7 +22,8 @@ describe('five hundred items', () => {
             ),
         );
         assert.equal(await page.locator('.card').count(), 500);
-        const timing = await page.evaluate(() => {
+        const timing = await page.evaluate(async () => {
+          await window.Olive.load('search');
           const find = window.Olive.makeFinder(window.Olive.app.pack.items);
           const first = performance.now();
           const one = find('pressing');

@@ -74,3 +74,10 @@ export const start = async (page) => {
   await page.click('.big-play');
   await playing(page);
 };
+
+/// Chooses in the menu of the controls: a speed or quality by its words.
+export async function choose(page, words) {
+  await page.click('.transport .menu-place > button');
+  await page.click(`.menu-choice:has(span:text-is("${words}"))`);
+  await page.keyboard.press('Escape');
+}

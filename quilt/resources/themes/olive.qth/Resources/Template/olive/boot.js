@@ -5,7 +5,7 @@
 (() => {
   const missing = [];
   let broken = '';
-  const Olive = {};
+  const Olive = /** @type {Window['Olive']} */ ({}); // every script adds what it offers
   window.Olive = Olive;
   document.documentElement.classList.add('scripted'); // hides the notice that index.html carries
 
@@ -42,12 +42,12 @@
       complain(cause());
       return;
     }
-    try {
-      Olive.start(data);
-    } catch (error) {
-      complain('The package cannot be shown: ' + error.message);
-      throw error;
-    }
-    document.getElementById('notice').remove();
+    Olive.start(data).then(
+      () => document.getElementById('notice')?.remove(),
+      (error) => {
+        complain('The package cannot be shown: ' + error.message);
+        throw error;
+      },
+    );
   });
 })();

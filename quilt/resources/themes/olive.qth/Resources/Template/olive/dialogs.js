@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-// Search, settings, keyboard help. The browser's own dialogs keep the focus inside and give it back.
+// Settings, keyboard help, and the frame of every dialog. The browser's own dialogs keep the focus inside and give it back.
 'use strict';
 
 ((Olive) => {
@@ -31,87 +31,6 @@
     return dialog;
   }
 
-  // find: from makeFinder; query: what to begin with; onChoice(hit, terms).
-  Olive.openSearch = (find, query, onChoice) => {
-    const results = make('div', {class: 'results'});
-    const count = make('p', {class: 'result-count', role: 'status'});
-    const field = make('input', {
-      type: 'search',
-      class: 'search-field',
-      'aria-label': say('search'),
-      placeholder: say('searchHint'),
-      autocomplete: 'off',
-      spellcheck: 'false',
-    });
-
-    function where(hit) {
-      if (hit.page) return say('page', {n: hit.page});
-      if (hit.kind === 'chapter') return hit.t === undefined ? '' : Olive.clock(hit.t);
-      if (hit.kind === 'extra') return say('extras');
-      return hit.item.category ? Olive.kindOf(hit.item) : '';
-    }
-
-    function update() {
-      const {hits, terms, total} = find(field.value);
-      count.textContent = terms.length ? (total ? say('resultCount', {n: total}) : say('noResults')) : '';
-      results.replaceChildren(
-        make(
-          'ul',
-          null,
-          hits.map((hit) => {
-            const isTitle = hit.kind === 'title';
-            return make(
-              'li',
-              null,
-              make(
-                'a',
-                {
-                  class: 'hit',
-                  href: Olive.address.to({item: hit.item.id, t: hit.t, page: hit.page}),
-                  onclick: () => {
-                    dialog.close();
-                    onChoice(hit, terms, field.value);
-                  },
-                },
-                make(
-                  'span',
-                  {class: 'hit-title', dir: 'auto'},
-                  isTitle ? Olive.highlighted(hit.text, terms) : hit.item.title,
-                ),
-                !isTitle && make('span', {class: 'hit-text', dir: 'auto'}, Olive.highlighted(hit.text, terms)),
-                make('span', {class: 'meta', text: where(hit)}),
-              ),
-            );
-          }),
-        ),
-      );
-    }
-
-    field.value = query;
-    field.addEventListener('input', update);
-    field.addEventListener('keydown', (event) => {
-      const first = results.querySelector('a');
-      if (event.key === 'Enter' && first) first.click();
-      else if (event.key === 'ArrowDown' && first) first.focus();
-      else if (event.key === 'Escape')
-        dialog.close(); // at once, not after the field was emptied
-      else return;
-      event.preventDefault();
-    });
-    results.addEventListener('keydown', (event) => {
-      const step = {ArrowDown: 1, ArrowUp: -1}[event.key];
-      if (!step) return;
-      const links = [...results.querySelectorAll('a')];
-      const target = links.indexOf(document.activeElement) + step;
-      (links[target] || field).focus();
-      event.preventDefault();
-    });
-    const dialog = openDialog('search-dialog', say('search'), [field, count, results]);
-    field.focus();
-    field.select();
-    update();
-  };
-
   function choice(label, value, options, onchange) {
     const select = make(
       'select',
@@ -128,18 +47,23 @@
     return make('label', {class: 'setting'}, make('span', {text: label}), box);
   }
 
-  // apply(isAnew, before): shows the choices; anew when words or marks change, after before() was done.
-  Olive.openSettings = (memory, apply) => {
-    const set = (name, isAtOnce) => (value) => {
+  // app: see app.js
+  Olive.openSettings = (app) => {
+    const {memory} = app;
+    const set = (name) => (value) => {
       memory.choose(name, value);
-      apply(isAtOnce);
+      app.apply();
+    };
+    const setLanguage = (value) => {
+      memory.choose('language', value);
+      app.rebuild();
     };
     const forget = make('button', {
       type: 'button',
       class: 'quiet',
       text: say('forget'),
       onclick: () => {
-        apply(true, memory.forget);
+        app.rebuild(memory.forget);
         Olive.announce(say('forgotten'));
         forget.disabled = true;
       },
@@ -160,8 +84,8 @@
         choice(
           say('language'),
           memory.choice('language', ''),
-          [['', say('automatic')], ...Object.entries(Olive.languages).map(([key, language]) => [key, language.name])],
-          set('language', true),
+          [['', say('automatic')], ...Object.entries(Olive.languageNames)],
+          setLanguage,
         ),
         toggle(say('motion'), memory.choice('motion', true), set('motion')),
         toggle(say('autoAdvance'), memory.choice('advance', false), set('advance')),

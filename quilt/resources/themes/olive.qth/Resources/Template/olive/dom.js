@@ -101,7 +101,8 @@
       live = Olive.make('div', {class: 'unseen', role: 'status', id: 'announcements'});
       document.body.append(live);
     }
-    live.textContent = text;
+    // The same words again are told again, because something about them differs.
+    live.textContent = live.textContent === text ? text + '\u00a0' : text;
   };
 
   const pad = (number) => String(number).padStart(2, '0');

@@ -3,7 +3,6 @@
 'use strict';
 
 ((Olive) => {
-  const kMostHits = 60;
   const kSnippet = 90;
   const fold = (text) => text.normalize('NFD').replace(/\p{M}/gu, '').toLowerCase();
 
@@ -87,7 +86,7 @@
       if (!terms.length) return {hits: [], terms, total: 0};
       entries = entries || index();
       const found = entries.filter((entry) => terms.every((term) => entry.folded.includes(term)));
-      return {hits: found.slice(0, kMostHits), terms, total: found.length};
+      return {hits: found, terms, total: found.length};
     };
   };
 })(window.Olive);

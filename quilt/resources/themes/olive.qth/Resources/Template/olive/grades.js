@@ -58,4 +58,13 @@
   Olive.gradeLabel = ({grade, file}) =>
     file.height ? `${grade} · ${Math.round(file.width)} × ${Math.round(file.height)}` : grade;
   Olive.pixelsAcross = (node) => (node.clientWidth || innerWidth) * (window.devicePixelRatio || 1);
+
+  // The file of a picture for this width in device pixels, of those that the browser can draw; null when there is none.
+  Olive.pictureFile = (source, width) => new Grades({files: source.files.filter(Olive.isPicture)}, '').pick(width);
+
+  // The address that shows a still at this width: a file that the browser can draw, else the preview.
+  Olive.stillAddress = (source, width) => {
+    const file = Olive.pictureFile(source, width);
+    return file ? file.address : source.previews[0]?.picture || '';
+  };
 })(window.Olive);

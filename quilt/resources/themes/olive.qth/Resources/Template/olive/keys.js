@@ -21,6 +21,7 @@
     [['D'], 'views'],
     [['F'], 'fullscreen'],
     [['I'], 'pip'],
+    [['W'], 'theatre'],
     [['V'], 'present'],
     [['B', '.'], 'key-blank'],
     [['T'], 'pageText'],
@@ -34,7 +35,7 @@
   const kSigns = {BracketLeft: '[', BracketRight: ']', Slash: '/', Equal: '=', Minus: '-', Comma: ',', Period: '.'};
 
   const isField = (node) =>
-    node.closest('input:not([type=range]):not([type=checkbox]), select, textarea, [contenteditable]');
+    node.closest('input:not([type=range]):not([type=checkbox]):not([type=radio]), select, textarea, [contenteditable]');
 
   // What a key means: the sign that it types on this keyboard when that is one of ours, else where it lies. So K is K on
   // every Latin keyboard, and lies where K lies on a Cyrillic, Greek or Arabic one.
@@ -54,7 +55,8 @@
       pager = stage?.pager,
       sheet = stage?.sheet,
       act = stage?.transport?.actions;
-    const slider = target.closest('input[type=range]');
+    const slider = target.closest('input[type=range]'),
+      isChoice = target.matches('input[type=radio]');
     const isZoomed = !!sheet?.isZoomed();
     const used = (action) => {
       action();
@@ -63,14 +65,14 @@
     const turn = (step) => {
       if (pager) return pager.go(pager.index + step) !== false;
       if (act?.chapter(step)) return true;
-      return app.isPresenting() && used(() => app.step(step));
+      return app.screen.isPresenting && used(() => app.step(step));
     };
     const aside = (step) => {
-      if (slider?.classList.contains('volume')) return false;
+      if (isChoice || slider?.classList.contains('volume')) return false;
       if (pager && !player) return !isZoomed && pager.go(pager.index + step) !== false;
       return !!act && used(() => act.skip(5 * step));
     };
-    const louder = (step) => !isZoomed && !!act && used(() => act.louder(step));
+    const louder = (step) => !isZoomed && !isChoice && !!act && used(() => act.louder(step));
     const edge = (isEnd) => {
       if (slider) return false; // the slider's own ends
       if (pager) return used(() => pager.go(isEnd ? pager.count - 1 : 0));
@@ -78,7 +80,7 @@
     };
     return {
       ' ': () => {
-        if (target.closest('button, a, summary')) return false;
+        if (isChoice || target.closest('button, a, summary')) return false;
         if (player) player.toggle();
         else pager?.go(pager.index + (event.shiftKey ? -1 : 1));
         return true;
@@ -112,12 +114,13 @@
       n: () => app.step(1),
       p: () => app.step(-1),
       s: () => stage?.view?.swap(),
-      d: () => app.nextView(),
-      f: () => app.toggleFullscreen(),
-      i: () => app.togglePictureInPicture(),
-      v: () => app.togglePresenting(),
-      b: () => app.isPresenting() && app.toggleBlank(),
-      '.': () => app.isPresenting() && app.toggleBlank(),
+      d: () => stage?.view?.next(),
+      f: () => app.screen.toggleFullscreen(),
+      i: () => app.screen.togglePictureInPicture(),
+      v: () => app.screen.togglePresenting(),
+      w: () => stage && app.screen.toggleTheatre(),
+      b: () => app.screen.isPresenting && app.screen.toggleBlank(),
+      '.': () => app.screen.isPresenting && app.screen.toggleBlank(),
       '+': () => sheet?.zoomBy(1),
       '=': () => sheet?.zoomBy(1),
       '-': () => sheet?.zoomBy(-1),
@@ -132,7 +135,7 @@
     return keys;
   }
 
-  // app: {stage(), frame(), isOn(), isPresenting(), step(n), …}: see app.js
+  // app: {screen, stage(), frame(), isOn(), step(n), …}: see keys() in app.js
   Olive.listenToKeys = (app) => {
     document.addEventListener('keydown', (event) => {
       const isTyped = event.getModifierState?.('AltGraph'); // brackets of many keyboards
@@ -143,7 +146,7 @@
       if (isField(target)) return;
       const now = {stage: app.stage(), target, event};
       const key = meaningOf(event);
-      const inPlayer = app.isPresenting() || app.frame()?.contains(target);
+      const inPlayer = app.screen.isPresenting || app.frame()?.contains(target);
       const inside = inPlayer && keysOfPlayer(app, now)[key];
       const anywhere = keysOfPage(app, now)[key];
       if (inside ? inside() : anywhere) event.preventDefault();

@@ -52,7 +52,7 @@
       items.map((item) =>
         make(
           'li',
-          {class: 'card', 'data-category': item.category},
+          {class: 'card', 'data-category': item.category, 'data-id': item.id},
           make(
             'a',
             {href: Olive.address.to({item: item.id})},

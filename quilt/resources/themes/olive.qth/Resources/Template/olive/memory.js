@@ -33,10 +33,10 @@
         choices[name] = value;
         write('choices', choices);
       },
-      // {time, share, page, done} of an item: seconds, part seen from 0 to 1, page index, whether it was seen to its end.
+      // {time, share, page, done, at} of an item: seconds, part seen from 0 to 1, page index, whether it was seen to its end, when.
       place: (item) => places[item.id] || {},
       keep(item, place) {
-        places[item.id] = {...places[item.id], ...place};
+        places[item.id] = {...places[item.id], ...place, at: Date.now()};
         write('places', places);
       },
       forget() {

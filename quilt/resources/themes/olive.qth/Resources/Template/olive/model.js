@@ -146,6 +146,8 @@
           : null,
       link: category === 'Web' && first ? first.link : null,
       pages: category === 'Document' && sources[0] ? sources[0].previews : [],
+      chapters: [],
+      duration: 0,
     };
     item.chapters = chaptersOf(item);
     item.duration = durationOf(item);

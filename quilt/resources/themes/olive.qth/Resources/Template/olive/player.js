@@ -79,8 +79,9 @@
   // Events: "time", "state" (playing, waiting or rate changed), "duration", "ended", "blocked" (the browser wants a
   // gesture first), "failed" (no file of a stream is left; detail is the stream), "file" (another file is shown).
   class Player extends EventTarget {
-    // parts: [{element, grades, offset, leads}]; duration: seconds as the package tells, until the files tell better.
-    constructor(parts, duration) {
+    // parts: [{element, grades, offset, leads, speaksAgain}]: speaksAgain is heard when what leads is over. duration:
+    // seconds as the package tells, until the files tell better. runsAlone: a clock goes on when every stream has failed.
+    constructor(parts, duration, runsAlone = false) {
       super();
       this.streams = parts.map((part) => new Stream(part.element, part.grades, part.offset || 0));
       const first = Math.min(...this.streams.map((stream) => stream.offset));
@@ -93,6 +94,8 @@
           )
         ] || null;
       this.told = duration;
+      this.runsAlone = runsAlone;
+      this.spare = this.streams[parts.findIndex((part) => part.speaksAgain)] || null;
       this.wanted = false;
       this.speed = 1;
       this.loudness = 1;
@@ -107,6 +110,11 @@
 
     emit(name, detail) {
       this.dispatchEvent(new CustomEvent(name, {detail}));
+    }
+
+    // Whether time runs by the clock, without any stream.
+    get isFree() {
+      return !this.streams.length || (this.runsAlone && this.streams.every((stream) => stream.hasFailed));
     }
 
     get isPlaying() {
@@ -134,7 +142,7 @@
 
     get time() {
       const clock = this.clock;
-      if (!clock) return this.virtual;
+      if (!clock || this.isFree) return this.virtual;
       const seconds = clock.pending === null ? clock.element.currentTime : clock.pending;
       return Olive.clamp(seconds + clock.offset, 0, this.duration);
     }
@@ -202,9 +210,11 @@
       stream.hasFailed = true;
       this.stalled.delete(stream);
       if (stream === this.leader) {
+        const isPlaying = this.wanted;
         this.pause();
         this.leader = this.live[0] || stream;
         this.applySound();
+        if (isPlaying && this.isFree) this.play();
       }
       this.emit('failed', stream);
     }
@@ -219,7 +229,7 @@
     }
 
     play() {
-      if (this.streams.length && !this.live.length) return;
+      if (!this.isFree && !this.live.length) return;
       if (this.hasEnded || (this.duration && this.time >= this.duration - 0.05)) this.seek(0);
       this.wanted = true;
       this.started = performance.now();
@@ -294,8 +304,9 @@
 
     // The regular look while playing.
     look() {
-      if (!this.streams.length) this.advance();
+      if (this.isFree) this.advance();
       if (this.stalled.size) return;
+      this.applySound();
       const clock = this.clock;
       if (clock && clock.element.readyState > 0) {
         this.run(clock);
@@ -345,7 +356,7 @@
 
     finish() {
       const clock = this.clock;
-      if (clock && !clock.element.ended && this.time < this.duration - 0.25) return; // another one goes on
+      if (clock && !this.isFree && !clock.element.ended && this.time < this.duration - 0.25) return; // another one goes on
       this.hasEnded = true;
       this.virtual = this.duration;
       this.pause();
@@ -369,10 +380,19 @@
       this.emit('state');
     }
 
+    // Who is heard: what leads, or after its end the one that speaks again.
+    get speaker() {
+      const {leader, spare} = this;
+      const isOver = leader && spare && leader !== spare && (leader.hasFailed || this.time >= leader.end - kTolerance);
+      return isOver && !spare.hasFailed ? spare : leader;
+    }
+
     applySound() {
+      const heard = this.speaker;
       for (const stream of this.streams) {
-        stream.element.volume = this.loudness;
-        stream.element.muted = this.isMuted || stream !== this.leader;
+        if (stream.element.volume !== this.loudness) stream.element.volume = this.loudness;
+        const isMuted = this.isMuted || stream !== heard;
+        if (stream.element.muted !== isMuted) stream.element.muted = isMuted;
       }
     }
 

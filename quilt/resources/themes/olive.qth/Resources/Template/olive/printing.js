@@ -64,41 +64,40 @@
     );
   }
 
-  Olive.preparePrinting = (pack) => {
-    const prepare = () => {
-      if (paper) return;
-      paper = make(
-        'div',
-        {id: 'paper'},
-        make('h1', {dir: 'auto', text: pack.title}),
-        make('p', {
-          class: 'meta',
-          text: [pack.author, pack.collection, pack.modified ? Olive.day(pack.modified) : '']
-            .filter(Boolean)
-            .join(' · '),
-        }),
-        pack.poster && Olive.picture(pack.poster, {loading: 'eager', class: 'printed-poster'}),
-        Olive.paragraphs(pack.description),
-        pack.items.length > 1 &&
-          make(
-            'ol',
-            {class: 'printed-contents'},
-            pack.items.map((item) => make('li', {dir: 'auto', text: item.title})),
-          ),
-        pack.items.map(printedItem),
-      );
-      document.body.append(paper);
-    };
-    addEventListener('beforeprint', prepare);
-    addEventListener('afterprint', () => {
-      if (paper) paper.remove();
-      paper = null;
-    });
-    // The pictures are loaded before the dialog opens.
-    return async () => {
-      prepare();
-      await Promise.all([...paper.querySelectorAll('img')].map((image) => image.decode().catch(() => {})));
-      print();
-    };
+  function prepare() {
+    if (paper) return;
+    const {pack} = Olive.app;
+    paper = make(
+      'div',
+      {id: 'paper'},
+      make('h1', {dir: 'auto', text: pack.title}),
+      make('p', {
+        class: 'meta',
+        text: [pack.author, pack.collection, pack.modified ? Olive.day(pack.modified) : ''].filter(Boolean).join(' · '),
+      }),
+      pack.poster && Olive.picture(pack.poster, {loading: 'eager', class: 'printed-poster'}),
+      Olive.paragraphs(pack.description),
+      pack.items.length > 1 &&
+        make(
+          'ol',
+          {class: 'printed-contents'},
+          pack.items.map((item) => make('li', {dir: 'auto', text: item.title})),
+        ),
+      pack.items.map(printedItem),
+    );
+    document.body.append(paper);
+  }
+
+  addEventListener('beforeprint', prepare);
+  addEventListener('afterprint', () => {
+    paper?.remove();
+    paper = null;
+  });
+
+  // Prints the package once its pictures are there.
+  Olive.print = async () => {
+    prepare();
+    await Promise.all([...paper.querySelectorAll('img')].map((image) => image.decode().catch(() => {})));
+    print();
   };
 })(window.Olive);

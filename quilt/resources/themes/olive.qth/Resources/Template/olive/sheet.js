@@ -15,7 +15,11 @@
       size = {width: 0, height: 0};
     const pane = make('div', {class: 'sheet', tabindex: 0, role: 'group'});
     const level = make('span', {class: 'level'});
-    const sheet = {element: pane, onFail: () => {}};
+    const sheet = /** @type {ReturnType<typeof Olive.makeSheet>} */ ({
+      element: pane,
+      onFail: () => {},
+      onSize: (_width, _height) => {},
+    });
 
     function place() {
       if (!picture) return;
@@ -63,7 +67,10 @@
       factor = 1;
       picture = make('img', {alt: label, draggable: 'false', decoding: 'async'});
       const mine = picture;
-      picture.addEventListener('load', place);
+      picture.addEventListener('load', () => {
+        place();
+        if (picture === mine && factor === 1) sheet.onSize(mine.naturalWidth, mine.naturalHeight);
+      });
       picture.addEventListener('error', () => {
         if (picture === mine) sheet.onFail();
       });
@@ -104,7 +111,7 @@
       Olive.iconButton('minus', say('zoomOut'), () => sheet.zoomBy(-1)),
       level,
       Olive.iconButton('plus', say('zoomIn'), () => sheet.zoomBy(1)),
-      Olive.iconButton('fit', say('fit'), sheet.fit),
+      Olive.iconButton('fit', say('fit'), sheet.fit, {class: 'icon-button fit'}),
     );
     return sheet;
   };

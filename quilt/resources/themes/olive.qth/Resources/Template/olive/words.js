@@ -5,19 +5,27 @@
 
 ((Olive) => {
   Olive.languages = {};
+  // Those that can be had, by their own names; their words are fetched when they are chosen.
+  Olive.languageNames = {
+    ar: 'العربية',
+    de: 'Deutsch',
+    en: 'English',
+    es: 'Español',
+    fr: 'Français',
+    ja: '日本語',
+  };
   let current = 'en';
 
-  // The installed language that the reader prefers; English when there is none.
-  function preferred() {
-    for (const tag of navigator.languages || []) {
-      const found = Object.keys(Olive.languages).find((known) => known === tag.toLowerCase().split('-')[0]);
-      if (found) return found;
-    }
-    return 'en';
-  }
+  // The language for a choice of the reader: that one, else the first that the browser prefers, else English.
+  Olive.languageFor = (tag) => {
+    const known = (each) => Object.hasOwn(Olive.languageNames, each);
+    if (known(tag)) return tag;
+    return (navigator.languages || []).map((each) => each.toLowerCase().split('-')[0]).find(known) || 'en';
+  };
 
   Olive.speak = (tag) => {
-    current = Olive.languages[tag] ? tag : preferred();
+    const wanted = Olive.languageFor(tag);
+    current = Olive.languages[wanted] ? wanted : 'en';
     document.documentElement.lang = current;
     document.documentElement.dir = Olive.languages[current].direction;
   };
