@@ -70,6 +70,7 @@ export async function launchFirefox(program = process.env.FIREFOX || '/usr/bin/f
         requests.push(params.request.url);
       return;
     }
+    if (!waiting.has(message.id)) return; // it was given up
     const {resolve, reject} = waiting.get(message.id);
     waiting.delete(message.id);
     if (message.type === 'success') resolve(message.result);
@@ -77,8 +78,17 @@ export async function launchFirefox(program = process.env.FIREFOX || '/usr/bin/f
   });
   const send = (method, params = {}) =>
     new Promise((resolve, reject) => {
-      waiting.set(++last, {resolve, reject});
-      socket.send(JSON.stringify({id: last, method, params}));
+      const id = ++last;
+      const timer = setTimeout(() => {
+        waiting.delete(id);
+        reject(new Error(`Firefox does not answer ${method}`));
+      }, 60000);
+      const end = (settle) => (value) => {
+        clearTimeout(timer);
+        settle(value);
+      };
+      waiting.set(id, {resolve: end(resolve), reject: end(reject)});
+      socket.send(JSON.stringify({id, method, params}));
     });
 
   await send('session.new', {capabilities: {}});
@@ -127,6 +137,7 @@ export async function launchFirefox(program = process.env.FIREFOX || '/usr/bin/f
         ],
       });
     },
+    resize: (width, height) => send('browsingContext.setViewport', {context, viewport: {width, height}}),
     press: (key) =>
       send('input.performActions', {
         context,

@@ -54,7 +54,8 @@
       (event) => {
         kind = event.pointerType;
         wasAsleep = acts.isAsleep();
-        from = event.isPrimary && !isControl(event) ? {x: event.clientX, y: event.clientY} : null;
+        const isWorked = event.target instanceof Element && event.target.closest('.divider, input, .menu');
+        from = event.isPrimary && !isWorked ? {x: event.clientX, y: event.clientY} : null;
       },
       true,
     );
