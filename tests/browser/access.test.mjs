@@ -159,6 +159,98 @@ describe('every control', () => {
       {hash: '#item=' + course.items[0]},
     ));
 
+  test('names items by their titles first', () =>
+    shared.visit(
+      course,
+      async (page) => {
+        const begins = (selector) =>
+          page.evaluate((links) => [...document.querySelectorAll(links)].map((link) => link.textContent), selector);
+        for (const selector of ['#panel-contents .row', '.card a']) {
+          if (selector === '.card a') await go(page, '#');
+          const texts = await begins(selector);
+          assert.deepEqual(
+            texts.map((text, i) => text.startsWith(course.data.Media[i].Title)),
+            course.data.Media.map(() => true),
+          );
+        }
+        const [thumb, text] = [
+          await page.locator('.card .thumb').first().boundingBox(),
+          await page.locator('.card-text').first().boundingBox(),
+        ];
+        assert.ok(thumb.y < text.y, 'the picture is above');
+      },
+      {hash: '#item=' + course.items[0]},
+    ));
+
+  test('of letters lies where it lies on other keyboards; Home and End are the slider’s', () =>
+    shared.visit(
+      course,
+      async (page) => {
+        const time = () => page.evaluate(() => window.Olive.app.stage.player.time);
+        const type = (key, code) =>
+          page.evaluate(
+            ([letter, place]) =>
+              document
+                .querySelector('.player')
+                .dispatchEvent(new KeyboardEvent('keydown', {key: letter, code: place, bubbles: true})),
+            [key, code],
+          );
+        await page.evaluate(() => window.Olive.app.stage.player.seek(0));
+        for (const [key, expected] of [
+          ['д', 10],
+          ['م', 20],
+          ['λ', 20],
+        ]) {
+          await type(key, 'KeyL'); // Russian, Arabic, Greek
+          assert.ok(Math.abs((await time()) - expected) < 0.3, `${key}: ${await time()}`);
+        }
+        await type('j', 'KeyC'); // a Latin keyboard with letters elsewhere
+        assert.ok(Math.abs((await time()) - 10) < 0.3);
+        await page.focus('.volume');
+        await page.keyboard.press('Home');
+        assert.equal(await page.inputValue('.volume'), '0');
+        assert.ok(Math.abs((await time()) - 10) < 0.3, 'the time stays');
+        await page.keyboard.press('End');
+        assert.equal(await page.inputValue('.volume'), '1');
+      },
+      {hash: '#item=' + course.items[1]},
+    ));
+
+  test('behind a presentation cannot be reached', () =>
+    shared.visit(
+      course,
+      async (page) => {
+        await page.keyboard.press('v');
+        for (let i = 0; i < 12; ++i) {
+          await page.keyboard.press('Tab');
+          const place = await page.evaluate(
+            () => document.activeElement === document.body || !!document.activeElement.closest('.player'),
+          );
+          assert.ok(place, 'the focus stays in the player');
+        }
+        await page.keyboard.press('Escape');
+        assert.equal(await page.evaluate(() => document.querySelectorAll('[inert]:not(.stage *)').length), 0);
+      },
+      {hash: '#item=' + course.items[4]},
+    ));
+
+  test('that changes the arrangement tells it, each time', () =>
+    shared.visit(
+      course,
+      async (page) => {
+        const told = [];
+        for (let i = 0; i < 3; ++i) {
+          await page.keyboard.press('s');
+          told.push(await page.textContent('#announcements'));
+        }
+        assert.ok(told.every((text) => text.trim() === 'Pictures swapped'));
+        assert.ok(told[0] !== told[1] && told[1] !== told[2], 'it differs from what was said before');
+        await page.keyboard.press('d');
+        assert.match(await page.textContent('#announcements'), /Second picture in the corner/);
+      },
+      {hash: '#item=' + course.items[1]},
+    ));
+
   test('gives the focus back when a dialog closes', () =>
     shared.visit(course, async (page) => {
       await page.focus('button[aria-label="Keyboard"]');

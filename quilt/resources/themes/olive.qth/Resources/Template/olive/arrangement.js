@@ -27,7 +27,7 @@
         set: (percent) => this.setLeft(percent),
         usual: () => this.usual,
       });
-      this.element = make('div', {class: 'dual'}, panes[0], this.divider, panes[1]);
+      this.element = make('div', {class: 'dual', dir: 'ltr'}, panes[0], this.divider, panes[1]);
       this.buttons = kViews.map((name) =>
         Olive.iconButton(name, say('view-' + name), () => this.choose(name), {
           'data-view': name,

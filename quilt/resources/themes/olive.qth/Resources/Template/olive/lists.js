@@ -45,6 +45,7 @@
   const kLong = 60;
   const listClass = (name, entries) => (entries.length > kLong ? name + ' long' : name);
 
+  // The words come before the picture, so that the name of a link begins with the title; styles put the picture first.
   Olive.makeCards = (items, memory) =>
     make(
       'ul',
@@ -56,13 +57,13 @@
           make(
             'a',
             {href: Olive.address.to({item: item.id})},
-            thumbnail(item, memory),
             make(
               'span',
               {class: 'card-text'},
               make('span', {class: 'card-title', dir: 'auto', 'data-title-of': item.id, text: item.title}),
               meta(item),
             ),
+            thumbnail(item, memory),
           ),
         ),
       ),
@@ -78,14 +79,18 @@
           null,
           make(
             'a',
-            {class: 'row', href: Olive.address.to({item: item.id}), 'aria-current': item === current ? 'true' : null},
-            thumbnail(item, memory),
+            {
+              class: 'row',
+              href: Olive.address.to({item: item.id}),
+              'aria-current': item === current ? 'true' : null,
+            },
             make(
               'span',
               {class: 'row-text'},
               make('span', {class: 'row-title', dir: 'auto', 'data-title-of': item.id, text: item.title}),
               meta(item),
             ),
+            thumbnail(item, memory),
           ),
         ),
       ),
@@ -181,6 +186,10 @@
 
   Olive.titleOfPart = (part) => part.title || kindOf({category: part.category}) || say('file');
 
+  // A title as a file name: without what file systems refuse and without what turns the direction of writing.
+  const safeName = (title) =>
+    title.replace(/[\u200e\u200f\u202a-\u202e\u2066-\u2069]/g, '').replace(/[\\/:*?"<>|]/g, '_');
+
   Olive.makeExtras = (extras) =>
     make(
       'ul',
@@ -202,7 +211,7 @@
               href: address,
               target: '_blank',
               rel: 'noopener noreferrer',
-              download: file.address ? title.replace(/[\\/:*?"<>|]/g, '_') + (ending ? '.' + ending : '') : null,
+              download: file.address ? safeName(title) + (ending ? '.' + ending : '') : null,
             },
             Olive.icon(file.address ? 'download' : 'open'),
             make(

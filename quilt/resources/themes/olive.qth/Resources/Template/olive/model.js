@@ -10,6 +10,7 @@
   const kCategories = ['Movie', 'Audio', 'Image', 'Document', 'Web', 'Montage', 'DualSource'];
 
   const text = (value) => (typeof value === 'string' ? value : '');
+  const named = (value) => (text(value).trim() ? text(value) : ''); // blanks are no title
   const number = (value) => (typeof value === 'number' && Number.isFinite(value) ? value : 0);
   const list = (value) => (Array.isArray(value) ? value.filter((entry) => entry && typeof entry === 'object') : []);
   const time = (value) => (typeof value === 'number' && value >= 0 && value < kNoTimecode ? value : null);
@@ -40,7 +41,7 @@
 
   function readPreview(record) {
     return {
-      title: text(record.Title),
+      title: named(record.Title),
       text: text(record.Content),
       start: time(record.Timecode),
       picture: packageAddress(record.RelativePath),
@@ -66,7 +67,7 @@
   }
 
   function wordsOfSource(record) {
-    const title = text(record.Title),
+    const title = named(record.Title),
       description = text(record.Description);
     return {title, description: description === title ? '' : description};
   }
@@ -114,11 +115,11 @@
   }
 
   const wordsOfItem = (record, index, sources) => ({
-    title: text(record.Title) || sources[0]?.title || Olive.say('untitled', {n: index + 1}),
+    title: named(record.Title) || sources[0]?.title || Olive.say('untitled', {n: index + 1}),
     description: text(record.Description),
   });
   const wordsOfPackage = (data) => ({
-    title: text(data.Title),
+    title: named(data.Title),
     description: text(data.Description),
     author: text(data.Author),
   });
