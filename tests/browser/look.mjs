@@ -11,7 +11,10 @@ mkdirSync(shots, {recursive: true});
 const course = new Fixtures(folder).course();
 const browser = await launch();
 for (const width of widths.length ? widths.map(Number) : [320, 768, 1280, 1920]) {
-  const {context, page, complaints} = await openPage(browser, {viewport: {width, height: width < 500 ? 640 : width < 1000 ? 1024 : Math.round(width * 0.6)}, colorScheme: width === 768 ? 'dark' : 'light'});
+  const {context, page, complaints} = await openPage(browser, {
+    viewport: {width, height: width < 500 ? 640 : width < 1000 ? 1024 : Math.round(width * 0.6)},
+    colorScheme: width === 768 ? 'dark' : 'light',
+  });
   const shoot = async (name, hash) => {
     await page.goto(fileUrl(course.folder, hash));
     await page.reload();
@@ -19,7 +22,8 @@ for (const width of widths.length ? widths.map(Number) : [320, 768, 1280, 1920])
     await page.screenshot({path: join(shots, `${name}-${width}.png`)});
   };
   await shoot('home', '');
-  for (const [i, name] of ['movie', 'lecture', 'audio', 'montage', 'document', 'image', 'web'].entries()) await shoot(name, `#item=${course.items[i]}`);
+  for (const [i, name] of ['movie', 'lecture', 'audio', 'montage', 'document', 'image', 'web'].entries())
+    await shoot(name, `#item=${course.items[i]}`);
   if (complaints.length) console.log(complaints);
   await context.close();
 }
