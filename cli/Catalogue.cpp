@@ -106,6 +106,8 @@ Path libraryPath(const std::optional<std::string>& given) {
 Result<Dictionary> readDocumentRecord(const Path& package) {
   const Path file = package / kQuiltDocumentPropertiesFilename;
   if (!services().files->fileExistsAtPath(file)) return Error{ErrorKind::Damaged, "It has no properties file", file};
+  if (!services().files->isConfined(file, package))
+    return Error{ErrorKind::Unsafe, "Its properties file is a link that leads elsewhere", file};
   Result<Dictionary> record = services().propertyLists->readDictionary(file);
   if (!record) return record;
   const std::optional<std::string> version = record->string("Version");
@@ -122,6 +124,8 @@ Result<Dictionary> readDocumentRecord(const Path& package) {
 Result<Dictionary> readCollectionRecord(const Path& folder) {
   const Path file = folder / kCollectionFilename;
   if (!services().files->fileExistsAtPath(file)) return Error{ErrorKind::Damaged, "It has no collection file", file};
+  if (!services().files->isConfined(file, folder))
+    return Error{ErrorKind::Unsafe, "Its collection file is a link that leads elsewhere", file};
   return services().propertyLists->readDictionary(file);
 }
 

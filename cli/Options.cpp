@@ -140,13 +140,15 @@ Command removeRequest(const Arguments& arguments) {
 }
 
 Command exportRequest(const Arguments& arguments) {
-  ExportRequest request{*arguments.first("DOCUMENT"), *arguments.first("DIR"), arguments.has("--zip"),
-                        formatsOf(arguments), arguments.first("--theme")};
+  ExportRequest request{*arguments.first("DOCUMENT"), *arguments.first("DIR"),    arguments.has("--zip"),
+                        formatsOf(arguments),         arguments.first("--theme"), arguments.has("--force")};
   if (request.formats.empty()) request.formats.emplace_back("Desktop");
   return request;
 }
 
-Command finalizeRequest(const Arguments& arguments) { return FinalizeRequest{*arguments.first("DOCUMENT")}; }
+Command finalizeRequest(const Arguments& arguments) {
+  return FinalizeRequest{*arguments.first("DOCUMENT"), arguments.has("--force")};
+}
 
 Command buildRequest(const Arguments& arguments) {
   const std::optional<std::string> output = arguments.first("--output");
@@ -160,7 +162,7 @@ Command themesRequest(const Arguments&) { return ThemesRequest{}; }
 Command checkRequest(const Arguments& arguments) { return CheckRequest{arguments.all("DOCUMENT")}; }
 
 Command serveRequest(const Arguments& arguments) {
-  ServeRequest request{*arguments.first("DOCUMENT"), 0, arguments.has("--open")};
+  ServeRequest request{*arguments.first("DOCUMENT"), 0, arguments.has("--open"), arguments.has("--force")};
   if (const std::optional<std::string> port = arguments.first("--port")) {
     const auto [end, error] = std::from_chars(port->data(), port->data() + port->size(), request.port);
     if (error != std::errc() || end != port->data() + port->size() || request.port == 0)
@@ -316,15 +318,17 @@ const std::vector<CommandDescription>& commands() {
        {{"DOCUMENT", "the document"}, {"DIR", "the folder to write into; made when it is missing"}},
        {{"--zip", "", "", "write a zip archive"},
         {"--format", "", "FORMAT", "Desktop (the default), 720p or 480p", true, {"Desktop", "720p", "480p"}},
-        {"--theme", "", "THEME", "set the document's theme first: an identifier or the path of a bundle"}},
+        {"--theme", "", "THEME", "set the document's theme first: an identifier or the path of a bundle"},
+        {"--force", "", "", "also when files go from the package that no theme brought"}},
        true,
        exportRequest},
       {"finalize",
        "make a document ready to be played, in place",
        "Makes what is missing of previews and posters, applies the theme of an interactive document anew and\n"
-       "writes the files that it reads.\n",
+       "writes the files that it reads. What else lies at the top of the package goes; files that no theme\n"
+       "brought are named first, and need --force.\n",
        {{"DOCUMENT", "the document"}},
-       {},
+       {{"--force", "", "", "also when files go from the package that no theme brought"}},
        true,
        finalizeRequest},
       {"build",
@@ -356,7 +360,8 @@ const std::vector<CommandDescription>& commands() {
       {"check",
        "verify packages, and change nothing",
        "Records are readable, every file is there, in the package and of its recorded size, and nothing lies\n"
-       "among the media that no record names. Prints a line a finding: UUID, kind, path, what is wrong.\n",
+       "among the media that no record names, or beside a theme's files and came with none. Prints a line a\n"
+       "finding: UUID, kind, path, what is wrong.\n",
        {{"DOCUMENT", "a document; all of the library when none is named", false, true}},
        {},
        false,
@@ -368,7 +373,8 @@ const std::vector<CommandDescription>& commands() {
        "it can read and edit the document while the program runs. Ctrl-C stops it.\n",
        {{"DOCUMENT", "the document; Interactive, with a theme"}},
        {{"--port", "", "N", "the port to serve at (else any that is free)"},
-        {"--open", "", "", "open the address in the user's browser"}},
+        {"--open", "", "", "open the address in the user's browser"},
+        {"--force", "", "", "also when files go from the package that no theme brought"}},
        true,
        serveRequest},
       {"doctor", "print which decoders, encoders, renderers and themes are there", "", {}, {}, false, doctorRequest},

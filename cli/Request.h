@@ -94,11 +94,13 @@ struct ExportRequest {
   bool zip = false;
   std::vector<std::string> formats{};  ///< never empty
   std::optional<std::string> theme{};
+  bool force = false;  ///< also when finalizing deletes what no theme brought
   bool operator==(const ExportRequest&) const = default;
 };
 
 struct FinalizeRequest {
   std::string document;
+  bool force = false;  ///< also when that deletes what no theme brought
   bool operator==(const FinalizeRequest&) const = default;
 };
 
@@ -124,6 +126,7 @@ struct ServeRequest {
   std::string document;
   std::uint16_t port = 0;  ///< 0: any that is free
   bool open = false;       ///< in the user's browser
+  bool force = false;      ///< also when finalizing deletes what no theme brought
   bool operator==(const ServeRequest&) const = default;
 };
 

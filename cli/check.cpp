@@ -8,6 +8,7 @@
 #include "cli/Interrupt.h"
 #include "cli/Lookup.h"
 #include "cli/Text.h"
+#include "quilt/documents/QuiltDocument.h"
 #include "quilt/platform/base/Paths.h"
 #include "quilt/platform/base/TemporaryNames.h"
 #include "quilt/platform/base/Url.h"
@@ -36,6 +37,7 @@ class Check {
     }
     each(*record, "Media", [this](const Dictionary& item) { checkItem(item); });
     findUnreferenced(_document.path / "media");
+    findForeign();
     return _count;
   }
 
@@ -149,6 +151,13 @@ class Check {
         tell("unreferenced", path, "No record names it");
       }
     }
+  }
+
+  /// What finalizing would delete although it came with no theme.
+  void findForeign() {
+    if (_document.type != kQuiltDocumentTypeInteractive) return;
+    for (const std::string& name : QuiltDocument::entriesNoThemeBrought(_document.path))
+      tell("foreign", _document.path / name, "No theme brought it; finalizing deletes it");
   }
 
   const DocumentEntry& _document;

@@ -3,6 +3,7 @@
 
 #include "cli/ActingDelegate.h"
 #include "cli/Exporting.h"
+#include "cli/ForeignEntries.h"
 #include "cli/LibrarySession.h"
 #include "cli/Saving.h"
 #include "cli/Text.h"
@@ -29,6 +30,7 @@ ExportPlan check(const ExportRequest& request, const Catalogue& catalogue) {
   } else {
     checkTheme(entry, cannot, "name one with --theme");
   }
+  if (!request.force) checkForeignEntries(entry, cannot);
   checkDestination(plan.folder, catalogue.library);
   return plan;
 }

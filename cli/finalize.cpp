@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "cli/ActingDelegate.h"
+#include "cli/ForeignEntries.h"
 #include "cli/Interrupt.h"
 #include "cli/LibrarySession.h"
 #include "cli/Saving.h"
@@ -13,9 +14,10 @@ namespace {
 
 FoundDocument check(const FinalizeRequest& request, const Catalogue& catalogue) {
   const FoundDocument found = findDocument(catalogue, request.document);
-  checkTheme(*found.document,
-             "The document " + inQuotes(found.document->title, found.document->uuid) + " cannot be finalized",
-             "set one with \"quilt set\"");
+  const std::string cannot =
+      "The document " + inQuotes(found.document->title, found.document->uuid) + " cannot be finalized";
+  checkTheme(*found.document, cannot, "set one with \"quilt set\"");
+  if (!request.force) checkForeignEntries(*found.document, cannot);
   return found;
 }
 

@@ -4,6 +4,7 @@
 
 #include "cli/ActingDelegate.h"
 #include "cli/Browser.h"
+#include "cli/ForeignEntries.h"
 #include "cli/Interrupt.h"
 #include "cli/LibrarySession.h"
 #include "cli/Saving.h"
@@ -81,7 +82,12 @@ void ActingDelegate::perform(const ServeRequest& request) {
   LibrarySession session(library());
   const FoundDocument found = check(request, session.catalogue());
   const auto document = session.open(found);
-  if (isStale(*document)) finalize(*document, *found.document, _context);
+  if (isStale(*document)) {
+    if (!request.force)
+      checkForeignEntries(*found.document, "The document " + inQuotes(found.document->title, found.document->uuid) +
+                                               " cannot be served");
+    finalize(*document, *found.document, _context);
+  }
   auto bridge = scripting::Bridge::serve(document, {.port = request.port});
   if (!bridge)
     throw Failure("The document " + inQuotes(found.document->title, found.document->uuid) + " cannot be served",

@@ -9,6 +9,8 @@
 #include "quilt/collections/QuiltCollectionsController.h"
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/interfaces/Services.h"
+#include "quilt/sources/ModelFiles.h"
+#include "quilt/sources/RecordNames.h"
 
 namespace quilt {
 
@@ -25,9 +27,19 @@ constexpr std::array<std::string_view, 9> kSavedProperties = {"title",         "
                                                               "copyright",     "keywords",       "category",
                                                               "advisoryLabel", "preferredTheme", "lastPublishURL"};
 
-constexpr std::array<std::string_view, 12> kRecordKeys = {
-    "UUID",      "CreationDate", "ModifiedDate", "Title",         "Description",        "Author",
-    "Copyright", "Keywords",     "Category",     "AdvisoryLabel", "PreferredThemePath", "LastPublishURL"};
+/// A theme that is gone is dropped with the next save: the collection only prefers it.
+constexpr RecordKey kRecordKeys[] = {{"UUID", RecordKind::Told},
+                                     {"CreationDate", RecordKind::Date},
+                                     {"ModifiedDate", RecordKind::Told},
+                                     {"Title", RecordKind::Text},
+                                     {"Description", RecordKind::Text},
+                                     {"Author", RecordKind::Text},
+                                     {"Copyright", RecordKind::Text},
+                                     {"Keywords", RecordKind::Text},
+                                     {"Category", RecordKind::Text},
+                                     {"AdvisoryLabel", RecordKind::Text},
+                                     {"PreferredThemePath", RecordKind::Text},
+                                     {"LastPublishURL", RecordKind::Text}};
 
 std::optional<Date> later(const std::optional<Date>& one, const std::optional<Date>& other) {
   if (!one || !other) return std::nullopt;
@@ -53,8 +65,9 @@ std::shared_ptr<QuiltCollection> QuiltCollection::init() {
   return collection;
 }
 
-std::shared_ptr<QuiltCollection> QuiltCollection::initWithPath(const Path& path) {
+std::shared_ptr<QuiltCollection> QuiltCollection::initWithPath(const Path& given) {
   auto collection = init();
+  const Path path = plainPath(given);
   collection->setPath(path);
   platform::FileManager& files = *services().files;
   if (files.fileExistsAtPath(path)) {
@@ -71,6 +84,10 @@ std::shared_ptr<QuiltCollection> QuiltCollection::initWithPath(const Path& path)
     return nullptr;
   }
   return collection;
+}
+
+void QuiltCollection::setUuid(std::string uuid) {
+  if (isAcceptedIdentity(uuid, "collection")) _uuid.set(std::move(uuid));
 }
 
 void QuiltCollection::saveWhenChanged() {
@@ -127,14 +144,16 @@ void QuiltCollection::resetModifiedDate() {
 // Loading and saving
 
 bool QuiltCollection::loadDictionary() {
-  const Result<Dictionary> read = services().propertyLists->readDictionary(_collectionFilepath());
-  if (!read) {
+  const Path file = _collectionFilepath();
+  const bool isInside = services().files->isConfined(file, path());
+  const Result<Dictionary> read = services().propertyLists->readDictionary(file);
+  if (!isInside || !read) {
     FDYLogger::logWarning("Failed to load collection at path \"%@\": \"Collection dictionary is invalid\"", path());
     return false;
   }
   const Dictionary& record = *read;
   setIsLoading(true);
-  if (const Text uuid = record.string("UUID")) setUuid(*uuid);
+  if (const Text uuid = record.string("UUID")) _uuid.set(*uuid);
   if (const auto date = record.date("CreationDate")) setCreationDate(date);
   if (const auto date = record.date("ModifiedDate")) setModifiedDate(date);
   if (const Text text = record.string("Title")) setTitle(text);
@@ -147,7 +166,9 @@ bool QuiltCollection::loadDictionary() {
   if (const Text themePath = record.string("PreferredThemePath"))
     if (auto theme = QuiltTheme::initWithPath(*themePath)) setPreferredTheme(std::move(theme));
   if (const Text text = record.string("LastPublishURL")) setLastPublishURL(text);
-  _unknownEntries.store(platform::entriesBeyond(kRecordKeys, record));
+  UnusedEntries unused;
+  unused.keepRest(kRecordKeys, record);
+  _kept.take(std::move(unused));
   setIsLoading(false);
   return true;
 }
@@ -191,7 +212,7 @@ Dictionary QuiltCollection::dictionary() const {
   put("AdvisoryLabel", advisoryLabel());
   if (const auto theme = preferredTheme()) record.append("PreferredThemePath", theme->path().native());
   put("LastPublishURL", lastPublishURL());
-  platform::appendAll(record, _unknownEntries.get());
+  _kept.writeInto(record);
   return record;
 }
 
@@ -239,8 +260,14 @@ Path QuiltCollection::posterImagePath() const {
 std::shared_ptr<ImageWrapper> QuiltCollection::posterImage() {
   if (path().empty()) return nullptr;
   const std::lock_guard guard(_posterMutex);
-  if (!_posterImage)
-    if (const Path file = posterImagePath(); !file.empty()) _posterImage = ImageWrapper::imageWithPath(file);
+  if (_posterImage) return _posterImage;
+  const Path file = posterImagePath();
+  if (file.empty()) return nullptr;
+  if (services().files->isConfined(file, path())) {
+    _posterImage = ImageWrapper::imageWithPath(file);
+  } else {
+    FDYLogger::logWarning("Refused the file of a %@: \"%@\" leads out of the collection", "poster image", file);
+  }
   return _posterImage;
 }
 

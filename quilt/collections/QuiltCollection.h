@@ -27,9 +27,10 @@ class QUILT_EXPORT QuiltCollection : public platform::Object {
   static std::shared_ptr<QuiltCollection> initWithPath(const Path& path);
 
   // Properties
-  /// Names the folder in its library.
+  /// Names the folder in its library. What is no plain folder name, and what begins with ".", is refused with a
+  /// warning.
   std::string uuid() const { return _uuid.get(); }
-  void setUuid(std::string uuid) { _uuid.set(std::move(uuid)); }
+  void setUuid(std::string uuid);
   /// The folder; empty while detached. Setting moves nothing on disk.
   Path path() const { return _path.get(); }
   void setPath(Path path) { _path.set(std::move(path)); }
@@ -96,7 +97,7 @@ class QUILT_EXPORT QuiltCollection : public platform::Object {
   bool loadDictionary();
   /// Opens every document in the folder; what does not open is passed over.
   bool _loadDocuments();
-  /// The record as it is written, with the entries that a newer version left in it.
+  /// The record as it is written, with what no loader could use of the one that was read.
   Dictionary dictionary() const;
   /// Stamps and saves; true without saving while loading. False after a critical line.
   bool update();
@@ -140,7 +141,8 @@ class QUILT_EXPORT QuiltCollection : public platform::Object {
   /// Makes a document of a file: inspects it, adds it as the one item, and copies it into the package, which is named
   /// by `withUUID` (a fresh one for none). A file of a type that cannot be imported gives an empty document. Null,
   /// after a critical line, on failure or when the block answers false; the package is then gone, unless it was there
-  /// before. Reports 10 to 100, on the calling thread.
+  /// before. Null also when the collection holds a document of that package already, or when the identity is no plain
+  /// name or begins with ".". Reports 10 to 100, on the calling thread.
   std::shared_ptr<QuiltDocument> importDocumentFromPath(const Path& path, const Text& withUUID,
                                                         const ProgressionBlock& withProgressionBlock);
   std::shared_ptr<QuiltDocument> importDocumentFromPath(const Path& path, const ProgressionBlock& withProgressionBlock);
@@ -149,6 +151,7 @@ class QUILT_EXPORT QuiltCollection : public platform::Object {
  protected:
   QuiltCollection();
   std::vector<std::string_view> keysDependingOn(std::string_view key) const override;
+  void valueWasSet(std::string_view key) override { _kept.forget(key); }
 
  private:
   void saveWhenChanged();
@@ -156,6 +159,10 @@ class QUILT_EXPORT QuiltCollection : public platform::Object {
   Path inFolder(const std::string& name) const;
   /// Where the package of that identity belongs; empty without a folder or for an identity that is no plain name.
   Path packagePath(const std::string& uuid) const;
+  bool holdsPackage(const Path& package) const;
+  /// The document of the package of that identity, made when nothing is there; null when the collection holds it
+  /// already or it cannot be opened.
+  std::shared_ptr<QuiltDocument> openPackage(const std::string& uuid) const;
   void deletePackage(const Path& package) const;
   /// Writes the image and answers a copy of it to cache; null after a critical line.
   std::shared_ptr<ImageWrapper> savedPosterImage(const std::shared_ptr<ImageWrapper>& image) const;
@@ -181,7 +188,7 @@ class QUILT_EXPORT QuiltCollection : public platform::Object {
   platform::Property<Text> _lastPublishURL{*this, "lastPublishURL"};
   platform::WeakProperty<QuiltCollectionsController> _collectionControllerOwner{*this, "collectionControllerOwner"};
   platform::Property<bool> _isLoading{*this, "isLoading"};
-  platform::Property<Dictionary> _unknownEntries{*this, "unknownEntries"};
+  KeptEntries _kept;
   std::uint64_t _recordsBuilt = 0;                   // guarded by the document list's lock
   std::mutex _saving;                                // nothing else is locked under it
   std::uint64_t _newestSaved = 0;                    // the turn of the record on disk; guarded by _saving

@@ -5,6 +5,7 @@
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/base/Paths.h"
 #include "quilt/platform/interfaces/Services.h"
+#include "quilt/sources/RecordNames.h"
 
 namespace quilt {
 
@@ -126,12 +127,29 @@ void QuiltCollection::removeAllBrokenDocuments() {
 
 Path QuiltCollection::packagePath(const std::string& uuid) const {
   const std::string name = platform::withExtension(uuid, kQuiltDocumentExtension);
-  return platform::isPlainComponent(uuid) && platform::isPlainComponent(name) ? inFolder(name) : Path();
+  return isIdentity(uuid) && platform::isPlainComponent(name) ? inFolder(name) : Path();
+}
+
+bool QuiltCollection::holdsPackage(const Path& package) const {
+  return _documents.first([&package](const auto& document) { return document->path() == package; }) != nullptr;
+}
+
+std::shared_ptr<QuiltDocument> QuiltCollection::openPackage(const std::string& uuid) const {
+  const Path package = packagePath(uuid);
+  // Two objects on one package would write over each other.
+  if (package.empty() || holdsPackage(package)) return nullptr;
+  const bool isNew = !services().files->fileExistsAtPath(package);
+  const auto document = QuiltDocument::initWithPath(package);
+  if (!document || !isNew) return document;
+  // The package is found by the name that it has. Nothing is saved yet.
+  document->setUuid(uuid);
+  return document;
 }
 
 std::shared_ptr<QuiltDocument> QuiltCollection::newDocumentWithType(const Text& type) {
-  const Path package = packagePath(platform::generateUUID());
-  const auto document = package.empty() ? nullptr : QuiltDocument::initWithPath(package);
+  const std::string uuid = platform::generateUUID();
+  const Path package = packagePath(uuid);
+  const auto document = openPackage(uuid);
   if (!document) {
     FDYLogger::logCritical(kCannotCreate, package);
     return nullptr;
@@ -155,10 +173,11 @@ std::shared_ptr<QuiltDocument> QuiltCollection::importDocumentFromPath(const Pat
 
 std::shared_ptr<QuiltDocument> QuiltCollection::importDocumentFromPath(const Path& path, const Text& withUUID,
                                                                        const ProgressionBlock& withProgressionBlock) {
-  const Path package = packagePath(withUUID ? *withUUID : platform::generateUUID());
+  const std::string uuid = withUUID ? *withUUID : platform::generateUUID();
+  const Path package = packagePath(uuid);
   // A package that was there before is not this import's to delete.
   const bool isNewPackage = !services().files->fileExistsAtPath(package);
-  const auto document = package.empty() ? nullptr : QuiltDocument::initWithPath(package);
+  const auto document = package.empty() ? nullptr : openPackage(uuid);
   const auto fail = [&]() -> std::shared_ptr<QuiltDocument> {
     FDYLogger::logCritical(kCannotCreate, path);
     return nullptr;

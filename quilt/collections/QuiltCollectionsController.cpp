@@ -6,6 +6,8 @@
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/base/Paths.h"
 #include "quilt/platform/interfaces/Services.h"
+#include "quilt/sources/ModelFiles.h"
+#include "quilt/sources/RecordNames.h"
 
 namespace quilt {
 
@@ -34,7 +36,7 @@ bool QuiltCollectionsController::loadLibraryPath(const Path& path,
   // The exchange lets one of two threads pass; the look before it keeps a refused load from announcing anything.
   if (loadingCollections() || _loadingCollections.exchange(true)) return false;
   FDYLogger::logDebug("Loading collections at path \"%@\"...", path);
-  setLibraryPath(path);
+  setLibraryPath(plainPath(path));
   _collections.assign({});
 
   platform::FileManager& files = *services().files;
@@ -117,7 +119,8 @@ std::shared_ptr<QuiltCollection> QuiltCollectionsController::newCollectionWithUU
   const Path directory = _collectionsDirectory();
   const Path folder = directory.empty() ? directory : directory / name;
   // Without a library, or with an identity that would lead out of it, there is no place to make the folder.
-  const bool hasPlace = !folder.empty() && platform::isPlainComponent(name);
+  const bool isHeld = _collections.first([&](const auto& one) { return one->path() == folder; }) != nullptr;
+  const bool hasPlace = !folder.empty() && !isHeld && isIdentity(name);
   const auto collection = hasPlace ? QuiltCollection::initWithPath(folder) : nullptr;
   if (!collection) {
     FDYLogger::logCritical("Failed to create a new empty collection at path \"%@\"", folder);

@@ -32,6 +32,7 @@ Dictionary ownerRecord(const std::shared_ptr<QuiltCollection>& collection) {
 }  // namespace
 
 std::string dataScript(QuiltDocument& document, bool hasPoster) {
+  const OnlyUsableEntries ofThePage;
   Dictionary data = document.dictionary();
   data.remove("ThemePath");
   if (hasPoster)

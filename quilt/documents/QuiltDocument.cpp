@@ -5,10 +5,12 @@
 #include <utility>
 
 #include "quilt/collections/QuiltCollection.h"
+#include "quilt/documents/ThemeEntries.h"
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/base/Paths.h"
 #include "quilt/platform/interfaces/Services.h"
 #include "quilt/sources/ModelFiles.h"
+#include "quilt/sources/RecordNames.h"
 
 namespace quilt {
 
@@ -20,10 +22,24 @@ namespace {
 
 constexpr const char* kFormatVersion = "1.0";
 
-constexpr std::string_view kDocumentKeys[] = {
-    "Version",  "UUID",          "Title",          "Description",      "Author",       "Keywords",
-    "Category", "AdvisoryLabel", "jukeboxOrder",   "ThemePath",        "CreationDate", "ModifiedDate",
-    "Type",     "Media",         "LastPublishURL", "DocumentDuration", "IsFlattened"};
+constexpr RecordKey kDocumentKeys[] = {{"Version", RecordKind::Told},
+                                       {"UUID", RecordKind::Told},
+                                       {"Title", RecordKind::Text},
+                                       {"Description", RecordKind::Text},
+                                       {"Author", RecordKind::Text},
+                                       {"Keywords", RecordKind::Text},
+                                       {"Category", RecordKind::Text},
+                                       {"AdvisoryLabel", RecordKind::Text},
+                                       {"jukeboxOrder", RecordKind::Integer},
+                                       {"ThemePath", RecordKind::Text},
+                                       {"CreationDate", RecordKind::Date},
+                                       {"ModifiedDate", RecordKind::Told},
+                                       {"Type", RecordKind::Text},
+                                       {"Media", RecordKind::List},
+                                       {"LastPublishURL", RecordKind::Text},
+                                       {"DocumentDuration", RecordKind::Told},
+                                       {"IsFlattened", RecordKind::Told},
+                                       {kThemeEntriesKey, RecordKind::List}};
 
 constexpr const char* kObservedKeys[] = {"title",    "description",   "author",        "keywords",
                                          "category", "advisoryLabel", "jukeboxOrder",  "theme",
@@ -36,7 +52,7 @@ constexpr std::string_view kSavingKeys[] = {"title",        "description",    "a
 
 /// Reads a properties file, unless it is a link that leads out of the package.
 platform::Result<Dictionary> readPropertiesOf(const Path& package, const Path& file) {
-  const Path folder = platform::standardizedPath(package);
+  const Path folder = plainPath(package);
   if (file.parent_path() == folder && !services().files->isConfined(file, folder))
     return platform::Error{platform::ErrorKind::Unsafe, "The file leads out of the document", file};
   return services().propertyLists->readDictionary(file);
@@ -60,8 +76,9 @@ std::shared_ptr<QuiltDocument> QuiltDocument::init() {
   return std::make_shared<Made>();
 }
 
-std::shared_ptr<QuiltDocument> QuiltDocument::initWithPath(const Path& path) {
+std::shared_ptr<QuiltDocument> QuiltDocument::initWithPath(const Path& given) {
   auto document = init();
+  const Path path = plainPath(given);
   document->setPath(path);
   document->setUti(platform::pathExtension(path));
   if (services().files->fileExistsAtPath(path)) return document->loadDictionary() ? document : nullptr;
@@ -79,7 +96,7 @@ std::shared_ptr<QuiltDocument> QuiltDocument::initWithPath(const Path& path) {
 }
 
 Text QuiltDocument::uuidForDocumentAtPath(const Path& path) {
-  const auto record = readPropertiesOf(path, platform::standardizedPath(path / kQuiltDocumentPropertiesFilename));
+  const auto record = readPropertiesOf(path, plainPath(path / kQuiltDocumentPropertiesFilename));
   return record ? record->string("UUID") : std::nullopt;
 }
 
@@ -106,6 +123,10 @@ bool QuiltDocument::canImportFromPath(const Path& path) {
   const Text identifier = platform::FDYTypePreferredIdentifier(path);
   const auto& list = allSupportedImportUTIs();
   return identifier && std::find(list.begin(), list.end(), *identifier) != list.end();
+}
+
+void QuiltDocument::setUuid(std::string uuid) {
+  if (isAcceptedIdentity(uuid, "document")) _uuid.set(std::move(uuid));
 }
 
 // ---- Kinds
@@ -143,9 +164,29 @@ std::string QuiltDocument::displayTitle() const {
   return name && !name->empty() ? *name : untitledEpisode();
 }
 
+void QuiltDocument::setPath(Path path) {
+  const Path before = this->path();
+  _path.set(path);
+  if (!before.empty() && !path.empty() && before != path) followPackage(before, path);
+}
+
+void QuiltDocument::followPackage(const Path& from, const Path& to) {
+  const auto follow = [&](const auto& source) {
+    source->followPackage(from, to);
+    return true;
+  };
+  performBlockOnMedia([&](const auto& item) {
+    item->performBlockOnSources(follow);
+    item->performBlockOnExtra(follow);
+    if (const auto commentary = item->audioCommentarySource()) follow(commentary);
+    return true;
+  });
+  invalidateCaches();
+}
+
 // ---- Loading
 
-bool QuiltDocument::loadDictionary() { return loadDictionaryAtPath(platform::standardizedPath(propertiesPath())); }
+bool QuiltDocument::loadDictionary() { return loadDictionaryAtPath(plainPath(propertiesPath())); }
 
 bool QuiltDocument::loadDictionaryAtPath(const Path& path) {
   setIsProcessing(true);
@@ -161,6 +202,8 @@ bool QuiltDocument::readProperties(const Path& file) {
     return false;
   }
   auto record = readPropertiesOf(path(), file);
+  // What another version wrote is not looked at any further, and nothing is said of it.
+  if (record && record->string("Version") != kFormatVersion) return false;
   // Media of a wrong kind is damage, not an empty list: opening it as empty would lose the items at the next save.
   const auto isUsable = [](const Dictionary& dictionary) {
     return !dictionary.contains("Media") || dictionary.array("Media") != nullptr;
@@ -169,13 +212,12 @@ bool QuiltDocument::readProperties(const Path& file) {
     FDYLogger::logWarning("Failed to open document at path \"%@\": \"Properties file cannot be read\"", path());
     return false;
   }
-  if (record->string("Version") != kFormatVersion) return false;
   apply(*std::move(record));
   return true;
 }
 
 void QuiltDocument::apply(Dictionary record) {
-  if (Text text = record.takeString("UUID")) setUuid(*std::move(text));
+  if (Text text = record.takeString("UUID")) _uuid.set(*std::move(text));
   if (Text text = record.takeString("Title")) setTitle(std::move(text));
   if (Text text = record.takeString("Description")) setDescription(std::move(text));
   if (Text text = record.takeString("Author")) setAuthor(std::move(text));
@@ -183,21 +225,28 @@ void QuiltDocument::apply(Dictionary record) {
   if (Text text = record.takeString("Category")) setCategory(std::move(text));
   if (Text text = record.takeString("AdvisoryLabel")) setAdvisoryLabel(std::move(text));
   if (const auto order = record.integer("jukeboxOrder")) setJukeboxOrder(*order);
-  if (const Text themePath = record.string("ThemePath")) setTheme(QuiltTheme::initWithPath(*themePath));
+  UnusedEntries unused;
+  if (const Text themePath = record.string("ThemePath")) {
+    setTheme(QuiltTheme::initWithPath(*themePath));
+    if (!theme()) unused.keep("ThemePath", *themePath);
+  }
   if (const auto date = record.date("CreationDate")) setCreationDate(date);
   if (const auto date = record.date("ModifiedDate")) setModifiedDate(date);
   if (Text text = record.takeString("Type")) setType(std::move(text));
-  if (Array* items = record.array("Media")) {
-    const auto self = shared(this);
-    for (auto& item : *items)
-      if (auto* entry = item.as<Dictionary>()) addMedia(QuiltMedia::initWithDictionary(std::move(*entry), self));
-  }
+  const auto self = shared(this);
+  readList(record, "Media", unused, [&](Dictionary& entry) {
+    const auto item = QuiltMedia::read(entry, self);
+    addMedia(item);
+    return item != nullptr;
+  });
   if (Text text = record.takeString("LastPublishURL")) setLastPublishURL(std::move(text));
-  _unknownEntries = platform::entriesBeyond(kDocumentKeys, record);
+  _themeEntries.set(themeEntriesIn(record));
+  unused.keepRest(kDocumentKeys, record);
+  _kept.take(std::move(unused));
 }
 
 void QuiltDocument::reload() {
-  const auto record = readPropertiesOf(path(), platform::standardizedPath(propertiesPath()));
+  const auto record = readPropertiesOf(path(), plainPath(propertiesPath()));
   const auto written = record ? record->date("ModifiedDate") : std::nullopt;
   const auto known = modifiedDate();
   if (!written || (known && *written <= *known)) return;
@@ -213,14 +262,18 @@ void QuiltDocument::reload() {
 // ---- Saving
 
 Dictionary QuiltDocument::dictionary() {
-  if (!title()) setTitle(untitledEpisode());
+  if (!title() && !_kept.holds("Title")) {
+    _titlingThread = platform::currentThreadIdentity();
+    setTitle(untitledEpisode());
+    _titlingThread = nullptr;
+  }
   Dictionary record;
   const auto set = [&record](const char* key, const Text& text) {
     if (text) record.append(key, *text);
   };
   record.append("Version", kFormatVersion);
   record.append("UUID", uuid());
-  set("Title", title());
+  record.append("Title", title().value_or(untitledEpisode()));
   set("Description", description());
   set("Author", author());
   set("Keywords", keywords());
@@ -240,13 +293,16 @@ Dictionary QuiltDocument::dictionary() {
   set("LastPublishURL", lastPublishURL());
   record.append("DocumentDuration", duration());
   record.append("IsFlattened", isFlattened());
-  platform::appendAll(record, _unknownEntries);
+  _kept.writeInto(record);
   return record;
 }
 
 bool QuiltDocument::writeProperties() {
+  _hasUnsavedEdits = false;
   // First, and also without a file to write to: the record gives an untitled document its title.
-  const Dictionary record = dictionary();
+  Dictionary record = dictionary();
+  if (const auto entries = _themeEntries.get(); !entries.empty())
+    record.set(kThemeEntriesKey, Array(entries.begin(), entries.end()));
   const Path file = propertiesPath();
   return !file.empty() && services().propertyLists->writeDictionary(record, file);
 }
@@ -266,7 +322,25 @@ std::optional<platform::MonitorLock> QuiltDocument::beginProcessing() {
   if (isBusy()) return std::nullopt;
   auto lock = _media.lock();
   if (_isProcessing.exchange(true)) return std::nullopt;
+  _processingThread = platform::currentThreadIdentity();
   return lock;
+}
+
+void QuiltDocument::endProcessing() {
+  _processingThread = nullptr;
+  _isProcessing.set(false);
+  if (_hasUnsavedEdits.exchange(false)) saveChange();
+}
+
+void QuiltDocument::setIsProcessing(bool isProcessing) {
+  _isProcessing.set(isProcessing);
+  if (!isProcessing) _hasUnsavedEdits = false;  // what was set while the document was filled is no edit of a user
+}
+
+void QuiltDocument::noteUnsavedChange() {
+  const platform::ThreadIdentity processing = _processingThread;
+  // What the operation itself changes, it writes when it is done.
+  if (processing != nullptr && processing != platform::currentThreadIdentity()) _hasUnsavedEdits = true;
 }
 
 bool QuiltDocument::update() {
@@ -292,7 +366,7 @@ std::optional<bool> QuiltDocument::saveUnlessBusy() {
     if (!written)
       FDYLogger::logCritical("Failed to update document at path \"%@\": \"Properties cannot be written\"",
                              propertiesPath());
-    setIsProcessing(false);
+    _isProcessing.set(false);
   }
   _savingThread = before;
   if (!isFree) return std::nullopt;
@@ -302,7 +376,11 @@ std::optional<bool> QuiltDocument::saveUnlessBusy() {
 void QuiltDocument::observeValueForKeyPath(std::string_view keyPath, platform::Object& /*ofObject*/,
                                            platform::ChangePhase /*change*/, void* /*context*/) {
   if (std::find(std::begin(kSavingKeys), std::end(kSavingKeys), keyPath) == std::end(kSavingKeys)) return;
-  if (isBusy()) return;
+  if (isBusy()) {
+    const platform::ThreadIdentity processing = _processingThread;
+    if (processing != nullptr && _titlingThread != platform::currentThreadIdentity()) _hasUnsavedEdits = true;
+    return;
+  }
   FDYLogger::logDebug("Updating document because KVO deteched a change for the %@", keyPath);
   saveChange();
 }

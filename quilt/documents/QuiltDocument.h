@@ -61,12 +61,14 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
   static bool canImportFromPath(const Path& path);
 
   // Properties
-  /// Names the package in its collection.
+  /// Names the package in its collection. What is no plain folder name, and what begins with ".", is refused with a
+  /// warning.
   std::string uuid() const { return _uuid.get(); }
-  void setUuid(std::string uuid) { _uuid.set(std::move(uuid)); }
-  /// The package folder; empty while the document has none. Setting moves nothing on disk.
+  void setUuid(std::string uuid);
+  /// The package folder; empty while the document has none. Setting moves nothing on disk: it tells that the package
+  /// was moved, so what lies in it is looked for in the new place from then on.
   Path path() const { return _path.get(); }
-  void setPath(Path path) { _path.set(std::move(path)); }
+  void setPath(Path path);
   /// path() as text, which is a tenth of the cost.
   std::string folder() const {
     return _path.with([](const Path& path) { return path.native(); });
@@ -101,7 +103,8 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
   /// Where a host last published it; none: nowhere.
   Text lastPublishURL() const { return _lastPublishURL.get(); }
   void setLastPublishURL(Text url) { _lastPublishURL.set(std::move(url)); }
-  /// The theme that was chosen, null without one. Setting alone copies nothing: see applyTheme().
+  /// The theme that was chosen, null without one. Setting alone copies nothing: see applyTheme(). A theme that cannot
+  /// be opened while the document loads stays in the record until another, or none, is set.
   std::shared_ptr<QuiltTheme> theme() const { return _theme.get(); }
   void setTheme(std::shared_ptr<QuiltTheme> theme) { _theme.set(std::move(theme)); }
   /// One of the document types; none for a document without one. Saved with the next save.
@@ -109,7 +112,7 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
   void setType(Text type) { _type.set(std::move(type)); }
   /// Whether a load, a save or a long operation runs. A host does not set it.
   bool isProcessing() const { return _isProcessing.get(); }
-  void setIsProcessing(bool isProcessing) { _isProcessing.set(isProcessing); }
+  void setIsProcessing(bool isProcessing);
   /// The owner, which sets and clears it; null while detached. Never keeps it alive.
   std::shared_ptr<QuiltCollection> collectionOwner() const { return _collectionOwner.get(); }
   void setCollectionOwner(const std::shared_ptr<QuiltCollection>& owner) { _collectionOwner.set(owner); }
@@ -140,7 +143,8 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
   bool loadDictionary();
   /// Adds the file's media to those held. A file whose "Media" is no array is damaged and does not load.
   bool loadDictionaryAtPath(const Path& path);
-  /// The properties record. Gives the document its fall-back title when it has none.
+  /// The properties record, with what no loader could use of the one that was read. Gives the document its fall-back
+  /// title when it has none.
   Dictionary dictionary();
   /// Stamps modifiedDate and saves. False, after a critical line, while processing or when the file cannot be written.
   /// Waits for a save that another thread has begun.
@@ -148,6 +152,9 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
   /// The automatic save after a change: update() without its refusal, because a long operation may begin at any moment
   /// between the change and its save.
   void saveChange();
+  /// Notes a change that cannot be saved because another thread's long operation runs: that operation saves at its end,
+  /// however it ends.
+  void noteUnsavedChange();
   /// Whether a change is not to be saved now: a load, a long operation or a save of this thread runs. A save of another
   /// thread does not count; update() waits for it.
   bool isBusy() const;
@@ -241,11 +248,19 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
   ImageRepresentation imageRepresentation() override;
 
   // Themes
-  /// Copies the theme's template into the package after clearing the previous one's files.
+  /// Copies the theme's template into the package after removeTheme(), and remembers the names of its entries.
   bool applyTheme(const std::shared_ptr<QuiltTheme>& theme, const ProgressionBlock& withProgressionBlock);
-  /// Deletes what a theme copied into the package. False, after a critical line, when the package cannot be listed;
-  /// what cannot be deleted stays, with a warning.
+  /// Deletes every top-level entry of the package but the document's own, whoever put it there: ask
+  /// entriesNoThemeBrought() first. False, after a critical line, when the package cannot be listed; what cannot be
+  /// deleted stays, with a warning.
   bool removeTheme();
+  /// @{
+  /// The names at the top of a package, sorted, that the next theme deletes although no theme brought them: a user's
+  /// notes, a ".git". A theme's are those that were remembered when it was applied, and those of the template that is
+  /// chosen now.
+  std::vector<std::string> entriesNoThemeBrought() const;
+  static std::vector<std::string> entriesNoThemeBrought(const Path& package);
+  /// @}
   /// Succeeds without writing anything.
   bool generateLocalizationControllerFromTheme(const std::shared_ptr<QuiltTheme>& theme);
   /// The store metadata.
@@ -253,7 +268,8 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
 
   // Long operations, on the calling thread; the block gets 0 to 100
   /// Makes the document ready to be played: finalizes every item, writes what the theme reads, the thumbnail and the
-  /// properties file.
+  /// properties file. A theme that cannot be copied is found out before the one in the package is touched. What
+  /// entriesNoThemeBrought() names is deleted, after a warning for each.
   bool finalizeWithProgressionBlock(const ProgressionBlock& withProgressionBlock);
   /// True when there are items and every one is flattened.
   bool isFlattened() const;
@@ -276,6 +292,7 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
 
  protected:
   QuiltDocument();
+  void valueWasSet(std::string_view key) override { _kept.forget(key); }
 
  private:
   bool isShownByFile();
@@ -291,9 +308,16 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
   std::optional<bool> saveUnlessBusy();
   /// Sets isProcessing and answers the media lock, or none while busy. Waits for another thread's save.
   std::optional<platform::MonitorLock> beginProcessing();
+  /// Clears isProcessing, and saves what was edited meanwhile and is not in the record that was written last.
+  void endProcessing();
   enum class Outcome { Done, Failed, Cancelled };
   Outcome finalizeMedia(const ProgressionBlock& block);
   bool finalizeInteractive();
+  /// Whether the theme's template can be copied into the package, as far as a look tells. False after applyTheme()'s
+  /// lines.
+  bool canApplyTheme(const QuiltTheme& theme) const;
+  /// Points what lies in the package to its place there.
+  void followPackage(const Path& from, const Path& to);
   Outcome flattenMedia(const ProgressionBlock& block);
   Path exportCopy(const Path& path, bool zipped, const std::vector<std::string>& usingFormats,
                   const ProgressionBlock& block);
@@ -320,8 +344,12 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
   platform::Property<Text> _type{*this, "type"};
   platform::Property<bool> _isProcessing{*this, "isProcessing"};
   platform::WeakProperty<QuiltCollection> _collectionOwner{*this, "collectionOwner"};
-  std::atomic<platform::ThreadIdentity> _savingThread{nullptr};  // while update() runs
-  Dictionary _unknownEntries;
+  std::atomic<platform::ThreadIdentity> _savingThread{nullptr};      // while update() runs
+  std::atomic<platform::ThreadIdentity> _processingThread{nullptr};  // while a long operation runs
+  std::atomic<platform::ThreadIdentity> _titlingThread{nullptr};     // while it gives the fall-back title
+  std::atomic<bool> _hasUnsavedEdits{false};                         // since the last record of a long operation
+  platform::Property<std::vector<std::string>> _themeEntries{*this, "themeEntries"};
+  KeptEntries _kept;
   std::vector<platform::Observation> _observations;  // last: ends before the properties do
 };
 

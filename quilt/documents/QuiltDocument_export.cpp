@@ -119,7 +119,7 @@ bool QuiltDocument::flattenWithProgressionBlock(const ProgressionBlock& withProg
       FDYLogger::logCritical("Flattening document at path \"%@\" has been cancelled", path());
       break;
   }
-  setIsProcessing(false);
+  endProcessing();
   return outcome == Outcome::Done;
 }
 
@@ -160,8 +160,12 @@ Path QuiltDocument::exportToPath(const Path& path, bool zipped, const std::vecto
 void QuiltDocument::forgetFallBackTitle() {
   const auto lock = beginProcessing();  // a save would give the title again
   if (!lock) return;
-  if (title() == untitledEpisode()) setTitle(std::nullopt);
-  setIsProcessing(false);
+  if (title() == untitledEpisode()) {
+    _titlingThread = platform::currentThreadIdentity();
+    setTitle(std::nullopt);
+    _titlingThread = nullptr;
+  }
+  endProcessing();
 }
 
 Path QuiltDocument::exportCopy(const Path& path, bool zipped, const std::vector<std::string>& usingFormats,

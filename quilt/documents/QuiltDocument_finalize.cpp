@@ -46,7 +46,7 @@ bool QuiltDocument::finalizeWithProgressionBlock(const ProgressionBlock& withPro
       FDYLogger::logCritical("Finalizing document at path \"%@\" has been cancelled", path());
       break;
   }
-  setIsProcessing(false);
+  endProcessing();
   return outcome == Outcome::Done;
 }
 
@@ -81,6 +81,9 @@ bool QuiltDocument::finalizeInteractive() {
     FDYLogger::logCritical("Failed to finalize document at path \"%@\": \"No valid theme found\"", path());
     return false;
   }
+  if (!canApplyTheme(*chosen)) return false;
+  for (const std::string& name : entriesNoThemeBrought())
+    FDYLogger::logWarning("Finalizing document at path \"%@\" deletes \"%@\", which no theme brought", path(), name);
   if (!applyTheme(chosen, [](double) { return true; })) return false;
 
   const auto poster = posterImage();

@@ -3,6 +3,7 @@
 #include "quilt/platform/interfaces/Services.h"
 #include "quilt/sources/DocumentSave.h"
 #include "quilt/sources/ModelFiles.h"
+#include "quilt/sources/SharedIdentity.h"
 
 namespace quilt {
 
@@ -61,7 +62,8 @@ void QuiltDocument::removeMedia(const std::shared_ptr<QuiltMedia>& media) {
   {
     const auto guard = _media.lock();
     // The item's path leads through its owner, so its files go first.
-    deleteFromPackage(media->path(), shared(this), "Failed to delete media at path \"%@\": \"%@\"");
+    if (!sharesFolder(*media))
+      deleteFromPackage(media->path(), shared(this), "Failed to delete media at path \"%@\": \"%@\"");
     _media.remove(media);
   }
   requestSave(shared(this));

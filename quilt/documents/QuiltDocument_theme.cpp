@@ -2,9 +2,12 @@
 #include <algorithm>
 
 #include "quilt/documents/QuiltDocument.h"
+#include "quilt/documents/ThemeEntries.h"
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/base/Paths.h"
+#include "quilt/platform/base/TemporaryNames.h"
 #include "quilt/platform/interfaces/Services.h"
+#include "quilt/sources/ModelFiles.h"
 
 namespace quilt {
 
@@ -43,7 +46,86 @@ platform::Result<void> copyEntry(const Path& source, const Path& destination, co
   return services().files->copyItem(source, destination);
 }
 
+/// The names at the top of the package that neither the document nor one of these has brought.
+std::vector<std::string> foreignEntries(const Path& package, const std::vector<std::string>& brought,
+                                        const std::shared_ptr<QuiltTheme>& theme) {
+  const platform::FileManager& files = *services().files;
+  auto names = files.contentsOfDirectoryAtPath(package);
+  if (!names) return {};
+  std::vector<std::string> known = brought;
+  known.emplace_back("controllers");  // of the data script
+  const Path folder = theme ? theme->templatePath() : Path();
+  if (!folder.empty())
+    if (const auto entries = files.contentsOfDirectoryAtPath(folder))
+      known.insert(known.end(), entries->begin(), entries->end());
+  std::erase_if(*names, [&known](const std::string& name) {
+    return isKept(name) || platform::isHiddenTemporaryName(name) ||
+           std::find(known.begin(), known.end(), name) != known.end();
+  });
+  std::sort(names->begin(), names->end());
+  return *std::move(names);
+}
+
+void logFailure(const Text& theme, const Path& package, const Text& error) {
+  FDYLogger::logCritical("Failed to apply theme \"%@\" on document at path \"%@\": \"%@\"", theme, package, error);
+}
+
+void logUnlisted(const Path& folder, const platform::Error& error) {
+  FDYLogger::logDebug("Failed to get content of theme at path \"%@\": \"%@\"", folder, error);
+}
+
+void logUncopied(const Path& from, const Path& to, const platform::Error& error) {
+  FDYLogger::logDebug("Failed to copy \"%@\" to \"%@\": \"%@\"", from, to, error);
+}
+
+/// Why the entry cannot be copied, as far as a look tells.
+platform::Result<void> lookAtEntry(const Path& source, const Path& destination, const Path& bundle) {
+  if (const Path link = firstLink(source, bundle); !link.empty())
+    return platform::Error{platform::ErrorKind::Unsafe, "A theme may not hold symbolic links.", link};
+  if (isKept(destination.filename().native()) && services().files->fileExistsAtPath(destination))
+    return platform::Error{platform::ErrorKind::AlreadyExists, "The document has an entry of that name.", destination};
+  return {};
+}
+
 }  // namespace
+
+std::vector<std::string> themeEntriesIn(const Dictionary& record) {
+  std::vector<std::string> names;
+  if (const Array* entries = record.array(kThemeEntriesKey))
+    for (const auto& entry : *entries)
+      if (const auto* name = entry.as<std::string>()) names.push_back(*name);
+  return names;
+}
+
+std::vector<std::string> QuiltDocument::entriesNoThemeBrought() const {
+  return foreignEntries(path(), _themeEntries.get(), theme());
+}
+
+std::vector<std::string> QuiltDocument::entriesNoThemeBrought(const Path& package) {
+  const auto record = services().propertyLists->readDictionary(package / kQuiltDocumentPropertiesFilename);
+  if (!record) return {};
+  const Text themePath = record->string("ThemePath");
+  const bool isThere = themePath && services().files->fileExistsAtPath(*themePath);
+  return foreignEntries(package, themeEntriesIn(*record), isThere ? QuiltTheme::initWithPath(*themePath) : nullptr);
+}
+
+bool QuiltDocument::canApplyTheme(const QuiltTheme& theme) const {
+  const Path folder = theme.templatePath();
+  const auto entries = services().files->contentsOfDirectoryAtPath(folder);
+  if (!entries) {
+    logUnlisted(folder, entries.error());
+    logFailure(theme.localizedName(), path(), entries.error().text);
+    return false;
+  }
+  for (const std::string& entry : *entries) {
+    const auto look = lookAtEntry(folder / entry, path() / entry, theme.path());
+    if (look) continue;
+    logUncopied(folder / entry, path() / entry, look.error());
+    logFailure(theme.localizedName(), path(), look.error().text);
+    return false;
+  }
+  return true;
+}
 
 bool QuiltDocument::removeTheme() {
   const auto names = services().files->contentsOfDirectoryAtPath(path());
@@ -53,7 +135,7 @@ bool QuiltDocument::removeTheme() {
   }
   for (const std::string& name : *names) {
     if (isKept(name)) continue;
-    const Path entry = platform::standardizedPath(path() / name);
+    const Path entry = plainPath(path() / name);
     const auto removed = services().files->removeItem(entry, path());
     if (!removed && removed.error().kind != platform::ErrorKind::NotFound)
       FDYLogger::logWarning("Failed to remove current theme element \"@\": \"%@\"", entry, removed.error());
@@ -64,7 +146,7 @@ bool QuiltDocument::removeTheme() {
 bool QuiltDocument::applyTheme(const std::shared_ptr<QuiltTheme>& theme, const ProgressionBlock& withProgressionBlock) {
   const Text name = theme ? theme->localizedName() : std::nullopt;
   const auto fail = [&](const Text& error) {
-    FDYLogger::logCritical("Failed to apply theme \"%@\" on document at path \"%@\": \"%@\"", name, path(), error);
+    logFailure(name, path(), error);
     removeTheme();
     return false;
   };
@@ -73,9 +155,10 @@ bool QuiltDocument::applyTheme(const std::shared_ptr<QuiltTheme>& theme, const P
   const Path folder = theme ? theme->templatePath() : Path();
   const auto entries = services().files->contentsOfDirectoryAtPath(folder);
   if (!entries) {
-    FDYLogger::logDebug("Failed to get content of theme at path \"%@\": \"%@\"", folder, entries.error());
+    logUnlisted(folder, entries.error());
     return fail(entries.error().text);
   }
+  _themeEntries.set(*entries);
   std::size_t position = 0;
   for (const std::string& entry : *entries) {
     if (!platform::report(withProgressionBlock, platform::integerPercentage(position++, entries->size()))) {
@@ -84,7 +167,7 @@ bool QuiltDocument::applyTheme(const std::shared_ptr<QuiltTheme>& theme, const P
     }
     const auto copied = copyEntry(folder / entry, path() / entry, theme->path());
     if (!copied) {
-      FDYLogger::logDebug("Failed to copy \"%@\" to \"%@\": \"%@\"", folder / entry, path() / entry, copied.error());
+      logUncopied(folder / entry, path() / entry, copied.error());
       return fail(copied.error().text);
     }
   }

@@ -13,18 +13,18 @@ namespace quilt {
 
 namespace {
 
-constexpr std::string_view kMediaKeys[] = {"UUID",
-                                           "Title",
-                                           "Description",
-                                           "Sources",
-                                           "Extras",
-                                           "AudioCommentarySource",
-                                           "IsFlattened",
-                                           "TotalSizeInMegaBytes",
-                                           "ContentCategory",
-                                           "PosterImagePath",
-                                           "PosterImageWidth",
-                                           "PosterImageHeight"};
+constexpr RecordKey kMediaKeys[] = {{"UUID", RecordKind::Told},
+                                    {"Title", RecordKind::Text},
+                                    {"Description", RecordKind::Text},
+                                    {"Sources", RecordKind::List},
+                                    {"Extras", RecordKind::List},
+                                    {"AudioCommentarySource", RecordKind::Record},
+                                    {"IsFlattened", RecordKind::Told},
+                                    {"TotalSizeInMegaBytes", RecordKind::Told},
+                                    {"ContentCategory", RecordKind::Text},
+                                    {"PosterImagePath", RecordKind::Told},
+                                    {"PosterImageWidth", RecordKind::Told},
+                                    {"PosterImageHeight", RecordKind::Told}};
 
 template <class List>
 Array recordsOf(const List& list) {
@@ -47,31 +47,38 @@ std::shared_ptr<QuiltMedia> QuiltMedia::init() {
 
 std::shared_ptr<QuiltMedia> QuiltMedia::initWithDictionary(Dictionary dictionary,
                                                            const std::shared_ptr<QuiltDocument>& andDocument) {
+  return read(dictionary, andDocument);
+}
+
+std::shared_ptr<QuiltMedia> QuiltMedia::read(Dictionary& record, const std::shared_ptr<QuiltDocument>& andDocument) {
+  if (!hasAcceptedIdentity(record, "media item")) return nullptr;
   auto media = init();
   // First, so that the children find their places while they load.
   media->_documentOwner.initialize(andDocument);
-  if (Text uuid = dictionary.takeString("UUID")) {
-    if (!isAcceptedName(*uuid, "media item")) return nullptr;
-    media->_uuid.initialize(*std::move(uuid));
-  }
-  if (Text title = dictionary.takeString("Title")) media->_title.initialize(std::move(title));
-  if (Text description = dictionary.takeString("Description")) media->_description.initialize(std::move(description));
-  if (Text category = dictionary.takeString("ContentCategory")) media->_contentCategory.initialize(std::move(category));
-  if (Array* records = dictionary.array("Sources")) {
-    for (auto& record : *records)
-      if (auto* entry = record.as<Dictionary>())
-        media->addSource(QuiltMediaSource::initWithDictionary(std::move(*entry), media));
-  }
-  if (Array* records = dictionary.array("Extras")) {
-    for (auto& record : *records)
-      if (auto* entry = record.as<Dictionary>())
-        media->addExtra(QuiltMediaExtra::initWithDictionary(std::move(*entry), media));
-  }
-  if (Dictionary* record = dictionary.dictionary("AudioCommentarySource")) {
-    if (const auto commentary = QuiltMediaSource::initWithDictionary(std::move(*record), media))
+  if (Text uuid = record.takeString("UUID")) media->_uuid.initialize(*std::move(uuid));
+  if (Text title = record.takeString("Title")) media->_title.initialize(std::move(title));
+  if (Text description = record.takeString("Description")) media->_description.initialize(std::move(description));
+  if (Text category = record.takeString("ContentCategory")) media->_contentCategory.initialize(std::move(category));
+  UnusedEntries unused;
+  readList(record, "Sources", unused, [&media](Dictionary& entry) {
+    const auto source = QuiltMediaSource::read(entry, media);
+    media->addSource(source);
+    return source != nullptr;
+  });
+  readList(record, "Extras", unused, [&media](Dictionary& entry) {
+    const auto extra = QuiltMediaExtra::read(entry, media);
+    media->addExtra(extra);
+    return extra != nullptr;
+  });
+  if (Dictionary* entry = record.dictionary("AudioCommentarySource")) {
+    if (const auto commentary = QuiltMediaSource::read(*entry, media)) {
       media->setAudioCommentarySource(commentary);
+    } else {
+      unused.keep("AudioCommentarySource", std::move(*entry));
+    }
   }
-  media->_unknownEntries = platform::entriesBeyond(kMediaKeys, dictionary);
+  unused.keepRest(kMediaKeys, record);
+  media->_kept.take(std::move(unused));
   return media;
 }
 
@@ -97,8 +104,12 @@ Dictionary QuiltMedia::dictionary() {
                   platform::textRelativeTo(below(folderOf(*this), {"poster.jpg"}), document->folder()));
   record.append("PosterImageWidth", posterImageWidth());
   record.append("PosterImageHeight", posterImageHeight());
-  platform::appendAll(record, _unknownEntries);
+  _kept.writeInto(record);
   return record;
+}
+
+void QuiltMedia::setUuid(std::string uuid) {
+  if (isAcceptedIdentity(uuid, "media item")) _uuid.set(std::move(uuid));
 }
 
 Text QuiltMedia::contentCategory() const {

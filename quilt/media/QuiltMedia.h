@@ -25,11 +25,14 @@ class QUILT_EXPORT QuiltMedia : public platform::Object, public ImageBrowserItem
   /// nothing are skipped.
   static std::shared_ptr<QuiltMedia> initWithDictionary(Dictionary dictionary,
                                                         const std::shared_ptr<QuiltDocument>& andDocument);
+  /// The same, emptying the record; a refused one stays as it is.
+  static std::shared_ptr<QuiltMedia> read(Dictionary& record, const std::shared_ptr<QuiltDocument>& andDocument);
 
   // Properties
-  /// Names the item's folder in the package, so it is a plain folder name.
+  /// Names the item's folder in the package, so it is a plain folder name. What is none, and what begins with ".", is
+  /// refused with a warning.
   std::string uuid() const { return _uuid.get(); }
-  void setUuid(std::string uuid) { _uuid.set(std::move(uuid)); }
+  void setUuid(std::string uuid);
   /// @{
   /// For people, UTF-8; none: not given. Setting saves nothing by itself.
   Text title() const { return _title.get(); }
@@ -191,11 +194,13 @@ class QUILT_EXPORT QuiltMedia : public platform::Object, public ImageBrowserItem
   std::vector<std::string> availableFormats() const;
 
   // Record
-  /// Reads the poster, and so may draw and save it.
+  /// The record as it is written, with what no loader could use of the one that was read. Reads the poster, and so may
+  /// draw and save it.
   Dictionary dictionary();
 
  protected:
   QuiltMedia();
+  void valueWasSet(std::string_view key) override { _kept.forget(key); }
 
  private:
   void updateDocumentUnlessProcessing() const;
@@ -230,7 +235,7 @@ class QUILT_EXPORT QuiltMedia : public platform::Object, public ImageBrowserItem
   platform::ChildList<QuiltMediaExtra, QuiltMedia> _extras{*this, "extras", &QuiltMediaExtra::setMediaOwner};
   platform::Property<std::shared_ptr<QuiltMediaSource>> _audioCommentarySource{*this, "audioCommentarySource"};
   platform::WeakProperty<QuiltDocument> _documentOwner{*this, "documentOwner"};
-  Dictionary _unknownEntries;
+  KeptEntries _kept;
 };
 
 }  // namespace quilt

@@ -24,8 +24,13 @@ std::shared_ptr<QuiltMediaExtra> QuiltMediaExtra::initWithPath(const Path& path)
 
 std::shared_ptr<QuiltMediaExtra> QuiltMediaExtra::initWithDictionary(Dictionary dictionary,
                                                                      const std::shared_ptr<QuiltMedia>& andMedia) {
+  return read(dictionary, andMedia);
+}
+
+std::shared_ptr<QuiltMediaExtra> QuiltMediaExtra::read(Dictionary& record,
+                                                       const std::shared_ptr<QuiltMedia>& andMedia) {
   auto extra = init();
-  return extra->initializeWithDictionary(std::move(dictionary), andMedia) ? extra : nullptr;
+  return extra->initializeWithDictionary(record, andMedia) ? extra : nullptr;
 }
 
 std::string QuiltMediaExtra::folder() const {

@@ -16,6 +16,7 @@ class QUILT_EXPORT QuiltMediaExtra : public QuiltMediaSource {
   static std::shared_ptr<QuiltMediaExtra> initWithPath(const Path& path);
   static std::shared_ptr<QuiltMediaExtra> initWithDictionary(Dictionary dictionary,
                                                              const std::shared_ptr<QuiltMedia>& andMedia);
+  static std::shared_ptr<QuiltMediaExtra> read(Dictionary& record, const std::shared_ptr<QuiltMedia>& andMedia);
   /// @}
 
   /// Inside the item's "extras" folder; empty while the item is not in a document.

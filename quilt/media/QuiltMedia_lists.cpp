@@ -3,6 +3,7 @@
 #include "quilt/media/QuiltMedia.h"
 #include "quilt/sources/DocumentSave.h"
 #include "quilt/sources/ModelFiles.h"
+#include "quilt/sources/SharedIdentity.h"
 
 namespace quilt {
 
@@ -31,10 +32,11 @@ void QuiltMedia::moveChildren(List& list, const IndexSet& indexes, std::size_t t
 template <class List, class Child>
 void QuiltMedia::removeChild(List& list, const Child& child, const char* warning) {
   if (!child) return;
+  const bool isShared = sharesFolder(*child);
   {
     const auto guard = list.lock();
     // The child's path leads through its owner, so its files go first.
-    deleteFromPackage(child->path(), documentOwner(), warning);
+    if (!isShared) deleteFromPackage(child->path(), documentOwner(), warning);
     list.remove(child);
   }
   updateDocumentUnlessProcessing();

@@ -21,7 +21,8 @@ thread_local Deferred deferred;
 }  // namespace
 
 void requestSave(const std::shared_ptr<QuiltDocument>& document) {
-  if (!document || document->isBusy()) return;
+  if (!document) return;
+  if (document->isBusy()) return document->noteUnsavedChange();
   if (deferred.depth == 0) {
     document->saveChange();
   } else if (std::find(deferred.documents.begin(), deferred.documents.end(), document) == deferred.documents.end()) {

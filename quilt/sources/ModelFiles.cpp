@@ -8,6 +8,7 @@
 #include "quilt/documents/QuiltDocument.h"
 #include "quilt/media/QuiltMedia.h"
 #include "quilt/platform/base/FDYLogger.h"
+#include "quilt/platform/base/Paths.h"
 #include "quilt/platform/interfaces/Services.h"
 #include "quilt/sources/copyfile_callback.h"
 
@@ -30,6 +31,15 @@ struct Looks {
 };
 
 thread_local Looks looks;
+
+/// At most 200 bytes of a name, ending between characters.
+std::string_view shortened(std::string_view name) {
+  constexpr std::size_t longest = 200;
+  if (name.size() <= longest) return name;
+  std::size_t end = longest;
+  while (end > 0 && (static_cast<unsigned char>(name[end]) & 0xC0) == 0x80) --end;
+  return name.substr(0, end);
+}
 
 // The text stays empty: what lies in no document has no place.
 void descend(std::string& folder, std::string_view name) {
@@ -55,6 +65,22 @@ std::string below(std::string folder, std::initializer_list<std::string_view> na
 
 Path pathBelow(std::string folder, std::initializer_list<std::string_view> names) {
   return Path(below(std::move(folder), names));
+}
+
+Path plainPath(const Path& path) {
+  const Path plain = platform::standardizedPath(path);
+  if (plain.native() == path.native()) return path;
+  const auto isSame = [](const Path& one, const Path& other) -> std::optional<bool> {
+    const auto first = services().files->attributesOfItemAtPath(one);
+    const auto second = services().files->attributesOfItemAtPath(other);
+    if (!first && !second) return std::nullopt;
+    return first && second && first->identity.device == second->identity.device &&
+           first->identity.inode == second->identity.inode;
+  };
+  const Path given = path.has_filename() ? path : path.parent_path();
+  auto same = isSame(given, plain);
+  if (!same) same = isSame(given.parent_path(), plain.parent_path());  // for what is yet to be made
+  return same.value_or(true) ? plain : path;
 }
 
 platform::Result<void> createDirectoryIfMissing(const Path& path) {
@@ -98,18 +124,25 @@ bool cannotBeDrawn(const platform::Error& error) {
 }
 
 std::string fileNameForTitle(const std::string& title) {
-  constexpr std::size_t longest = 200;
   std::string name = title;
   std::erase(name, '\0');
   std::replace(name.begin(), name.end(), '.', '_');
   std::replace(name.begin(), name.end(), '/', '-');
-  if (name.size() <= longest) return name;
-  std::size_t end = longest;
-  const auto continuesCharacter = [&name](std::size_t at) {
-    return (static_cast<unsigned char>(name[at]) & 0xC0) == 0x80;
-  };
-  while (end > 0 && continuesCharacter(end)) --end;
-  return name.substr(0, end);
+  return std::string(shortened(name));
+}
+
+std::string withShortNames(const std::string& title) {
+  std::string path = title;
+  std::erase(path, '\0');
+  std::string_view rest = path;
+  std::string names;
+  for (;;) {
+    const std::size_t end = rest.find('/');
+    names += shortened(rest.substr(0, end));
+    if (end == std::string_view::npos) return names;
+    names += '/';
+    rest.remove_prefix(end + 1);
+  }
 }
 
 std::string untitledEpisode() { return services().resources->localizedString("Untitled Episode", "Untitled Episode"); }

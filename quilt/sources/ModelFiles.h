@@ -25,6 +25,10 @@ std::string below(std::string folder, std::initializer_list<std::string_view> na
 Path pathBelow(std::string folder, std::initializer_list<std::string_view> names);
 /// @}
 
+/// The same place without ".", ".." and doubled separators, which would lead past the tests of what lies inside a
+/// folder; unchanged when a symbolic link on the way makes that another place.
+Path plainPath(const Path& path);
+
 /// Makes the folder with its parents unless something is there.
 platform::Result<void> createDirectoryIfMissing(const Path& path);
 
@@ -58,6 +62,9 @@ bool cannotBeDrawn(const platform::Error& error);
 /// A title as the base of a file name: "." becomes "_" and "/" becomes "-". Cut, between characters, to leave room for
 /// a counter and an extension in a file name's 255 bytes.
 std::string fileNameForTitle(const std::string& title);
+
+/// A title as a path whose components are each cut likewise.
+std::string withShortNames(const std::string& title);
 
 /// The localised "Untitled Episode".
 std::string untitledEpisode();

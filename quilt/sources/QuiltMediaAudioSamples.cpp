@@ -18,8 +18,9 @@ using platform::services;
 
 namespace {
 
-constexpr std::string_view kAudioSamplesKeys[] = {"UUID",      "SampleFilename", "SampleURL",
-                                                  "SourceURL", "IsFlattened",    "TotalSizeInMegaBytes"};
+constexpr RecordKey kAudioSamplesKeys[] = {
+    {"UUID", RecordKind::Told},      {"SampleFilename", RecordKind::Told}, {"SampleURL", RecordKind::Text},
+    {"SourceURL", RecordKind::Text}, {"IsFlattened", RecordKind::Boolean}, {"TotalSizeInMegaBytes", RecordKind::Told}};
 
 }  // namespace
 
@@ -43,20 +44,28 @@ std::shared_ptr<QuiltMediaAudioSamples> QuiltMediaAudioSamples::initWithURL(cons
 
 std::shared_ptr<QuiltMediaAudioSamples> QuiltMediaAudioSamples::initWithDictionary(
     Dictionary dictionary, const std::shared_ptr<QuiltMediaSource>& andMediaSource) {
+  return read(dictionary, andMediaSource);
+}
+
+std::shared_ptr<QuiltMediaAudioSamples> QuiltMediaAudioSamples::read(
+    Dictionary& record, const std::shared_ptr<QuiltMediaSource>& andMediaSource) {
+  if (!hasAcceptedIdentity(record, "samples file")) return nullptr;
   auto samples = init();
   samples->setSourceOwner(andMediaSource);
-  if (Text uuid = dictionary.takeString("UUID")) {
-    if (!isAcceptedName(*uuid, "samples file")) return nullptr;
-    samples->setUuid(std::move(uuid));
-  }
+  if (Text uuid = record.takeString("UUID")) samples->_uuid.initialize(std::move(uuid));
   // The key only marks that there were samples; where they lie follows from the identity.
-  if (dictionary.string("SampleURL") && andMediaSource) {
+  if (record.string("SampleURL") && andMediaSource) {
     const Path folder = andMediaSource->audioSamplesFolderPath();
     if (!folder.empty()) samples->setSampleURL(Url::fileUrl(folder / samples->uuid().value_or("")));
   }
-  if (const Text url = dictionary.string("SourceURL")) samples->setSourceURL(Url::parse(*url));
-  if (const auto flattened = dictionary.boolean("IsFlattened")) samples->setIsFlattened(*flattened);
-  samples->_unknownEntries = platform::entriesBeyond(kAudioSamplesKeys, dictionary);
+  UnusedEntries unused;
+  if (const Text url = record.string("SourceURL")) {
+    samples->setSourceURL(Url::parse(*url));
+    if (!samples->sourceURL()) unused.keep("SourceURL", *url);
+  }
+  if (const auto flattened = record.boolean("IsFlattened")) samples->setIsFlattened(*flattened);
+  unused.keepRest(kAudioSamplesKeys, record);
+  samples->_kept.take(std::move(unused));
   return samples;
 }
 
@@ -67,7 +76,7 @@ std::shared_ptr<QuiltMediaAudioSamples> QuiltMediaAudioSamples::copy() const {
   twin->setSourceURL(sourceURL());
   twin->setIsFlattened(isFlattened());
   twin->setSourceOwner(sourceOwner());
-  twin->_unknownEntries = _unknownEntries;
+  twin->_kept.copyFrom(_kept);
   return twin;
 }
 
@@ -84,8 +93,12 @@ Dictionary QuiltMediaAudioSamples::dictionary() const {
   if (const auto source = sourceURL()) record.append("SourceURL", source->absoluteString());
   record.append("IsFlattened", isFlattened());
   record.append("TotalSizeInMegaBytes", totalSizeInMegaBytes());
-  platform::appendAll(record, _unknownEntries);
+  _kept.writeInto(record);
   return record;
+}
+
+void QuiltMediaAudioSamples::setUuid(Text uuid) {
+  if (!uuid || isAcceptedIdentity(*uuid, "samples file")) _uuid.set(std::move(uuid));
 }
 
 Path QuiltMediaAudioSamples::path() const {

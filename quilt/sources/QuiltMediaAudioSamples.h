@@ -4,6 +4,7 @@
 #include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Property.h"
 #include "quilt/platform/base/RecursiveMonitor.h"
+#include "quilt/sources/KeptEntries.h"
 #include "quilt/sources/ModelTypes.h"
 
 namespace quilt {
@@ -22,13 +23,17 @@ class QUILT_EXPORT QuiltMediaAudioSamples : public platform::Object {
   /// Reads a record. Null, after a warning, when its identity is no plain file name.
   static std::shared_ptr<QuiltMediaAudioSamples> initWithDictionary(
       Dictionary dictionary, const std::shared_ptr<QuiltMediaSource>& andMediaSource);
+  /// The same, emptying the record; a refused one stays as it is.
+  static std::shared_ptr<QuiltMediaAudioSamples> read(Dictionary& record,
+                                                      const std::shared_ptr<QuiltMediaSource>& andMediaSource);
 
   /// A second object with the same values and owner.
   std::shared_ptr<QuiltMediaAudioSamples> copy() const;
 
-  /// The identity of the derivative that the samples were made from.
+  /// The identity of the derivative that the samples were made from; it names their file. What is no plain file name,
+  /// or begins with ".", is refused with a warning.
   Text uuid() const { return _uuid.get(); }
-  void setUuid(Text uuid) { _uuid.set(std::move(uuid)); }
+  void setUuid(Text uuid);
   /// The samples file; none until it was extracted or read from a record.
   std::optional<Url> sampleURL() const { return _sampleURL.get(); }
   void setSampleURL(std::optional<Url> url) { _sampleURL.set(std::move(url)); }
@@ -56,11 +61,12 @@ class QUILT_EXPORT QuiltMediaAudioSamples : public platform::Object {
   /// There are none; here because every child of a source has it.
   void invalidateCaches() {}
 
-  /// The record as it is written, with the entries that a newer version left in it.
+  /// The record as it is written, with what no loader could use of the one that was read.
   Dictionary dictionary() const;
 
  protected:
   QuiltMediaAudioSamples() = default;
+  void valueWasSet(std::string_view key) override { _kept.forget(key); }
 
  private:
   mutable platform::RecursiveMonitor _monitor;
@@ -69,7 +75,7 @@ class QUILT_EXPORT QuiltMediaAudioSamples : public platform::Object {
   platform::Property<std::optional<Url>> _sourceURL{*this, "sourceURL"};
   platform::Property<bool> _isFlattened{*this, "isFlattened"};
   platform::WeakProperty<QuiltMediaSource> _sourceOwner{*this, "sourceOwner"};
-  Dictionary _unknownEntries;
+  KeptEntries _kept;
 };
 
 }  // namespace quilt

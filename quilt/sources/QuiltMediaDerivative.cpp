@@ -24,9 +24,18 @@ namespace types = platform::types;
 
 namespace {
 
-constexpr std::string_view kDerivativeKeys[] = {
-    "UUID",        "Filename", "URL",   "ContentType", "CompatibilityTags", "MimeType",
-    "IsFlattened", "Height",   "Width", "Duration",    "RelativePath",      "TotalSizeInMegaBytes"};
+constexpr RecordKey kDerivativeKeys[] = {{"UUID", RecordKind::Told},
+                                         {"Filename", RecordKind::Text},
+                                         {"URL", RecordKind::Text},
+                                         {"ContentType", RecordKind::Text},
+                                         {"CompatibilityTags", RecordKind::List},
+                                         {"MimeType", RecordKind::Text},
+                                         {"IsFlattened", RecordKind::Boolean},
+                                         {"Height", RecordKind::Real},
+                                         {"Width", RecordKind::Real},
+                                         {"Duration", RecordKind::Real},
+                                         {"RelativePath", RecordKind::Told},
+                                         {"TotalSizeInMegaBytes", RecordKind::Told}};
 
 bool conforms(const Text& identifier, std::string_view other) {
   return identifier && services().types->conformsTo(*identifier, other);
@@ -135,34 +144,56 @@ bool QuiltMediaDerivative::classify(const Url& url) {
 
 std::shared_ptr<QuiltMediaDerivative> QuiltMediaDerivative::initWithDictionary(
     Dictionary dictionary, const std::shared_ptr<QuiltMediaSource>& andMediaSource) {
-  Text uuid = dictionary.takeString("UUID");
-  if (uuid && !isAcceptedName(*uuid, "source derivative")) return nullptr;
+  return read(dictionary, andMediaSource);
+}
+
+std::shared_ptr<QuiltMediaDerivative> QuiltMediaDerivative::read(
+    Dictionary& record, const std::shared_ptr<QuiltMediaSource>& andMediaSource) {
+  if (!hasAcceptedIdentity(record, "source derivative")) return nullptr;
+  const Text filename = record.string("Filename");
+  if (filename && !isAcceptedName(*filename, "source derivative")) return nullptr;
+  const Path folder = filename && andMediaSource ? andMediaSource->derivativesFolderPath() : Path();
+  if (!folder.empty() && !isInsidePackage(folder / *filename, documentOf(andMediaSource), "source derivative"))
+    return nullptr;
+
+  Text uuid = record.takeString("UUID");
   auto derivative = uuid ? make(*std::move(uuid)) : init();
   derivative->_sourceOwner.initialize(andMediaSource);
-  if (const Text filename = dictionary.string("Filename")) {
-    if (!isAcceptedName(*filename, "source derivative")) return nullptr;
-    const Path folder = andMediaSource ? andMediaSource->derivativesFolderPath() : Path();
-    if (!folder.empty()) {
-      if (!isInsidePackage(folder / *filename, documentOf(andMediaSource), "source derivative")) return nullptr;
-      derivative->_url.initialize(Url::fileUrl(folder / *filename));
-    }
-  } else if (const Text url = dictionary.string("URL")) {
-    derivative->_url.initialize(Url::parse(*url));
+  UnusedEntries unused;
+  std::optional<Url> location = folder.empty() ? std::nullopt : std::optional(Url::fileUrl(folder / *filename));
+  if (filename && !location) unused.keep("Filename", *filename);
+  if (const Text url = record.string("URL")) {
+    if (!filename) location = Url::parse(*url);
+    if (filename || !location) unused.keep("URL", *url);
   }
-  if (Text type = dictionary.takeString("ContentType")) derivative->_contentType.initialize(std::move(type));
-  if (Array* array = dictionary.array("CompatibilityTags")) {
+  derivative->_url.initialize(std::move(location));
+  if (Text type = record.takeString("ContentType")) derivative->_contentType.initialize(std::move(type));
+  if (Array* array = record.array("CompatibilityTags")) {
     std::vector<std::string> tags;
-    for (auto& element : *array)
-      if (auto* tag = element.as<std::string>()) tags.push_back(std::move(*tag));
+    std::size_t place = 0;
+    for (auto& element : *array) {
+      if (auto* tag = element.as<std::string>()) {
+        tags.push_back(std::move(*tag));
+      } else {
+        unused.keepElement("CompatibilityTags", place, std::move(element));
+      }
+      ++place;
+    }
     derivative->_compatibilityTags.initialize(std::move(tags));
   }
-  if (Text type = dictionary.takeString("MimeType")) derivative->_mimetype.initialize(std::move(type));
-  if (const auto width = dictionary.real("Width")) derivative->_width.initialize(narrowed(*width));
-  if (const auto height = dictionary.real("Height")) derivative->_height.initialize(narrowed(*height));
-  if (const auto duration = dictionary.real("Duration")) derivative->_duration.initialize(narrowed(*duration));
-  if (const auto flattened = dictionary.boolean("IsFlattened")) derivative->_isFlattened.initialize(*flattened);
-  derivative->_unknownEntries = platform::entriesBeyond(kDerivativeKeys, dictionary);
+  if (Text type = record.takeString("MimeType")) derivative->_mimetype.initialize(std::move(type));
+  if (const auto width = record.real("Width")) derivative->_width.initialize(narrowed(*width));
+  if (const auto height = record.real("Height")) derivative->_height.initialize(narrowed(*height));
+  if (const auto duration = record.real("Duration")) derivative->_duration.initialize(narrowed(*duration));
+  if (const auto flattened = record.boolean("IsFlattened")) derivative->_isFlattened.initialize(*flattened);
+  unused.keepRest(kDerivativeKeys, record);
+  derivative->_kept.take(std::move(unused));
   return derivative;
+}
+
+void QuiltMediaDerivative::valueWasSet(std::string_view key) {
+  _kept.forget(key);
+  if (key == "url") _kept.forget("filename");
 }
 
 Dictionary QuiltMediaDerivative::dictionary() const {
@@ -189,8 +220,12 @@ Dictionary QuiltMediaDerivative::dictionary() const {
     const auto document = documentOf(sourceOwner());
     record.append("RelativePath", platform::textRelativeTo(file, document ? document->folder() : std::string()));
   }
-  platform::appendAll(record, _unknownEntries);
+  _kept.writeInto(record);
   return record;
+}
+
+void QuiltMediaDerivative::setUuid(std::string uuid) {
+  if (isAcceptedIdentity(uuid, "source derivative")) _uuid.set(std::move(uuid));
 }
 
 bool QuiltMediaDerivative::hasTag(const std::string& tag) const {

@@ -3,6 +3,7 @@
 
 #include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Property.h"
+#include "quilt/sources/KeptEntries.h"
 #include "quilt/sources/ModelTypes.h"
 
 namespace quilt {
@@ -29,6 +30,9 @@ class QUILT_EXPORT QuiltMediaDerivative : public platform::Object {
   /// Reads a record. Null, after a warning, when its names would lead out of the source's folder.
   static std::shared_ptr<QuiltMediaDerivative> initWithDictionary(
       Dictionary dictionary, const std::shared_ptr<QuiltMediaSource>& andMediaSource);
+  /// The same, emptying the record; a refused one stays as it is.
+  static std::shared_ptr<QuiltMediaDerivative> read(Dictionary& record,
+                                                    const std::shared_ptr<QuiltMediaSource>& andMediaSource);
 
   /// @{
   /// Whether the file's type is one that any source, a classic document or a document-file source accepts. True for
@@ -46,9 +50,10 @@ class QUILT_EXPORT QuiltMediaDerivative : public platform::Object {
   /// The targets that the file suits, given its content category; empty when it suits none. Logs one debug line.
   static std::vector<std::string> compatibilityTagsForURL(const Url& url, const Text& andContentCategory);
 
-  /// Names the file in the package, so it is a plain file name.
+  /// Names the file in the package, so it is a plain file name. What is none, and what begins with ".", is refused with
+  /// a warning.
   std::string uuid() const { return _uuid.get(); }
-  void setUuid(std::string uuid) { _uuid.set(std::move(uuid)); }
+  void setUuid(std::string uuid);
   /// Where the content is: the outside file, the copy in the package, or the page of a web link.
   std::optional<Url> url() const { return _url.get(); }
   void setUrl(std::optional<Url> url) { _url.set(std::move(url)); }
@@ -91,11 +96,12 @@ class QUILT_EXPORT QuiltMediaDerivative : public platform::Object {
   /// Copies the file into a folder under the document's title, made unique. The path written, or empty.
   Path exportToPath(const Path& path, const ProgressionBlock& withProgressionBlock);
 
-  /// The record as it is written, with the entries that a newer version left in it.
+  /// The record as it is written, with what no loader could use of the one that was read.
   Dictionary dictionary() const;
 
  protected:
   explicit QuiltMediaDerivative(std::string uuid);
+  void valueWasSet(std::string_view key) override;
 
  private:
   static std::shared_ptr<QuiltMediaDerivative> make(std::string uuid);
@@ -111,7 +117,7 @@ class QUILT_EXPORT QuiltMediaDerivative : public platform::Object {
   platform::Property<double> _duration{*this, "duration"};
   platform::Property<bool> _isFlattened{*this, "isFlattened"};
   platform::WeakProperty<QuiltMediaSource> _sourceOwner{*this, "sourceOwner"};
-  Dictionary _unknownEntries;
+  KeptEntries _kept;
 };
 
 }  // namespace quilt

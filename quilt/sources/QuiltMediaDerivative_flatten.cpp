@@ -52,11 +52,12 @@ bool prepareFolder(const Path& folder, const std::shared_ptr<QuiltDocument>& doc
 }
 
 /// folder/title.ext, or, while something is there, folder/"Title 2".ext and so on. The counted names use the title as
-/// it is, so a title with "/" names a file in a subfolder. Empty when that would leave the folder.
+/// it is, but for names too long for a file, so a title with "/" names a file in a subfolder. Empty when that would
+/// leave the folder.
 Path uniqueExportPath(const Path& folder, const std::string& title, const std::string& extension) {
   Path candidate = folder / platform::withExtension(fileNameForTitle(title), extension);
   for (int counter = 2; services().files->fileExistsAtPath(candidate); ++counter) {
-    const std::string name = title + " " + std::to_string(counter);
+    const std::string name = withShortNames(title) + " " + std::to_string(counter);
     candidate = Path(folder.native() + "/" + platform::withExtension(name, extension)).lexically_normal();
     const Path relative = candidate.lexically_relative(folder.lexically_normal());
     if (relative.empty() || *relative.begin() == "..") return {};

@@ -18,8 +18,11 @@ using platform::services;
 
 namespace {
 
-constexpr std::string_view kPreviewKeys[] = {"UUID",  "Title",  "Content",     "Index",    "Timecode",
-                                             "Width", "Height", "IsFlattened", "Filename", "RelativePath"};
+constexpr RecordKey kPreviewKeys[] = {{"UUID", RecordKind::Told},     {"Title", RecordKind::Text},
+                                      {"Content", RecordKind::Text},  {"Index", RecordKind::Integer},
+                                      {"Timecode", RecordKind::Real}, {"Width", RecordKind::Told},
+                                      {"Height", RecordKind::Told},   {"IsFlattened", RecordKind::Boolean},
+                                      {"Filename", RecordKind::Told}, {"RelativePath", RecordKind::Told}};
 
 }  // namespace
 
@@ -45,19 +48,26 @@ std::shared_ptr<QuiltMediaPreview> QuiltMediaPreview::initWithImageWrapper(
 
 std::shared_ptr<QuiltMediaPreview> QuiltMediaPreview::initWithDictionary(
     Dictionary dictionary, const std::shared_ptr<QuiltMediaSource>& andMediaSource) {
-  Text uuid = dictionary.takeString("UUID");
-  if (uuid && !isAcceptedName(*uuid, "source preview")) return nullptr;
+  return read(dictionary, andMediaSource);
+}
+
+std::shared_ptr<QuiltMediaPreview> QuiltMediaPreview::read(Dictionary& record,
+                                                           const std::shared_ptr<QuiltMediaSource>& andMediaSource) {
+  if (!hasAcceptedIdentity(record, "source preview")) return nullptr;
+  Text uuid = record.takeString("UUID");
   auto preview = uuid ? make(*std::move(uuid)) : init();
   preview->_sourceOwner.initialize(andMediaSource);
-  if (Text title = dictionary.takeString("Title")) preview->_title.initialize(std::move(title));
-  if (Text content = dictionary.takeString("Content")) preview->_content.initialize(std::move(content));
-  if (const auto index = dictionary.integer("Index")) preview->_index.initialize(static_cast<std::size_t>(*index));
-  if (const auto timecode = dictionary.real("Timecode")) preview->_timecode.initialize(*timecode);
-  if (const auto flattened = dictionary.boolean("IsFlattened")) preview->_isFlattened.initialize(*flattened);
+  if (Text title = record.takeString("Title")) preview->_title.initialize(std::move(title));
+  if (Text content = record.takeString("Content")) preview->_content.initialize(std::move(content));
+  if (const auto index = record.integer("Index")) preview->_index.initialize(static_cast<std::size_t>(*index));
+  if (const auto timecode = record.real("Timecode")) preview->_timecode.initialize(*timecode);
+  if (const auto flattened = record.boolean("IsFlattened")) preview->_isFlattened.initialize(*flattened);
   preview->_isRenewable.initialize(true);
-  preview->_recordedWidth = dictionary.real("Width");
-  preview->_recordedHeight = dictionary.real("Height");
-  preview->_unknownEntries = platform::entriesBeyond(kPreviewKeys, dictionary);
+  preview->_recordedWidth = record.real("Width");
+  preview->_recordedHeight = record.real("Height");
+  UnusedEntries unused;
+  unused.keepRest(kPreviewKeys, record);
+  preview->_kept.take(std::move(unused));
   return preview;
 }
 
@@ -71,7 +81,7 @@ Dictionary QuiltMediaPreview::dictionary() const {
   if (const Text text = content()) record.append("Content", *text);
   // Signed, as every integer of a record: no index is written as -1 and read back as the largest unsigned value.
   record.append("Index", static_cast<std::int64_t>(index()));
-  record.append("Timecode", timecode());
+  if (timecode() != kNoTimecode) record.append("Timecode", timecode());
   const auto wide = width();
   const auto high = height();
   if (const auto pixels = wide ? wide : _recordedWidth) record.append("Width", *pixels);
@@ -81,8 +91,12 @@ Dictionary QuiltMediaPreview::dictionary() const {
     record.append("Filename", file.substr(file.rfind('/') + 1));
     record.append("RelativePath", platform::textRelativeTo(file, documentOf(source)->folder()));
   }
-  platform::appendAll(record, _unknownEntries);
+  _kept.writeInto(record);
   return record;
+}
+
+void QuiltMediaPreview::setUuid(std::string uuid) {
+  if (isAcceptedIdentity(uuid, "source preview")) _uuid.set(std::move(uuid));
 }
 
 void QuiltMediaPreview::adopt(const std::shared_ptr<ImageWrapper>& image) {

@@ -4,6 +4,7 @@
 #include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Property.h"
 #include "quilt/platform/base/Result.h"
+#include "quilt/sources/KeptEntries.h"
 #include "quilt/sources/ModelTypes.h"
 
 namespace quilt {
@@ -24,10 +25,14 @@ class QUILT_EXPORT QuiltMediaPreview : public platform::Object {
   /// Reads a record. Null, after a warning, when its identity is no plain file name.
   static std::shared_ptr<QuiltMediaPreview> initWithDictionary(Dictionary dictionary,
                                                                const std::shared_ptr<QuiltMediaSource>& andMediaSource);
+  /// The same, emptying the record; a refused one stays as it is.
+  static std::shared_ptr<QuiltMediaPreview> read(Dictionary& record,
+                                                 const std::shared_ptr<QuiltMediaSource>& andMediaSource);
 
-  /// Names the file of a preview without an index, so it is a plain file name.
+  /// Names the file of a preview without an index, so it is a plain file name. What is none, and what begins with ".",
+  /// is refused with a warning.
   std::string uuid() const { return _uuid.get(); }
-  void setUuid(std::string uuid) { _uuid.set(std::move(uuid)); }
+  void setUuid(std::string uuid);
   /// A movie chapter's name, or a page's first line.
   Text title() const { return _title.get(); }
   void setTitle(Text title) { _title.set(std::move(title)); }
@@ -77,11 +82,12 @@ class QUILT_EXPORT QuiltMediaPreview : public platform::Object {
   /// There are none; here because every child of a source has it.
   void invalidateCaches() {}
 
-  /// The record as it is written, with the entries that a newer version left in it.
+  /// The record as it is written, with what no loader could use of the one that was read.
   Dictionary dictionary() const;
 
  protected:
   explicit QuiltMediaPreview(std::string uuid);
+  void valueWasSet(std::string_view key) override { _kept.forget(key); }
 
  private:
   static std::shared_ptr<QuiltMediaPreview> make(std::string uuid);
@@ -102,7 +108,7 @@ class QUILT_EXPORT QuiltMediaPreview : public platform::Object {
   std::optional<double> _recordedWidth;
   std::optional<double> _recordedHeight;
   platform::WeakProperty<QuiltMediaSource> _sourceOwner{*this, "sourceOwner"};
-  Dictionary _unknownEntries;
+  KeptEntries _kept;
 };
 
 }  // namespace quilt

@@ -20,9 +20,12 @@ namespace types = platform::types;
 
 namespace {
 
-constexpr std::string_view kSourceKeys[] = {
-    "UUID",     "ContentCategory", "Derivatives",          "Previews", "AudioSamples", "Title", "Description",
-    "Timecode", "IsFlattened",     "TotalSizeInMegaBytes", "Dirty"};
+constexpr RecordKey kSourceKeys[] = {{"UUID", RecordKind::Told},           {"ContentCategory", RecordKind::Told},
+                                     {"Derivatives", RecordKind::List},    {"Previews", RecordKind::List},
+                                     {"AudioSamples", RecordKind::Record}, {"Title", RecordKind::Text},
+                                     {"Description", RecordKind::Text},    {"Timecode", RecordKind::Real},
+                                     {"IsFlattened", RecordKind::Told},    {"TotalSizeInMegaBytes", RecordKind::Told},
+                                     {"Dirty", RecordKind::Boolean}};
 
 constexpr const char* kImageTypes[] = {types::kJPEG, types::kJPEG2000, types::kTIFF, types::kGIF,
                                        types::kPNG,  types::kICNS,     types::kBMP};
@@ -69,8 +72,13 @@ std::shared_ptr<QuiltMediaSource> QuiltMediaSource::initWithPath(const Path& pat
 
 std::shared_ptr<QuiltMediaSource> QuiltMediaSource::initWithDictionary(Dictionary dictionary,
                                                                        const std::shared_ptr<QuiltMedia>& andMedia) {
+  return read(dictionary, andMedia);
+}
+
+std::shared_ptr<QuiltMediaSource> QuiltMediaSource::read(Dictionary& record,
+                                                         const std::shared_ptr<QuiltMedia>& andMedia) {
   auto source = init();
-  return source->initializeWithDictionary(std::move(dictionary), andMedia) ? source : nullptr;
+  return source->initializeWithDictionary(record, andMedia) ? source : nullptr;
 }
 
 bool QuiltMediaSource::initializeWithURL(const Url& url) {
@@ -83,32 +91,50 @@ bool QuiltMediaSource::initializeWithURL(const Url& url) {
   return true;
 }
 
-bool QuiltMediaSource::initializeWithDictionary(Dictionary dictionary, const std::shared_ptr<QuiltMedia>& andMedia) {
+bool QuiltMediaSource::initializeWithDictionary(Dictionary& record, const std::shared_ptr<QuiltMedia>& andMedia) {
+  if (!hasAcceptedIdentity(record, "media source")) return false;
   _mediaOwner.initialize(andMedia);
-  if (Text uuid = dictionary.takeString("UUID")) {
-    if (!isAcceptedName(*uuid, "media source")) return false;
-    _uuid.initialize(*std::move(uuid));
-  }
+  if (Text uuid = record.takeString("UUID")) _uuid.initialize(*std::move(uuid));
   const auto self = shared(this);
-  if (Array* records = dictionary.array("Derivatives")) {
-    for (auto& record : *records)
-      if (auto* entry = record.as<Dictionary>())
-        addDerivative(QuiltMediaDerivative::initWithDictionary(std::move(*entry), self));
-  }
-  if (Array* records = dictionary.array("Previews")) {
-    for (auto& record : *records)
-      if (auto* entry = record.as<Dictionary>())
-        addPreview(QuiltMediaPreview::initWithDictionary(std::move(*entry), self));
-  }
-  if (Dictionary* record = dictionary.dictionary("AudioSamples"))
-    addAudioSamples(QuiltMediaAudioSamples::initWithDictionary(std::move(*record), self));
-  if (Text title = dictionary.takeString("Title")) setTitle(std::move(title));
-  if (Text description = dictionary.takeString("Description")) setDescription(std::move(description));
-  if (const auto timecode = dictionary.real("Timecode")) setTimecode(*timecode);
-  _unknownEntries = platform::entriesBeyond(kSourceKeys, dictionary);
-  // Last: a dirty source drops what was just read but its main derivative.
-  if (const auto dirty = dictionary.boolean("Dirty")) setDirty(*dirty);
+  UnusedEntries unused;
+  readList(record, "Derivatives", unused, [&](Dictionary& entry) {
+    const auto derivative = QuiltMediaDerivative::read(entry, self);
+    if (derivative) tellApart(*derivative);
+    addDerivative(derivative);
+    return derivative != nullptr;
+  });
+  readList(record, "Previews", unused, [&](Dictionary& entry) {
+    const auto preview = QuiltMediaPreview::read(entry, self);
+    addPreview(preview);
+    return preview != nullptr;
+  });
+  if (Dictionary* entry = record.dictionary("AudioSamples")) readAudioSamples(*entry, unused);
+  if (Text title = record.takeString("Title")) setTitle(std::move(title));
+  if (Text description = record.takeString("Description")) setDescription(std::move(description));
+  if (const auto timecode = record.real("Timecode")) setTimecode(*timecode);
+  unused.keepRest(kSourceKeys, record);
+  // A dirty source drops what was just read but its main derivative.
+  if (const auto dirty = record.boolean("Dirty")) setDirty(*dirty);
+  _kept.take(std::move(unused));
   return true;
+}
+
+void QuiltMediaSource::tellApart(QuiltMediaDerivative& derivative) const {
+  const auto twin = _derivatives.first([&](const auto& other) { return other->uuid() == derivative.uuid(); });
+  if (twin && twin->url() != derivative.url()) derivative.setUuid(platform::generateUUID());
+}
+
+void QuiltMediaSource::readAudioSamples(Dictionary& record, UnusedEntries& unused) {
+  // Those that are in the package are always attached.
+  const bool isExtracted = record.boolean("IsFlattened").value_or(false);
+  const Dictionary asItStood = isExtracted ? Dictionary() : record;
+  const auto samples = QuiltMediaAudioSamples::read(record, shared(this));
+  addAudioSamples(samples);
+  if (!samples) {
+    unused.keep("AudioSamples", std::move(record));
+  } else if (audioSamples() != samples) {
+    unused.keep("AudioSamples", asItStood);
+  }
 }
 
 Dictionary QuiltMediaSource::dictionary() const {
@@ -132,8 +158,12 @@ Dictionary QuiltMediaSource::dictionary() const {
   record.append("IsFlattened", isFlattened());
   record.append("TotalSizeInMegaBytes", totalSizeInMegaBytes());
   record.append("Dirty", dirty());
-  platform::appendAll(record, _unknownEntries);
+  _kept.writeInto(record);
   return record;
+}
+
+void QuiltMediaSource::setUuid(std::string uuid) {
+  if (isAcceptedIdentity(uuid, "media source")) _uuid.set(std::move(uuid));
 }
 
 std::shared_ptr<QuiltDocument> QuiltMediaSource::document() const {
@@ -153,6 +183,25 @@ std::string QuiltMediaSource::folder() const {
 Path QuiltMediaSource::derivativesFolderPath() const { return pathBelow(folder(), {"derivatives"}); }
 Path QuiltMediaSource::previewsFolderPath() const { return pathBelow(folder(), {"previews"}); }
 Path QuiltMediaSource::audioSamplesFolderPath() const { return pathBelow(folder(), {"audiosamples"}); }
+
+void QuiltMediaSource::followPackage(const Path& from, const Path& to) {
+  const auto moved = [&](const std::optional<Url>& url) -> std::optional<Url> {
+    if (!url || !url->isFileUrl()) return std::nullopt;
+    const std::string file = url->relativePathText();
+    const std::string& folder = from.native();
+    if (!file.starts_with(folder) || file.size() <= folder.size() || file[folder.size()] != '/') return std::nullopt;
+    return Url::fileUrl(to / file.substr(folder.size() + 1));
+  };
+  _derivatives.walk([&](const auto& derivative) {
+    if (!derivative->isFlattened()) return true;
+    if (auto url = moved(derivative->url())) derivative->setUrl(std::move(url));
+    return true;
+  });
+  const auto samples = audioSamples();
+  if (!samples) return;
+  if (auto url = moved(samples->sampleURL())) samples->setSampleURL(std::move(url));
+  if (auto url = moved(samples->sourceURL())) samples->setSourceURL(std::move(url));
+}
 
 // ---- Derived values
 

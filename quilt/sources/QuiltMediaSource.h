@@ -44,11 +44,14 @@ class QUILT_EXPORT QuiltMediaSource : public platform::Object {
   /// Reads a record. Null, after a warning, when its identity is no plain folder name.
   static std::shared_ptr<QuiltMediaSource> initWithDictionary(Dictionary dictionary,
                                                               const std::shared_ptr<QuiltMedia>& andMedia);
+  /// The same, emptying the record; a refused one stays as it is.
+  static std::shared_ptr<QuiltMediaSource> read(Dictionary& record, const std::shared_ptr<QuiltMedia>& andMedia);
 
   // Properties
-  /// Names the source's folder in the package, so it is a plain folder name.
+  /// Names the source's folder in the package, so it is a plain folder name. What is none, and what begins with ".", is
+  /// refused with a warning.
   std::string uuid() const { return _uuid.get(); }
-  void setUuid(std::string uuid) { _uuid.set(std::move(uuid)); }
+  void setUuid(std::string uuid);
   /// @{
   /// For people, UTF-8; none: not given. Setting saves nothing by itself.
   Text title() const { return _title.get(); }
@@ -182,8 +185,9 @@ class QUILT_EXPORT QuiltMediaSource : public platform::Object {
   void invalidateAll();
 
   // Long operations, on the calling thread; the block gets 0 to 100
-  /// Replaces the content by the file, keeping identity, title, description and timecode. A file that no derivative
-  /// accepts leaves the source empty.
+  /// Replaces the content by the file, keeping identity, title, description and timecode, and has the item's poster
+  /// drawn anew. A file that no derivative accepts leaves the source empty; one that was not copied in full is named
+  /// where it is. In both cases the files that the source had before stay in the package, each named in a warning.
   void reloadWithFileAtPath(const Path& path, const ProgressionBlock& withProgressionBlock);
   /// Makes a derivative for the tag when one is needed and can be made. On failure the source keeps what it had.
   ///
@@ -203,18 +207,28 @@ class QUILT_EXPORT QuiltMediaSource : public platform::Object {
   Path exportToPath(const Path& path, const std::string& withFormat, const ProgressionBlock& withProgressionBlock);
 
   // Record
-  /// The record as it is written, with the entries that a newer version left in it.
+  /// The record as it is written, with what no loader could use of the one that was read.
   Dictionary dictionary() const;
 
  protected:
   QuiltMediaSource();
   /// Fills a fresh object from a record; false, after a warning, when the record is refused.
-  bool initializeWithDictionary(Dictionary dictionary, const std::shared_ptr<QuiltMedia>& andMedia);
+  bool initializeWithDictionary(Dictionary& record, const std::shared_ptr<QuiltMedia>& andMedia);
   bool initializeWithURL(const Url& url);
+  void valueWasSet(std::string_view key) override { _kept.forget(key); }
 
  private:
   std::shared_ptr<QuiltDocument> document() const;
+  friend class QuiltDocument;
+  /// The package was moved: what lies in it is looked for in its new place.
+  void followPackage(const Path& from, const Path& to);
   void updateDocumentUnlessProcessing() const;
+  /// Gives a derivative that was read an identity of its own when another file has it: the copy would replace that
+  /// one's.
+  void tellApart(QuiltMediaDerivative& derivative) const;
+  /// Leaves the source with this derivative, or with none for null. The files of the others go only when asked for.
+  void replaceDerivatives(const std::shared_ptr<QuiltMediaDerivative>& derivative, bool deleteFiles);
+  void readAudioSamples(Dictionary& record, UnusedEntries& unused);
   struct PreviewContent;
   std::shared_ptr<QuiltMediaPreview> existingPreview(std::size_t index) const;
   std::shared_ptr<QuiltMediaPreview> usablePreview(std::size_t index);
@@ -243,7 +257,7 @@ class QUILT_EXPORT QuiltMediaSource : public platform::Object {
   platform::Property<double> _timecode{*this, "timecode", kNoTimecode};
   platform::Property<bool> _dirty{*this, "dirty"};
   platform::WeakProperty<QuiltMedia> _mediaOwner{*this, "mediaOwner"};
-  Dictionary _unknownEntries;
+  KeptEntries _kept;
 };
 
 }  // namespace quilt

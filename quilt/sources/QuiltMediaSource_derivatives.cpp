@@ -4,6 +4,7 @@
 #include "quilt/documents/QuiltDocument.h"
 #include "quilt/sources/ModelFiles.h"
 #include "quilt/sources/QuiltMediaSource.h"
+#include "quilt/sources/SharedIdentity.h"
 
 namespace quilt {
 
@@ -31,11 +32,12 @@ void QuiltMediaSource::addDerivative(const std::shared_ptr<QuiltMediaDerivative>
 
 void QuiltMediaSource::removeDerivative(const std::shared_ptr<QuiltMediaDerivative>& derivative) {
   if (!derivative) return;
+  const bool isShared = sharesFile(*derivative);
   {
     const auto guard = _derivatives.lock();
     const auto url = derivative->url();
     // A derivative that is not flattened points at the user's own file.
-    if (derivative->isFlattened() && url && url->isFileUrl())
+    if (derivative->isFlattened() && !isShared && url && url->isFileUrl())
       deleteFromPackage(url->relativePath(), document(), "Failed to delete derivative at path \"%@\": \"%@\"");
     _derivatives.remove(derivative);
   }

@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "quilt/documents/QuiltDocument.h"
+#include "quilt/media/QuiltMedia.h"
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/sources/DocumentSave.h"
 #include "quilt/sources/ModelFiles.h"
@@ -150,24 +151,41 @@ Path QuiltMediaSource::exportToPath(const Path& path, const std::string& withFor
 void QuiltMediaSource::reloadWithFileAtPath(const Path& path, const ProgressionBlock& withProgressionBlock) {
   RepeatedReport progress(withProgressionBlock);
   progress.report(0);
-  removeAllDerivatives();
+  // Nothing goes before the new file is there: what lies in the package may be the only copy of it.
+  const auto derivative = QuiltMediaDerivative::initWithURL(Url::fileUrl(path));
+  progress.report(10);
+  progress.report(20);
+  bool isCopied = false;
+  if (derivative) {
+    derivative->setSourceOwner(shared(this));
+    isCopied = derivative->flattenCopy(
+        /*copy=*/true, [&](double percentage) { return progress.report(percentage * 8.0 / 10.0 + 20.0); });
+  }
+  replaceDerivatives(derivative, isCopied);
   removeAllPreviews();
   removeAllAudioSamples();
+  for (const char* key : {"Derivatives", "Previews", "AudioSamples"}) _kept.forget(key);
   invalidateThumbnailImage();
   invalidatePosterImage();
   invalidateCaches();
-  progress.report(10);
-  const auto derivative = QuiltMediaDerivative::initWithURL(Url::fileUrl(path));
-  progress.report(20);
-  if (derivative) {
-    addDerivative(derivative);
-    derivative->flattenCopy(
-        /*copy=*/true, [&](double percentage) { return progress.report(percentage * 8.0 / 10.0 + 20.0); });
-    if (contentCategory() != kQuiltMediaContentCategoryDocument)
-      addAudioSamplesForMainDerivative(progress.continueBlock());
-  }
+  if (const auto media = mediaOwner()) media->invalidatePosterImage();
+  if (derivative && contentCategory() != kQuiltMediaContentCategoryDocument)
+    addAudioSamplesForMainDerivative(progress.continueBlock());
   if (const auto owner = document()) owner->update();
   progress.report(100);
+}
+
+void QuiltMediaSource::replaceDerivatives(const std::shared_ptr<QuiltMediaDerivative>& derivative, bool deleteFiles) {
+  const auto before = _derivatives.copy();
+  addDerivative(derivative);
+  for (const auto& old : before) {
+    const auto url = old->url();
+    if (!deleteFiles && old->isFlattened() && url && url->isFileUrl()) {
+      FDYLogger::logWarning("The file \"%@\" was not replaced and stays in the package", url->relativePath());
+      old->setIsFlattened(false);  // so that removing it leaves the file
+    }
+    removeDerivative(old);
+  }
 }
 
 }  // namespace quilt

@@ -299,7 +299,11 @@ void QuiltMediaSource::removePreview(const std::shared_ptr<QuiltMediaPreview>& p
   if (!preview) return;
   {
     const auto guard = _previews.lock();
-    deleteFromPackage(preview->path(), document(), "Failed to delete preview at path \"%@\": \"%@\"");
+    const std::size_t index = preview->index();
+    const bool isShared = index != kNoIndex && _previews.first([&](const auto& other) {
+      return other != preview && other->index() == index;
+    });
+    if (!isShared) deleteFromPackage(preview->path(), document(), "Failed to delete preview at path \"%@\": \"%@\"");
     _previews.remove(preview);
   }
   updateDocumentUnlessProcessing();

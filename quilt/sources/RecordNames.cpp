@@ -18,6 +18,20 @@ bool isAcceptedName(const std::string& name, const char* kind) {
   return false;
 }
 
+bool hasAcceptedIdentity(const Dictionary& record, const char* kind) {
+  const platform::PropertyList* value = record.find("UUID");
+  const auto* uuid = value ? value->as<std::string>() : nullptr;
+  return !uuid || isAcceptedName(*uuid, kind);
+}
+
+bool isIdentity(const std::string& uuid) { return platform::isPlainComponent(uuid) && !uuid.starts_with('.'); }
+
+bool isAcceptedIdentity(const std::string& uuid, const char* kind) {
+  if (isIdentity(uuid)) return true;
+  FDYLogger::logWarning("Refused the identity \"%@\" for a %@: it is no plain file name", uuid, kind);
+  return false;
+}
+
 bool isInsidePackage(const Path& path, const std::shared_ptr<QuiltDocument>& document, const char* kind) {
   if (!document || document->path().empty()) return true;
   if (platform::services().files->isConfined(path, document->path())) return true;

@@ -17,6 +17,16 @@ class QuiltMediaSource;
 /// Whether a "UUID" or "Filename" may become a component of a path.
 bool isAcceptedName(const std::string& name, const char* kind);
 
+/// The same of the record's "UUID", when it has one that is a text.
+bool hasAcceptedIdentity(const Dictionary& record, const char* kind);
+
+/// @{
+/// Whether a host may give an object this identity: one that may become a component of a path, and is not hidden,
+/// because no loader looks at hidden names. The second logs a warning when not.
+bool isIdentity(const std::string& uuid);
+bool isAcceptedIdentity(const std::string& uuid, const char* kind);
+/// @}
+
 /// Whether a path of the package reaches its file without leaving the package through a symbolic link. True without a
 /// document.
 bool isInsidePackage(const Path& path, const std::shared_ptr<QuiltDocument>& document, const char* kind);

@@ -248,7 +248,7 @@ TEST_F(QuiltMediaDerivativeTest, MissingKeysAndWrongKindsKeepTheFreshValues) {
                                 {"CompatibilityTags", "Desktop"},
                                 {"MimeType", 1.5},
                                 {"Width", "wide"},
-                                {"IsFlattened", 1}});
+                                {"IsFlattened", "yes"}});
   ASSERT_NE(derivative, nullptr);
   EXPECT_EQ(derivative->uuid().size(), 36u);
   EXPECT_EQ(derivative->url(), std::nullopt);

@@ -125,6 +125,8 @@ void Object::changeOnMainThread(std::string_view key, const std::function<void()
 
 void Object::performBlockOnMainThread(const std::function<void()>& block) { MainThread::performBlock(block); }
 
+void Object::valueWasSet(std::string_view /*key*/) {}
+
 std::vector<std::string_view> Object::keysDependingOn(std::string_view) const { return {}; }
 
 void Object::announce(std::string_view key, ChangePhase phase) {

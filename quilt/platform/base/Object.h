@@ -50,6 +50,9 @@ class QUILT_EXPORT Object : public std::enable_shared_from_this<Object> {
   static void performBlockOnMainThread(const std::function<void()>& block);
 
  protected:
+  /// Called after each set of a property, before its did-change announcement, with no lock held. Nothing here.
+  virtual void valueWasSet(std::string_view key);
+
   /// The keys whose values are computed from that of `key`.
   [[nodiscard]] virtual std::vector<std::string_view> keysDependingOn(std::string_view key) const;
 

@@ -38,6 +38,7 @@ class Property {
   void set(T value) {
     _owner.willChangeValueForKey(_key);
     store(std::move(value));
+    _owner.valueWasSet(_key);
     _owner.didChangeValueForKey(_key);
   }
 
@@ -48,6 +49,7 @@ class Property {
       const std::lock_guard guard(_owner._mutex);
       std::swap(_value, value);
     }
+    _owner.valueWasSet(_key);
     _owner.didChangeValueForKey(_key);
     return value;
   }

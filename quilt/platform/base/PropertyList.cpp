@@ -60,7 +60,6 @@ PropertyList* Dictionary::find(std::string_view key) {
 }
 
 std::optional<std::string> Dictionary::string(std::string_view key) const { return copyOf<std::string>(find(key)); }
-std::optional<bool> Dictionary::boolean(std::string_view key) const { return copyOf<bool>(find(key)); }
 std::optional<Date> Dictionary::date(std::string_view key) const { return copyOf<Date>(find(key)); }
 const Array* Dictionary::array(std::string_view key) const { return pointerTo<Array>(find(key)); }
 const Dictionary* Dictionary::dictionary(std::string_view key) const { return pointerTo<Dictionary>(find(key)); }
@@ -79,6 +78,13 @@ std::optional<std::int64_t> Dictionary::integer(std::string_view key) const {
   constexpr double limit = 9223372036854775808.0;  // 2^63, exact as a double
   if (real && *real >= -limit && *real < limit) return static_cast<std::int64_t>(*real);
   return std::nullopt;
+}
+
+std::optional<bool> Dictionary::boolean(std::string_view key) const {
+  const PropertyList* value = find(key);
+  if (const auto* whole = pointerTo<std::int64_t>(value)) return *whole != 0;
+  if (const auto* real = pointerTo<double>(value)) return *real != 0;
+  return copyOf<bool>(value);
 }
 
 std::optional<double> Dictionary::real(std::string_view key) const {

@@ -67,7 +67,8 @@ class QUILT_EXPORT Dictionary {
 
   /// @{
   /// The value of a key when it is there and of the wanted kind; otherwise none or null.
-  /// A real answers as an integer too, cut toward zero, when it is in range; a whole number answers as a real.
+  /// A real answers as an integer too, cut toward zero, when it is in range; a whole number answers as a real, and
+  /// either as a boolean: true unless it is 0.
   [[nodiscard]] std::optional<std::string> string(std::string_view key) const;
   [[nodiscard]] std::optional<std::int64_t> integer(std::string_view key) const;
   [[nodiscard]] std::optional<double> real(std::string_view key) const;
@@ -147,17 +148,6 @@ class QUILT_EXPORT PropertyList {
  private:
   Value _value;
 };
-
-/// A copy of the entries of `record` whose keys are not among `known`: what a newer version of the system wrote, to be
-/// written back untouched.
-template <class Keys>
-Dictionary entriesBeyond(const Keys& known, const Dictionary& record) {
-  Dictionary rest;
-  for (const auto& [key, value] : record) {
-    if (std::find(std::begin(known), std::end(known), key) == std::end(known)) rest.append(key, value);
-  }
-  return rest;
-}
 
 /// Appends every entry of `rest` to `record`.
 QUILT_EXPORT void appendAll(Dictionary& record, const Dictionary& rest);

@@ -74,14 +74,29 @@ std::size_t schemeLength(std::string_view text) {
   return valid ? colon : 0;
 }
 
-// What follows the authority, up to a query or fragment.
-std::string_view pathPart(std::string_view text) {
+// What follows the authority.
+std::string_view afterAuthority(std::string_view text) {
   text.remove_prefix(schemeLength(text) + 1);
   if (text.substr(0, 2) == "//") {
     text.remove_prefix(2);
     text.remove_prefix(std::min(text.find_first_of("/?#"), text.size()));
   }
+  return text;
+}
+
+// The same, up to a query or fragment.
+std::string_view pathPart(std::string_view text) {
+  text = afterAuthority(text);
   return text.substr(0, std::min(text.find('?'), text.find('#')));
+}
+
+// With the spaces behind the authority encoded.
+std::string withEncodedSpaces(std::string_view text) {
+  std::string out(text);
+  const std::size_t start = text.size() - afterAuthority(text).size();
+  for (std::size_t i = out.size(); i-- > start;)
+    if (out[i] == ' ') out.replace(i, 1, "%20");
+  return out;
 }
 
 }  // namespace
@@ -91,13 +106,14 @@ Url Url::fileUrl(const std::filesystem::path& path) {
   return {std::string(kFilePrefix) + percentEncoded(absolute.native()), true};
 }
 
-std::optional<Url> Url::parse(std::string_view text) {
+std::optional<Url> Url::parse(std::string_view given) {
+  const std::string text = given.find(' ') == std::string_view::npos ? std::string(given) : withEncodedSpaces(given);
   const auto forbidden = [](unsigned char c) { return c <= 0x20 || c == 0x7F; };
   const std::size_t scheme = schemeLength(text);
   if (scheme == 0 || scheme + 1 == text.size() || std::any_of(text.begin(), text.end(), forbidden)) return std::nullopt;
-  if (lowercase(text.substr(0, scheme)) != "file") return Url(std::string(text), false);
+  if (lowercase(text.substr(0, scheme)) != "file") return Url(text, false);
 
-  const std::string_view afterScheme = text.substr(scheme + 1);
+  const std::string_view afterScheme = std::string_view(text).substr(scheme + 1);
   if (afterScheme.substr(0, 2) == "//") {
     const std::string_view authority = afterScheme.substr(2, afterScheme.find('/', 2) - 2);
     if (!authority.empty() && lowercase(authority) != "localhost") return std::nullopt;
@@ -105,7 +121,7 @@ std::optional<Url> Url::parse(std::string_view text) {
   const std::string_view path = pathPart(text);
   const bool isAbsolute = percentDecoded(path.substr(0, 3)).starts_with('/');
   if (!isAbsolute || path.find("%00") != std::string_view::npos) return std::nullopt;
-  return Url(std::string(text), true);
+  return Url(text, true);
 }
 
 std::filesystem::path Url::relativePath() const { return relativePathText(); }

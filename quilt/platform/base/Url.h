@@ -17,8 +17,9 @@ class QUILT_EXPORT Url {
   /// A relative path is taken from the working folder.
   static Url fileUrl(const std::filesystem::path& path);
 
-  /// Reads an absolute URL. None for text without a scheme, with control characters or spaces, or for a file URL that
-  /// names another host or holds an encoded NUL.
+  /// Reads an absolute URL. Spaces in what follows the host are encoded, as people and other programs leave them there.
+  /// None for text without a scheme, with control characters, with spaces elsewhere, or for a file URL that names
+  /// another host or holds an encoded NUL.
   static std::optional<Url> parse(std::string_view text);
 
   /// Whether it is the URL of a local file.

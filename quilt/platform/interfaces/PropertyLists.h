@@ -26,7 +26,8 @@ class QUILT_EXPORT PropertyLists {
   /// The dictionary that is the root of the file.
   [[nodiscard]] virtual Result<Dictionary> readDictionary(const std::filesystem::path& path) const = 0;
 
-  /// Replaces the file atomically.
+  /// Replaces the file atomically. What readDictionary() would refuse for its length fails as Unsupported, and the file
+  /// stays as it is.
   virtual Result<void> writeDictionary(const Dictionary& dictionary, const std::filesystem::path& path) = 0;
 };
 

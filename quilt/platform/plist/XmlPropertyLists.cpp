@@ -47,7 +47,9 @@ Result<Dictionary> XmlPropertyLists::readDictionary(const std::filesystem::path&
 
 Result<void> XmlPropertyLists::writeDictionary(const Dictionary& dictionary, const std::filesystem::path& path) try {
   // The entries are written from where they are; only the list around them is made here.
-  return services().files->writeAtomically(path, writeXml(dictionary));
+  const std::string text = writeXml(dictionary);
+  if (exceedsLimits(text)) return Error{ErrorKind::Unsupported, "The property list is too long to be read again", path};
+  return services().files->writeAtomically(path, text);
 } catch (const std::bad_alloc&) {
   return notEnoughMemory(path);
 }

@@ -178,6 +178,8 @@ pugi::xml_node nextElement(pugi::xml_node node) {
 
 }  // namespace
 
+bool exceedsLimits(std::string_view buffer) { return buffer.size() > kLongestPropertyList || holdsTooManyTags(buffer); }
+
 void dropRepeatedKeys(Dictionary& dictionary) {
   if (!mayRepeatKeys(dictionary)) return;
   std::unordered_map<std::string_view, std::size_t> last;

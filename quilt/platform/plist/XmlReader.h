@@ -2,6 +2,7 @@
 #pragma once
 
 #include <string>
+#include <string_view>
 
 #include "quilt/platform/base/PropertyList.h"
 #include "quilt/platform/base/Result.h"
@@ -15,6 +16,9 @@ namespace quilt::platform {
 /// is no UTF-8 and what XML cannot hold becomes U+FFFD: every text that is read is the same once written and read
 /// again.
 Result<PropertyList> readXml(std::string& buffer);
+
+/// Whether readXml would refuse these bytes for their length or for the number of their values.
+bool exceedsLimits(std::string_view buffer);
 
 /// Keeps the last of the values that share a key, each key in its first place.
 void dropRepeatedKeys(Dictionary& dictionary);

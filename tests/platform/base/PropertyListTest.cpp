@@ -45,7 +45,7 @@ TEST(PropertyListTest, AWrongKindCountsAsMissing) {
   EXPECT_FALSE(dictionary.integer("string"));
   EXPECT_FALSE(dictionary.integer("true"));
   EXPECT_EQ(true, dictionary.boolean("true"));
-  EXPECT_FALSE(dictionary.boolean("whole"));
+  EXPECT_FALSE(dictionary.boolean("string"));
   EXPECT_FALSE(dictionary.real("true"));
   EXPECT_EQ(Date{}, dictionary.date("date"));
   EXPECT_FALSE(dictionary.date("string"));
@@ -117,16 +117,6 @@ TEST(PropertyListTest, ATextIsTakenOnceAndItsKeyStays) {
   EXPECT_EQ(dictionary.takeString("whole"), std::nullopt);
   EXPECT_EQ(dictionary.takeString("none"), std::nullopt);
   EXPECT_EQ(dictionary, (Dictionary{{"text", ""}, {"whole", 7}}));
-}
-
-TEST(PropertyListTest, UnknownEntriesAreSetAsideAndComeBackInOrder) {
-  const std::array known{"UUID", "Title"};
-  const Dictionary record{{"Zeta", 1}, {"UUID", "u"}, {"Alpha", Array{2}}, {"Title", "t"}};
-  const Dictionary rest = entriesBeyond(known, record);
-  EXPECT_THAT(keys(rest), ElementsAre("Zeta", "Alpha"));
-  Dictionary written{{"UUID", "u"}};
-  appendAll(written, rest);
-  EXPECT_THAT(keys(written), ElementsAre("UUID", "Zeta", "Alpha"));
 }
 
 }  // namespace
