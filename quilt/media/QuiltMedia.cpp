@@ -83,6 +83,9 @@ std::shared_ptr<QuiltMedia> QuiltMedia::read(Dictionary& record, const std::shar
 }
 
 Dictionary QuiltMedia::dictionary() {
+  // First: the poster may have to be drawn, and the previews that are made for it belong into the same record.
+  const platform::PropertyList posterWidth = posterImageWidth();
+  const platform::PropertyList posterHeight = posterImageHeight();
   Dictionary record;
   record.reserve(std::size(kMediaKeys));
   record.append("UUID", uuid());
@@ -102,8 +105,8 @@ Dictionary QuiltMedia::dictionary() {
   if (document)
     record.append("PosterImagePath",
                   platform::textRelativeTo(below(folderOf(*this), {"poster.jpg"}), document->folder()));
-  record.append("PosterImageWidth", posterImageWidth());
-  record.append("PosterImageHeight", posterImageHeight());
+  record.append("PosterImageWidth", posterWidth);
+  record.append("PosterImageHeight", posterHeight);
   _kept.writeInto(record);
   return record;
 }

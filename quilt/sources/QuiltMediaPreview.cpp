@@ -132,6 +132,16 @@ std::string QuiltMediaPreview::pathIn(const std::shared_ptr<QuiltMediaSource>& s
                {"previews", platform::withExtension(position == kNoIndex ? uuid() : std::to_string(position), "jpg")});
 }
 
+void QuiltMediaPreview::takePicture(const QuiltMediaPreview& made) {
+  setImage(made._image.get());
+  setWidth(made.width());
+  setHeight(made.height());
+  setIsFlattened(false);
+  if (!title()) setTitle(made.title());
+  if (!content()) setContent(made.content());
+  if (timecode() == kNoTimecode) setTimecode(made.timecode());
+}
+
 bool QuiltMediaPreview::hasPicture() const {
   const Path file = path();
   if (file.empty()) return isFlattened() || _image.get();

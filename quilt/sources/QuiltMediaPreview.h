@@ -64,6 +64,8 @@ class QUILT_EXPORT QuiltMediaPreview : public platform::Object {
 
   /// Where the picture lies in the package: index (or identity) and "jpg"; empty without a place in a document.
   Path path() const;
+  /// Takes the picture of one that was made anew, still to be written, and its texts and time where this one has none.
+  void takePicture(const QuiltMediaPreview& made);
   /// Whether there is a picture: one that is still to be written, or a file at the path.
   bool hasPicture() const;
   /// Whether its source may make it again of its main derivative: it made it, or it was read from a record. What a host

@@ -231,7 +231,7 @@ class QUILT_EXPORT QuiltMediaSource : public platform::Object {
   void readAudioSamples(Dictionary& record, UnusedEntries& unused);
   struct PreviewContent;
   std::shared_ptr<QuiltMediaPreview> existingPreview(std::size_t index) const;
-  std::shared_ptr<QuiltMediaPreview> usablePreview(std::size_t index);
+  std::shared_ptr<QuiltMediaPreview> usablePreview(std::size_t index) const;
   std::shared_ptr<QuiltMediaPreview> makePreview(const PreviewContent& content, std::size_t index);
   void renewLostPreviews(const ContinueBlock& goesOn);
   void readPreviewsFromPackage();

@@ -149,12 +149,9 @@ std::shared_ptr<QuiltMediaPreview> QuiltMediaSource::existingPreview(std::size_t
   return _previews.first([index](const auto& preview) { return preview->index() == index; });
 }
 
-std::shared_ptr<QuiltMediaPreview> QuiltMediaSource::usablePreview(std::size_t index) {
+std::shared_ptr<QuiltMediaPreview> QuiltMediaSource::usablePreview(std::size_t index) const {
   auto preview = existingPreview(index);
-  if (!preview || preview->hasPicture()) return preview;
-  // Recorded and never written, because the process ended before it could be; or its file is gone. It is made again.
-  removePreview(preview);
-  return nullptr;
+  return preview && preview->hasPicture() ? preview : nullptr;
 }
 
 void QuiltMediaSource::flattenPreviews() {
@@ -173,12 +170,19 @@ std::shared_ptr<QuiltMediaPreview> QuiltMediaSource::previewAtIndex(std::size_t 
 
 std::shared_ptr<QuiltMediaPreview> QuiltMediaSource::makePreview(const PreviewContent& content, std::size_t index) {
   if (_previewsLeftOut.contains(index)) return nullptr;
+  // Recorded and never written, because the process ended before it could be; or its file is gone.
+  const auto lost = existingPreview(index);
   const auto made = content.makePreview(index);
   if (!made) {
-    if (cannotBeDrawn(made.error())) leaveOutPreview(index, made.error());
+    if (cannotBeDrawn(made.error())) {
+      leaveOutPreview(index, made.error());
+    } else if (lost) {
+      removePreview(lost);
+    }
     return nullptr;
   }
-  const auto& preview = *made;
+  const auto& preview = lost ? lost : *made;
+  if (lost) lost->takePicture(**made);
   preview->setIndex(index);
   preview->setIsRenewable(true);
   // The file before the record that names it. Of a file outside, the picture is written with the copy of that file.
@@ -190,7 +194,11 @@ std::shared_ptr<QuiltMediaPreview> QuiltMediaSource::makePreview(const PreviewCo
       return nullptr;
     }
   }
-  addPreview(preview);
+  if (lost) {
+    updateDocumentUnlessProcessing();
+  } else {
+    addPreview(preview);
+  }
   return preview;
 }
 

@@ -288,13 +288,12 @@ TEST_F(BuildCommandTest, EveryMissingOrUnsupportedFileIsToldWithItsPlace) {
   EXPECT_EQ("", run.out);
 }
 
-TEST_F(BuildCommandTest, WarningsNameTheFileAsTheAuthorKnowsIt) {
-  const fs::path damaged = folder() / "empty.pdf";
-  write(damaged, makePdf({"<< /Type /Catalog /Pages 2 0 R >>", "<< /Type /Pages /Kids [] /Count 0 >>"}));
+TEST_F(BuildCommandTest, ADocumentWithoutPagesIsRefusedByTheNameThatTheAuthorGaveIt) {
+  write(folder() / "empty.pdf", makePdf({"<< /Type /Catalog /Pages 2 0 R >>", "<< /Type /Pages /Kids [] /Count 0 >>"}));
   const Ended run =
       quilt({"build", manifest({{"title", "A talk"}, {"media", {{{"source", "empty.pdf"}}}}}), "--output", out()});
-  EXPECT_EQ(0, run.exit) << run.err;
-  EXPECT_THAT(run.err, HasSubstr("Pages of document at path \"" + damaged.string() + "\" cannot be shown"));
+  EXPECT_EQ(4, run.exit);
+  EXPECT_THAT(run.err, HasSubstr("at media[0].source: Cannot use \"empty.pdf\": The document is damaged"));
 }
 
 TEST_F(BuildCommandTest, AFileThatIsMissingIsNotFound) {

@@ -64,7 +64,7 @@ TEST_F(DocumentationTest, NoLineOfAManualIsTakenForARequestByAccident) {
 TEST_F(DocumentationTest, BashCompletesCommandsOptionsAndChoices) {
   EXPECT_EQ("import info\n", completed("quilt i"));
   EXPECT_EQ("export\n", completed("quilt --library /tmp ex"));
-  EXPECT_EQ("--format\n", completed("quilt export --fo"));
+  EXPECT_EQ("--format\n", completed("quilt export --form"));
   EXPECT_EQ("720p\n", completed("quilt export Talk out --format 7"));
   EXPECT_EQ("auto json none\n", completed("quilt --progress ''"));
   EXPECT_EQ("collection document\n", completed("quilt new ''"));

@@ -186,7 +186,7 @@ TEST(OptionsTest, EveryCommandIsFoundByItsNameAndHasAUsageLine) {
     EXPECT_EQ(&command, findCommand(command.name));
     EXPECT_THAT(usageOf(command), HasSubstr("quilt " + std::string(command.name)));
   }
-  EXPECT_EQ("quilt export DOCUMENT DIR [--zip] [--format FORMAT]... [--theme THEME] [--dry-run]",
+  EXPECT_EQ("quilt export DOCUMENT DIR [--zip] [--format FORMAT]... [--theme THEME] [--force] [--dry-run]",
             usageOf(*findCommand("export")));
 }
 

@@ -156,7 +156,7 @@ TEST_F(QuiltMediaPreviewTest, APreviewThatWasRecordedButNeverWrittenIsMadeAgain)
   source->addPreview(recorded);
   const auto preview = source->previewAtIndex(0);
   ASSERT_NE(preview, nullptr);
-  EXPECT_NE(preview, recorded);
+  EXPECT_EQ(preview, recorded) << "with all that its record held";
   EXPECT_NE(preview->image(), nullptr);
   EXPECT_THAT(source->previews(), ElementsAre(preview));
 }
