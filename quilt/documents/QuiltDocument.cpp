@@ -166,8 +166,9 @@ std::string QuiltDocument::displayTitle() const {
 
 void QuiltDocument::setPath(Path path) {
   const Path before = this->path();
-  _path.set(path);
-  if (!before.empty() && !path.empty() && before != path) followPackage(before, path);
+  const Path after = path;
+  _path.set(std::move(path));
+  if (!before.empty() && !after.empty() && before != after) followPackage(before, after);
 }
 
 void QuiltDocument::followPackage(const Path& from, const Path& to) {

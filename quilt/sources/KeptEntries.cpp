@@ -69,7 +69,8 @@ void UnusedEntries::keepElement(std::string key, std::size_t place, PropertyList
 
 void UnusedEntries::keepRest(std::span<const RecordKey> keys, const Dictionary& record) {
   for (const auto& [key, value] : record) {
-    const auto known = std::find_if(keys.begin(), keys.end(), [&key](const RecordKey& one) { return one.name == key; });
+    const auto known =
+        std::find_if(keys.begin(), keys.end(), [&key = key](const RecordKey& one) { return one.name == key; });
     if (known == keys.end()) {
       unknown.append(key, value);
     } else if (!fits(record, key, known->kind)) {

@@ -255,7 +255,7 @@ std::vector<Operation> LibraryTeller::ownOperations() {
     story.step("", [this] { return doneIf(_controller->update(), "the library is not saved"); });
     return true;
   };
-  const auto flatten = [this, document](Story& story) {
+  const auto flatten = [document](Story& story) {
     Document* one = story.anyDocument(hasItems);
     if (!one) return false;
     story.step(one->title, [&] { return doneIf(document(*one)->flattenWithProgressionBlock({}), "flatten fails"); });
@@ -329,7 +329,7 @@ std::vector<Operation> LibraryTeller::ownOperations() {
       std::thread other(exportOne, 1);
       exportOne(0);
       other.join();
-      for (std::size_t index : {0, 1})
+      for (const std::size_t index : {std::size_t{0}, std::size_t{1}})
         if (!fs::is_regular_file(made[index]) ||
             materialWith(support::readBytes(made[index])) != one->items[index].sources[0])
           return doneIf(false, "they write over each other");
