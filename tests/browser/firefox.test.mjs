@@ -218,10 +218,18 @@ describe('in Firefox', {skip: existsSync(kProgram) ? false : `${kProgram} is not
     await firefox.evaluate(() => {
       document.querySelectorAll('.card a')[317].scrollIntoView({block: 'center', behavior: 'instant'});
     });
-    await new Promise((resolve) => setTimeout(resolve, 300));
     const place = () =>
       firefox.evaluate(() => Math.round(document.querySelectorAll('.card a')[317].getBoundingClientRect().top));
-    const before = await place();
+    // Pictures that come in above move what is below: the place counts once it stays.
+    const settled = async () => {
+      for (let last = await place(), tries = 0; ; ++tries) {
+        await new Promise((resolve) => setTimeout(resolve, 400));
+        const now = await place();
+        if (now === last || tries === 20) return now;
+        last = now;
+      }
+    };
+    const before = await settled();
     await firefox.evaluate(() => {
       document.querySelectorAll('.card a')[317].click();
     });
@@ -230,8 +238,8 @@ describe('in Firefox', {skip: existsSync(kProgram) ? false : `${kProgram} is not
       history.back();
     });
     await firefox.until(() => document.querySelectorAll('.card').length === 500);
-    await new Promise((resolve) => setTimeout(resolve, 300));
-    assert.ok(Math.abs((await place()) - before) <= 2, `${before} → ${await place()}`);
+    const after = await settled();
+    assert.ok(Math.abs(after - before) <= 2, `${before} → ${after}`);
     assert.equal(await firefox.evaluate(() => document.activeElement.textContent.includes('Lesson 318')), true);
   });
 

@@ -204,13 +204,27 @@
       find(left.focus)?.querySelector('a').focus({preventScroll: true});
       const scroll = () => {
         const by = anchor ? anchor.getBoundingClientRect().top - left.top : left.scroll - scrollY;
-        if (Math.abs(by) > 0.5 && this.cards.isConnected) scrollBy({top: by, behavior: 'instant'});
+        const isOff = Math.abs(by) > 0.5 && this.cards.isConnected;
+        if (isOff) scrollBy({top: by, behavior: 'instant'});
+        return isOff;
+      };
+      // Cards get their heights as they are drawn, and a browser may scroll by itself after a step back: until nothing
+      // has moved for a while, or the reader moves the page.
+      const kStillFrames = 30;
+      let still = 0;
+      const stop = () => {
+        still = kStillFrames;
+      };
+      for (const kind of ['wheel', 'touchstart', 'pointerdown', 'keydown']) {
+        addEventListener(kind, stop, {once: true, passive: true});
+      }
+      const settle = () => {
+        if (still >= kStillFrames || !this.cards.isConnected) return;
+        still = scroll() ? 0 : still + 1;
+        requestAnimationFrame(settle);
       };
       scroll();
-      requestAnimationFrame(() => {
-        scroll();
-        requestAnimationFrame(scroll);
-      });
+      requestAnimationFrame(settle);
     }
   }
 
