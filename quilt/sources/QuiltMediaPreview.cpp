@@ -133,7 +133,9 @@ bool QuiltMediaPreview::flatten() {
                            file.parent_path(), created.error());
     return false;
   }
-  if (!isInsidePackage(file, documentOf(sourceOwner()), "source preview")) return false;
+  const auto document = documentOf(sourceOwner());
+  if (!isInsidePackage(file, document, "source preview")) return false;
+  if (document) document->willMakeItem(file);
   if (!picture->saveAsJPGAtPath(file)) return false;
   setIsFlattened(true);
   return true;
