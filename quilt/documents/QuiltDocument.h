@@ -288,6 +288,8 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
 
  private:
   bool isShownByFile();
+  /// For a poster that has no file: what it is read from may go. One that cannot be drawn gives way to the placeholder.
+  void keepPosterInMemory(const std::shared_ptr<ImageWrapper>& poster);
   Path inPackage(std::initializer_list<const char*> components) const;
   /// The title, or the fall-back for a missing or empty one.
   std::string displayTitle() const;

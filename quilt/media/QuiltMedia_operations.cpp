@@ -94,6 +94,7 @@ bool QuiltMedia::flattenChildren(const ProgressionBlock& block) {
     return extra->isFlattened() || flatten(*extra, step++, "Failed to flatten extra \"%@\"");
   });
   if (!extrasDone) return false;
+  savePosterIfMissing();
   report(block, 100);
   return true;
 }
@@ -126,6 +127,7 @@ bool QuiltMedia::finalizeChildren(const ProgressionBlock& block) {
       !makeFolderInPackage(extrasFolderPath(), document, kNoExtrasFolder))
     return false;
   posterImage();  // writes the poster into the package
+  savePosterIfMissing();
 
   // Every source reports into the first step.
   const bool sourcesDone = _sources.walk([&](const auto& source) {

@@ -101,6 +101,10 @@ platform::Result<double> megaBytesOfFile(const Path& path) {
   return looks.sizes.emplace(path.native(), measured(path)).first->second;
 }
 
+bool cannotBeDrawn(const platform::Error& error) {
+  return error.kind == platform::ErrorKind::Damaged || error.kind == platform::ErrorKind::Unsupported;
+}
+
 std::string fileNameForTitle(const std::string& title) {
   constexpr std::size_t longest = 200;
   std::string name = title;

@@ -56,6 +56,10 @@ class OneLookAtEachFile {
   ~OneLookAtEachFile();
 };
 
+/// Whether a picture was not written because of what it is, and not because of where it was to be written: the same
+/// attempt would fail again.
+bool cannotBeDrawn(const platform::Error& error);
+
 /// A title as the base of a file name: "." becomes "_" and "/" becomes "-". Cut, between characters, to leave room for
 /// a counter and an extension in a file name's 255 bytes.
 std::string fileNameForTitle(const std::string& title);

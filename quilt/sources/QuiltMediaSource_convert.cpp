@@ -105,16 +105,33 @@ bool QuiltMediaSource::convertImage(const std::string& format) {
     }
     return false;
   }
-  const Path file = newHiddenFile("png");
-  return !file.empty() && scaled->saveAsPNGAtURL(Url::fileUrl(file)) && adoptConverted(file, format);
+  constexpr const char* notWritten = "Failed to write converted image of \"%@\": \"%@\"";
+  const auto file = newHiddenFile("png");
+  if (!file) {
+    FDYLogger::logCritical(notWritten, url, file.error());
+    return false;
+  }
+  const auto saved = scaled->saveAsPNGAtURL(Url::fileUrl(*file));
+  if (saved) return adoptConverted(*file, format);
+  if (!cannotBeDrawn(saved.error())) {
+    FDYLogger::logCritical(notWritten, url, saved.error());
+    return false;
+  }
+  // There is no smaller picture of what cannot be drawn: the file itself has to do for every format.
+  leaveOutPreview(0, saved.error());
+  auto tags = main->compatibilityTags().value_or(std::vector<std::string>());
+  tags.push_back(format);
+  main->setCompatibilityTags(std::move(tags));
+  return true;
 }
 
 bool QuiltMediaSource::convertAudio(const std::string& format, const ProgressionBlock& block) {
   const auto url = previewItemURL();
-  const Path file = newHiddenFile("m4a");
-  if (!url || file.empty()) return false;
-  const auto made = services().transcoder->transcodeToAudio(*url, Url::fileUrl(file), stopWhenCancelled(block));
-  if (made) return adoptConverted(file, format);
+  if (!url) return false;
+  const auto file = newHiddenFile("m4a");
+  const auto made = file ? services().transcoder->transcodeToAudio(*url, Url::fileUrl(*file), stopWhenCancelled(block))
+                         : platform::Result<void>(file.error());
+  if (made) return adoptConverted(*file, format);
   FDYLogger::logCritical("Failed to convert file at URL \"%@\" to audio: \"%@\"", url, made.error());
   return false;
 }
@@ -129,16 +146,23 @@ bool QuiltMediaSource::convertMovie(const std::string& format, const Progression
     return true;
   }
   const auto url = main->url();
-  const Path file = newHiddenFile("m4v");
-  if (!url || file.empty()) return false;
+  if (!url) return false;
+  // The line names HD for both sizes.
+  constexpr const char* notConverted = "Failed to convert video at URL \"%@\" to HD: \"%@\"";
+  const auto file = newHiddenFile("m4v");
+  if (!file) {
+    FDYLogger::logCritical(notConverted, url, file.error());
+    return false;
+  }
   auto& transcoder = *services().transcoder;
-  const Url destination = Url::fileUrl(file);
+  const Url destination = Url::fileUrl(*file);
 
   // Decoding a movie once for both grades takes a good deal less time than twice.
   const std::string other = format == k720p ? k480p : k720p;
   const bool isOtherNext = std::find(followedBy.begin(), followedBy.end(), other) != followedBy.end();
   Path otherFile;
-  if (isOtherNext && !derivativeWithFormat(other) && isBetter(*main, other)) otherFile = newHiddenFile("m4v");
+  if (isOtherNext && !derivativeWithFormat(other) && isBetter(*main, other))
+    if (const auto second = newHiddenFile("m4v")) otherFile = *second;
 
   const auto transcode = [&, stop = stopWhenCancelled(block)] {
     const bool isHigh = format == k720p;
@@ -151,11 +175,10 @@ bool QuiltMediaSource::convertMovie(const std::string& format, const Progression
   };
   const auto made = transcode();
   if (!made) {
-    // The line names HD for both sizes.
-    FDYLogger::logCritical("Failed to convert video at URL \"%@\" to HD: \"%@\"", url, made.error());
+    FDYLogger::logCritical(notConverted, url, made.error());
     return false;
   }
-  if (!adoptConverted(file, format)) return false;
+  if (!adoptConverted(*file, format)) return false;
   // Whoever asks for the other one then learns whether it is there.
   if (!otherFile.empty()) adoptConverted(otherFile, other);
   return true;
@@ -163,7 +186,10 @@ bool QuiltMediaSource::convertMovie(const std::string& format, const Progression
 
 bool QuiltMediaSource::adoptConverted(const Path& file, const std::string& format) {
   const auto derivative = QuiltMediaDerivative::initWithPath(file);
-  if (!derivative) return false;
+  if (!derivative) {
+    FDYLogger::logCritical("Failed to use the converted file at path \"%@\": \"It cannot be read\"", file);
+    return false;
+  }
   auto tags = derivative->compatibilityTags().value_or(std::vector<std::string>());
   tags.push_back(format);
   derivative->setCompatibilityTags(std::move(tags));
@@ -173,9 +199,10 @@ bool QuiltMediaSource::adoptConverted(const Path& file, const std::string& forma
   return false;
 }
 
-Path QuiltMediaSource::newHiddenFile(const std::string& extension) const {
+platform::Result<Path> QuiltMediaSource::newHiddenFile(const std::string& extension) const {
   const Path folder = derivativesFolderPath();
-  if (folder.empty() || !createDirectoryInPackage(folder, document())) return {};
+  if (folder.empty()) return platform::Error{platform::ErrorKind::NotFound, "The source is not in a document.", {}};
+  if (const auto created = createDirectoryInPackage(folder, document()); !created) return created.error();
   Path file;
   do {
     file = folder / platform::withExtension("." + platform::generateUUID(), extension);
