@@ -247,12 +247,13 @@ Dictionary QuiltDocument::dictionary() {
 }
 
 bool QuiltDocument::writeProperties() {
-  // First, and also without a file to write to: the record gives an untitled document its title.
+  // Before the record is built: what comes back into the package is measured.
+  const Path package = path();
+  _changes->begin(package);
+  // Also without a file to write to: the record gives an untitled document its title.
   const Dictionary record = dictionary();
   const Path file = propertiesPath();
   if (file.empty()) return false;
-  const Path package = path();
-  _changes->begin(package);
   if (!services().propertyLists->writeDictionary(record, file)) {
     _changes->notRecorded(package);
     return false;
