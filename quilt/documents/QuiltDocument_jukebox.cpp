@@ -1,6 +1,4 @@
 // SPDX-License-Identifier: Apache-2.0
-#include <charconv>
-
 #include "quilt/collections/QuiltCollection.h"
 #include "quilt/documents/QuiltDocument.h"
 #include "quilt/platform/interfaces/Services.h"
@@ -8,20 +6,6 @@
 namespace quilt {
 
 using platform::services;
-
-namespace {
-
-std::int64_t yearOf(Date date) {
-  const platform::DateFormatter& dates = *services().dates;
-  // The second one reads in every language: some write the first with digits of their own.
-  for (const std::string& text : {dates.format(date, "y"), dates.description(date)}) {
-    std::int64_t year = 0;
-    if (std::from_chars(text.data(), text.data() + text.size(), year).ec == std::errc()) return year;
-  }
-  return 0;
-}
-
-}  // namespace
 
 Dictionary QuiltDocument::jukeboxMetadata() const {
   const auto collection = collectionOwner();
@@ -53,7 +37,7 @@ Dictionary QuiltDocument::jukeboxMetadata() const {
   metadata.append("sort-album-status", 1);
   if (const auto date = modifiedDate()) {
     metadata.append("releaseDate", services().dates->description(*date));
-    metadata.append("year", yearOf(*date));
+    metadata.append("year", services().dates->gregorianYear(*date));
   }
   metadata.append("genre", "Podcast");
   metadata.append("kind", "podcast");

@@ -3,6 +3,7 @@
 
 #include "quilt/collections/QuiltCollection.h"
 #include "quilt/documents/QuiltDocument.h"
+#include "quilt/platform/text/IcuDateFormatter.h"
 #include "tests/support/DocumentFixture.h"
 #include "tests/support/PlistByPython.h"
 
@@ -13,17 +14,6 @@ using platform::ScopedService;
 using platform::Services;
 using support::dateOf;
 using ::testing::ElementsAre;
-
-/// Dates of a user whose digits are not those of the program.
-class ArabicDates final : public platform::DateFormatter {
- public:
-  std::string format(Date, std::string_view) const override { return "\xD9\xA2\xD9\xA0\xD9\xA1\xD9\xA0"; }
-  std::string shortDescription(Date) const override { return ""; }
-  std::string description(Date date) const override { return _target->description(date); }
-
- private:
-  const std::shared_ptr<platform::DateFormatter> _target = platform::services().dates;
-};
 
 class QuiltDocumentJukeboxTest : public support::DocumentFixture {
  protected:
@@ -131,10 +121,12 @@ TEST_F(QuiltDocumentJukeboxTest, TheStatusValuesAreIntegersAndThePodcastFlagIsAB
   EXPECT_TRUE(*metadata.find("is-podcast")->as<bool>());
 }
 
-TEST_F(QuiltDocumentJukeboxTest, TheYearIsANumberWhateverTheUsersDigits) {
+TEST_F(QuiltDocumentJukeboxTest, TheYearIsTheStoresWhateverTheUsersCalendarAndDigits) {
   document()->setModifiedDate(dateOf("2010-05-01T12:00:00Z"));
-  const ScopedService dates(&Services::dates, std::make_shared<ArabicDates>());
-  EXPECT_EQ(*metadataOf(*document()).find("year"), platform::PropertyList(2010));
+  for (const char* language : {"ar_EG", "th_TH", "fa_IR"}) {
+    const ScopedService dates(&Services::dates, std::make_shared<platform::IcuDateFormatter>(language));
+    EXPECT_EQ(*metadataOf(*document()).find("year"), platform::PropertyList(2010)) << language;
+  }
 }
 
 TEST_F(QuiltDocumentJukeboxTest, TheFileIsThisToTheByte) {

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <cstdint>
+#include <cstdlib>
 #include <string>
 #include <string_view>
 
@@ -20,6 +22,11 @@ class QUILT_EXPORT DateFormatter {
   [[nodiscard]] virtual std::string shortDescription(Date date) const = 0;
   /// "2010-05-01 12:00:00 +0000", in UTC.
   [[nodiscard]] virtual std::string description(Date date) const = 0;
+  /// The year of the Gregorian calendar, whichever one the user's language counts by, in the user's time zone; unless
+  /// a formatter knows that zone, in UTC.
+  [[nodiscard]] virtual std::int64_t gregorianYear(Date date) const {
+    return std::strtoll(description(date).c_str(), nullptr, 10);
+  }
 };
 
 }  // namespace quilt::platform
