@@ -11,6 +11,7 @@
 #include <string_view>
 #include <type_traits>
 #include <utility>
+#include <variant>
 #include <vector>
 
 #include "quilt/scripting/Accessor.h"
@@ -20,7 +21,13 @@ namespace quilt::scripting {
 /// What the tables of the classes are written with.
 namespace table {
 
+/// A number that is an integer or a real one, as the case may be.
+using Number = std::variant<std::int64_t, double>;
+
 inline Value valueOf(std::string text) { return text; }
+inline Value valueOf(const Number& number) {
+  return std::visit([](const auto& value) { return Value(value); }, number);
+}
 inline Value valueOf(const std::filesystem::path& path) { return path.empty() ? Value() : Value(path.native()); }
 inline Value valueOf(std::int32_t number) { return std::int64_t{number}; }
 inline Value valueOf(double number) { return number; }
@@ -39,7 +46,7 @@ constexpr Answer answerOf() {
   if constexpr (std::is_same_v<T, std::string> || std::is_same_v<T, std::optional<std::string>> ||
                 std::is_same_v<T, std::filesystem::path>) {
     return Answer::Text;
-  } else if constexpr (std::is_arithmetic_v<T>) {
+  } else if constexpr (std::is_arithmetic_v<T> || std::is_same_v<T, Number>) {
     return Answer::Number;
   } else if constexpr (std::is_same_v<T, std::optional<std::vector<std::string>>>) {
     return Answer::Texts;

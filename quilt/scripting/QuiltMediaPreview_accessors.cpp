@@ -10,8 +10,11 @@ using platform::FDYLogger;
 
 namespace {
 
-/// Scripts get sizes in single precision.
-double narrowed(double pixels) { return static_cast<double>(static_cast<float>(pixels)); }
+/// Scripts get sizes in single precision, and an integer 0 without an image.
+Number pixels(const std::shared_ptr<platform::ImageWrapper>& image, double platform::Size::*side) {
+  if (!image) return std::int64_t{0};
+  return static_cast<double>(static_cast<float>(image->size().*side));
+}
 
 }  // namespace
 
@@ -44,14 +47,12 @@ std::span<const Accessor> ofPreview() {
       getter<Self>("cvWidth", "Pixels; 0 when it has no image.",
                    [](Self& preview) {
                      FDYLogger::logDebug("Conveyor is getting width of preview \"%@\"", preview.uuid());
-                     const auto image = preview.image();
-                     return image ? narrowed(image->size().width) : 0.0;
+                     return pixels(preview.image(), &platform::Size::width);
                    }),
       getter<Self>("cvHeight", "Pixels; 0 when it has no image.",
                    [](Self& preview) {
                      FDYLogger::logDebug("Conveyor is getting height of preview \"%@\"", preview.uuid());
-                     const auto image = preview.image();
-                     return image ? narrowed(image->size().height) : 0.0;
+                     return pixels(preview.image(), &platform::Size::height);
                    }),
       getter<Self>("cvPath", "Where its image lies.",
                    [](const Self& preview) {

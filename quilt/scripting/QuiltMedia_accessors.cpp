@@ -10,10 +10,10 @@ using platform::FDYLogger;
 
 namespace {
 
-/// 0 when the item has no poster.
-double pixels(const platform::PropertyList& number) {
+/// An integer 0 when the item has no poster.
+Number pixels(const platform::PropertyList& number) {
   const auto* real = number.as<double>();
-  return real ? *real : 0;
+  return real ? Number(*real) : Number(std::int64_t{0});
 }
 
 }  // namespace

@@ -94,8 +94,9 @@
       }
     }
 
+    // `keepalive`: also when the page is on its way out.
     async close() {
-      await this.#post('close', { session: this.#identity }).catch(() => {});
+      await this.#post('close', { session: this.#identity }, { keepalive: true }).catch(() => {});
       if (this.#stream) this.#stream.abort();
     }
 
@@ -107,11 +108,12 @@
       if (changed) onChange({ type: 'change', object: changed, accessors });
     }
 
-    async #post(name, body) {
+    async #post(name, body, options = {}) {
       const response = await fetch(this.#base + name, {
         method: 'POST',
         headers: this.#headers,
         body: JSON.stringify(body),
+        ...options,
       });
       if (response.ok) return response.json();
       const failure = await failureOf(response);
@@ -227,6 +229,9 @@
   if (typeof module === 'object' && module.exports) {
     module.exports = { connect, Conveyor, ConveyorError };
   } else {
-    Object.assign(globalThis, { Conveyor, ConveyorError, conveyor: connect(location.href) });
+    const conveyor = connect(location.href);
+    Object.assign(globalThis, { Conveyor, ConveyorError, conveyor });
+    // A page that may come back keeps its objects.
+    addEventListener('pagehide', ({ persisted }) => persisted || conveyor.close());
   }
 })();

@@ -27,7 +27,7 @@ class QUILT_EXPORT Bridge {
     http::Limits limits{};                          ///< what one client may take
     std::chrono::milliseconds callTime{10000};      ///< how long a call waits for the main thread
     std::chrono::milliseconds sessionIdle{300000};  ///< how long a session lives without calls and without listening
-    std::size_t sessions = 32;                      ///< at once; more are refused
+    std::size_t sessions = 32;                      ///< at once; a silent one makes room, see docs/bridge.md
     std::size_t objectsPerSession = 50000;          ///< that a client holds; more are refused
   };
 

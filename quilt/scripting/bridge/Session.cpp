@@ -69,10 +69,23 @@ void Session::close() {
 }
 
 std::optional<std::string> Sessions::open() {
-  const std::lock_guard guard(_mutex);
-  if (_sessions.size() >= _maximum) return std::nullopt;
   std::string identity = makeSecret();
-  _sessions.emplace(identity, std::make_shared<Session>(_maximumObjects));
+  std::shared_ptr<Session> givesWay;  // its observations end after the guard
+  {
+    const std::lock_guard guard(_mutex);
+    if (_sessions.size() >= _maximum) {
+      auto oldest = _sessions.end();
+      for (auto entry = _sessions.begin(); entry != _sessions.end(); ++entry)
+        if (!entry->second->isListening() &&
+            (oldest == _sessions.end() || entry->second->lastUse() < oldest->second->lastUse()))
+          oldest = entry;
+      if (oldest == _sessions.end()) return std::nullopt;
+      givesWay = std::move(oldest->second);
+      _sessions.erase(oldest);
+    }
+    _sessions.emplace(identity, std::make_shared<Session>(_maximumObjects));
+  }
+  if (givesWay) givesWay->close();
   return identity;
 }
 

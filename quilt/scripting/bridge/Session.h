@@ -50,6 +50,8 @@ class Session {
 
   void close();
   void touch() { _lastUse = Clock::now(); }
+  [[nodiscard]] bool isListening() const { return _isStreaming; }
+  [[nodiscard]] Clock::time_point lastUse() const { return _lastUse; }
   /// Neither used nor listening for this long.
   [[nodiscard]] bool isIdle(std::chrono::milliseconds forThisLong) const {
     return !_isStreaming && Clock::now() - _lastUse.load() > forThisLong;
@@ -89,7 +91,8 @@ class Sessions {
   Sessions(std::size_t maximum, std::size_t maximumObjects, std::chrono::milliseconds idle)
       : _maximum(maximum), _maximumObjects(maximumObjects), _idle(idle) {}
 
-  /// The identity of a new one; none when there are as many as may be.
+  /// The identity of a new one. When there are as many as may be, the one that listens for nothing and was used longest
+  /// ago gives way; none when all of them listen.
   std::optional<std::string> open();
   /// Null when there is none. Counts as a use.
   std::shared_ptr<Session> find(std::string_view identity) const;
