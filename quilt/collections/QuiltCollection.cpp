@@ -7,6 +7,7 @@
 #include <new>
 
 #include "quilt/collections/QuiltCollectionsController.h"
+#include "quilt/platform/base/CleanUp.h"
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/interfaces/Services.h"
 
@@ -120,6 +121,7 @@ bool QuiltCollection::hasBeenModified() const {
 }
 
 void QuiltCollection::resetModifiedDate() {
+  const platform::Uninterrupted whole;
   setModifiedDate(creationDate());
   update();
 }
@@ -133,6 +135,12 @@ bool QuiltCollection::loadDictionary() {
     return false;
   }
   const Dictionary& record = *read;
+  platform::withCleanUp([&] { apply(record); }, [this] { setIsLoading(false); });
+  return true;
+}
+
+void QuiltCollection::apply(const Dictionary& record) {
+  const platform::Uninterrupted whole;
   setIsLoading(true);
   if (const Text uuid = record.string("UUID")) setUuid(*uuid);
   if (const auto date = record.date("CreationDate")) setCreationDate(date);
@@ -148,11 +156,10 @@ bool QuiltCollection::loadDictionary() {
     if (auto theme = QuiltTheme::initWithPath(*themePath)) setPreferredTheme(std::move(theme));
   if (const Text text = record.string("LastPublishURL")) setLastPublishURL(text);
   _unknownEntries.store(platform::entriesBeyond(kRecordKeys, record));
-  setIsLoading(false);
-  return true;
 }
 
 bool QuiltCollection::_loadDocuments() {
+  const platform::Uninterrupted whole;
   const Path folder = path();
   if (folder.empty()) {
     FDYLogger::logCritical("Failed to load collection: \"Collection path is invalid\"");
@@ -197,6 +204,7 @@ Dictionary QuiltCollection::dictionary() const {
 
 bool QuiltCollection::update() {
   if (isLoading()) return true;
+  const platform::Uninterrupted whole;
   setModifiedDate(services().clock->now());
 
   const Path file = _collectionFilepath();
@@ -223,6 +231,7 @@ bool QuiltCollection::update() {
 }
 
 void QuiltCollection::invalidateCaches() {
+  const platform::Uninterrupted whole;
   _documents.walk([](const std::shared_ptr<QuiltDocument>& document) {
     document->invalidateCaches();
     return true;
@@ -245,6 +254,7 @@ std::shared_ptr<ImageWrapper> QuiltCollection::posterImage() {
 }
 
 void QuiltCollection::setPosterImage(const std::shared_ptr<ImageWrapper>& image) {
+  const platform::Uninterrupted whole;
   willChangeValueForKey("posterImage");
   {
     const std::lock_guard guard(_posterMutex);

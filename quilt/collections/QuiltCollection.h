@@ -152,6 +152,8 @@ class QUILT_EXPORT QuiltCollection : public platform::Object {
 
  private:
   void saveWhenChanged();
+  /// Sets what the record names, while isLoading is true.
+  void apply(const Dictionary& record);
   /// A place in the folder; empty without one.
   Path inFolder(const std::string& name) const;
   /// Where the package of that identity belongs; empty without a folder or for an identity that is no plain name.

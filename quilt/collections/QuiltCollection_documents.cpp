@@ -2,6 +2,7 @@
 #include <algorithm>
 
 #include "quilt/collections/QuiltCollection.h"
+#include "quilt/platform/base/CleanUp.h"
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/base/Paths.h"
 #include "quilt/platform/interfaces/Services.h"
@@ -17,8 +18,9 @@ namespace {
 
 constexpr const char* kCannotCreate = "Failed to create a new empty document at path \"%@\"";
 
-bool contains(const std::vector<std::string>& list, const std::string& text) {
-  return std::find(list.begin(), list.end(), text) != list.end();
+template <class Item>
+bool contains(const std::vector<Item>& list, const Item& item) {
+  return std::find(list.begin(), list.end(), item) != list.end();
 }
 
 /// The type of a document that wraps a file of an importable type; `unchanged` when nothing tells.
@@ -99,6 +101,7 @@ void QuiltCollection::addDocument(const std::shared_ptr<QuiltDocument>& document
 
 void QuiltCollection::removeDocument(const std::shared_ptr<QuiltDocument>& document, bool andDelete) {
   if (!document) return;
+  const platform::Uninterrupted whole;
   const platform::MonitorLock lock = _documents.lock();
   if (andDelete) deletePackage(document->path());
   _documents.remove(document);
@@ -112,11 +115,13 @@ void QuiltCollection::deletePackage(const Path& package) const {
 }
 
 void QuiltCollection::removeAllDocumentsAndDelete(bool andDelete) {
+  const platform::Uninterrupted whole;
   const platform::MonitorLock lock = _documents.lock();
   for (const auto& document : documents()) removeDocument(document, andDelete);
 }
 
 void QuiltCollection::removeAllBrokenDocuments() {
+  const platform::Uninterrupted whole;
   const platform::MonitorLock lock = _documents.lock();
   for (const auto& document : documents())
     if (document->isClassic() && document->mediaCount() == 0) removeDocument(document, !recordNamesMedia(*document));
@@ -130,6 +135,7 @@ Path QuiltCollection::packagePath(const std::string& uuid) const {
 }
 
 std::shared_ptr<QuiltDocument> QuiltCollection::newDocumentWithType(const Text& type) {
+  const platform::Uninterrupted whole;
   const Path package = packagePath(platform::generateUUID());
   const auto document = package.empty() ? nullptr : QuiltDocument::initWithPath(package);
   if (!document) {
@@ -168,6 +174,10 @@ std::shared_ptr<QuiltDocument> QuiltCollection::importDocumentFromPath(const Pat
     return fail();
   };
   if (!document) return fail();
+  const platform::OnException discardDocument([&] {
+    if (contains(documents(), document)) removeDocument(document, isNewPackage);
+    if (isNewPackage) (void)services().files->removeItem(package, this->path());
+  });
 
   const Text identifier = platform::FDYTypePreferredIdentifier(path);
   if (identifier && contains(QuiltDocument::allSupportedImportUTIs(), *identifier)) {

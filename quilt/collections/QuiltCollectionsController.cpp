@@ -3,6 +3,7 @@
 
 #include <algorithm>
 
+#include "quilt/platform/base/CleanUp.h"
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/base/Paths.h"
 #include "quilt/platform/interfaces/Services.h"
@@ -32,7 +33,25 @@ Path QuiltCollectionsController::_collectionsDirectory() const {
 bool QuiltCollectionsController::loadLibraryPath(const Path& path,
                                                  const ObjectProgressionBlock<QuiltCollection>& withProgressionBlock) {
   // The exchange lets one of two threads pass; the look before it keeps a refused load from announcing anything.
-  if (loadingCollections() || _loadingCollections.exchange(true)) return false;
+  if (loadingCollections()) return false;
+  bool isOurs = false;
+  // A library that cannot be listed refuses every later load.
+  bool mayLoadAgain = true;
+  return platform::withCleanUp(
+      [&] {
+        {
+          const platform::Uninterrupted whole;
+          isOurs = !_loadingCollections.exchange(true);
+        }
+        return isOurs && loadCollections(path, withProgressionBlock, mayLoadAgain);
+      },
+      [&] {
+        if (isOurs && mayLoadAgain) setLoadingCollections(false);
+      });
+}
+
+bool QuiltCollectionsController::loadCollections(const Path& path, const ObjectProgressionBlock<QuiltCollection>& block,
+                                                 bool& mayLoadAgain) {
   FDYLogger::logDebug("Loading collections at path \"%@\"...", path);
   setLibraryPath(path);
   _collections.assign({});
@@ -45,7 +64,7 @@ bool QuiltCollectionsController::loadLibraryPath(const Path& path,
 
   const Result<std::vector<std::string>> listing = files.contentsOfDirectoryAtPath(directory);
   if (!listing) {
-    // The loading flag stays set: a library that cannot be listed refuses every later load.
+    mayLoadAgain = false;
     FDYLogger::logCritical("Failed to load collections in directory \"%@\": \"%@\"", directory, listing.error());
     return false;
   }
@@ -56,30 +75,29 @@ bool QuiltCollectionsController::loadLibraryPath(const Path& path,
     if (!isVisible(name)) continue;
     const auto collection = QuiltCollection::initWithPath(directory / name);
     addCollection(collection);
-    if (!platform::report(withProgressionBlock, collection, platform::integerPercentage(++done, total))) {
+    if (!platform::report(block, collection, platform::integerPercentage(++done, total))) {
       FDYLogger::logCritical("Loading collections at path \"%@\" has been cancelled", path);
-      setLoadingCollections(false);
       return false;
     }
   }
-  platform::report(withProgressionBlock, std::shared_ptr<QuiltCollection>(), 100);
-  setLoadingCollections(false);
+  platform::report(block, std::shared_ptr<QuiltCollection>(), 100);
   return true;
 }
 
 bool QuiltCollectionsController::update() {
-  if (loadingCollections() || isUpdating() || _isUpdating.exchange(true)) return false;
-  const bool hasLibrary = !libraryPath().empty();
-  if (hasLibrary) {
-    _collections.walk([](const std::shared_ptr<QuiltCollection>& collection) {
+  if (loadingCollections()) return false;
+  const auto updateAll = [this] {
+    const platform::Uninterrupted whole;
+    if (libraryPath().empty()) {
+      FDYLogger::logCritical("Failed to update collections because there is no library path available");
+      return false;
+    }
+    return _collections.walk([](const std::shared_ptr<QuiltCollection>& collection) {
       collection->update();
       return true;
     });
-  } else {
-    FDYLogger::logCritical("Failed to update collections because there is no library path available");
-  }
-  setIsUpdating(false);
-  return hasLibrary;
+  };
+  return platform::whileSet(_isUpdating, updateAll).value_or(false);
 }
 
 std::shared_ptr<QuiltCollection> QuiltCollectionsController::collectionWithUUID(const std::string& uuid) const {
@@ -99,6 +117,7 @@ void QuiltCollectionsController::addCollection(const std::shared_ptr<QuiltCollec
 void QuiltCollectionsController::removeCollection(const std::shared_ptr<QuiltCollection>& collection,
                                                   bool andDeleteDocuments) {
   if (!collection) return;
+  const platform::Uninterrupted whole;
   const platform::MonitorLock lock = _collections.lock();
   collection->removeAllDocumentsAndDelete(andDeleteDocuments);
   if (andDeleteDocuments) deleteFolder(collection->path());
@@ -113,6 +132,7 @@ void QuiltCollectionsController::deleteFolder(const Path& folder) const {
 }
 
 std::shared_ptr<QuiltCollection> QuiltCollectionsController::newCollectionWithUUID(const Text& uuid) {
+  const platform::Uninterrupted whole;
   const std::string name = uuid ? *uuid : platform::generateUUID();
   const Path directory = _collectionsDirectory();
   const Path folder = directory.empty() ? directory : directory / name;

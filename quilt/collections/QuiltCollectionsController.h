@@ -62,6 +62,7 @@ class QUILT_EXPORT QuiltCollectionsController : public platform::Object {
   QuiltCollectionsController() = default;
 
  private:
+  bool loadCollections(const Path& path, const ObjectProgressionBlock<QuiltCollection>& block, bool& mayLoadAgain);
   void deleteFolder(const Path& folder) const;
 
   platform::Property<Path> _libraryPath{*this, "libraryPath"};

@@ -5,9 +5,11 @@
 #include <utility>
 
 #include "quilt/collections/QuiltCollection.h"
+#include "quilt/platform/base/CleanUp.h"
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/base/Paths.h"
 #include "quilt/platform/interfaces/Services.h"
+#include "quilt/sources/DocumentSave.h"
 #include "quilt/sources/ModelFiles.h"
 
 namespace quilt {
@@ -148,9 +150,11 @@ std::string QuiltDocument::displayTitle() const {
 bool QuiltDocument::loadDictionary() { return loadDictionaryAtPath(platform::standardizedPath(propertiesPath())); }
 
 bool QuiltDocument::loadDictionaryAtPath(const Path& path) {
-  setIsProcessing(true);
-  const bool loaded = readProperties(path);
-  setIsProcessing(false);
+  bool loaded = false;
+  withoutSaving([&] {
+    const platform::Uninterrupted whole;
+    loaded = readProperties(path);
+  });
   if (loaded) FDYLogger::logDebug("Loaded document at \"%@\"", this->path());
   return loaded;
 }
@@ -197,6 +201,7 @@ void QuiltDocument::apply(Dictionary record) {
 }
 
 void QuiltDocument::reload() {
+  const platform::Uninterrupted whole;
   const auto record = readPropertiesOf(path(), platform::standardizedPath(propertiesPath()));
   const auto written = record ? record->date("ModifiedDate") : std::nullopt;
   const auto known = modifiedDate();
@@ -245,6 +250,14 @@ Dictionary QuiltDocument::dictionary() {
 }
 
 bool QuiltDocument::writeProperties() {
+  const platform::Uninterrupted whole;
+  _hasUnsavedChange = false;  // before the record is built: what changes meanwhile may be missing in it
+  // What building the record adds to the model (the title, a poster) asks for no further save.
+  const platform::ThreadIdentity before = _quietThread.exchange(platform::currentThreadIdentity());
+  return platform::withCleanUp([this] { return writeRecord(); }, [&] { _quietThread = before; });
+}
+
+bool QuiltDocument::writeRecord() {
   // First, and also without a file to write to: the record gives an untitled document its title.
   const Dictionary record = dictionary();
   const Path file = propertiesPath();
@@ -262,11 +275,45 @@ bool QuiltDocument::isBusy() const {
   return !wasSaving && !isAnothers(_savingThread);
 }
 
-std::optional<platform::MonitorLock> QuiltDocument::beginProcessing() {
+void QuiltDocument::noteUnsavedChange() {
+  if (_quietThread == platform::currentThreadIdentity()) return;
+  _hasUnsavedChange = true;
+  // The operation may have ended since it was seen, and have looked before this.
+  if (!isProcessing() && _hasUnsavedChange.exchange(false)) requestSave(shared(this));
+}
+
+std::optional<bool> QuiltDocument::whileProcessing(const std::function<bool()>& work) {
   if (isBusy()) return std::nullopt;
-  auto lock = _media.lock();
-  if (_isProcessing.exchange(true)) return std::nullopt;
-  return lock;
+  bool isOurs = false;
+  const auto begin = [&] {
+    const platform::Uninterrupted whole;
+    const auto lock = _media.lock();  // which another thread's save holds
+    isOurs = !_isProcessing.exchange(true);
+  };
+  const auto end = [&] {
+    if (!isOurs) return;
+    setIsProcessing(false);
+    if (_hasUnsavedChange.exchange(false)) saveChange();
+  };
+  return platform::withCleanUp(
+      [&]() -> std::optional<bool> {
+        begin();
+        return isOurs ? std::optional(work()) : std::nullopt;
+      },
+      end);
+}
+
+void QuiltDocument::withoutSaving(const std::function<void()>& work) {
+  const platform::ThreadIdentity before = _quietThread.exchange(platform::currentThreadIdentity());
+  platform::withCleanUp(
+      [&] {
+        setIsProcessing(true);
+        work();
+      },
+      [&] {
+        _quietThread = before;
+        setIsProcessing(false);
+      });
 }
 
 bool QuiltDocument::update() {
@@ -277,32 +324,37 @@ bool QuiltDocument::update() {
   return saved.value_or(false);
 }
 
-void QuiltDocument::saveChange() { saveUnlessBusy(); }
+void QuiltDocument::saveChange() {
+  if (!saveUnlessBusy()) noteUnsavedChange();
+}
 
 std::optional<bool> QuiltDocument::saveUnlessBusy() {
   if (isBusy()) return std::nullopt;
+  const platform::Uninterrupted whole;
   const auto lock = _media.lock();
   // Known before the document is processing, so that no thread takes this save for a long operation.
   const platform::ThreadIdentity before = _savingThread.exchange(platform::currentThreadIdentity());
   const bool isFree = !_isProcessing.exchange(true);
-  bool written = false;
-  if (isFree) {
-    setModifiedDate(services().clock->now());
-    written = writeProperties();
-    if (!written)
-      FDYLogger::logCritical("Failed to update document at path \"%@\": \"Properties cannot be written\"",
-                             propertiesPath());
-    setIsProcessing(false);
-  }
-  _savingThread = before;
-  if (!isFree) return std::nullopt;
-  return written;
+  return platform::withCleanUp(
+      [&]() -> std::optional<bool> {
+        if (!isFree) return std::nullopt;
+        setModifiedDate(services().clock->now());
+        const bool written = writeProperties();
+        if (!written)
+          FDYLogger::logCritical("Failed to update document at path \"%@\": \"Properties cannot be written\"",
+                                 propertiesPath());
+        return written;
+      },
+      [&] {
+        if (isFree) setIsProcessing(false);
+        _savingThread = before;
+      });
 }
 
 void QuiltDocument::observeValueForKeyPath(std::string_view keyPath, platform::Object& /*ofObject*/,
                                            platform::ChangePhase /*change*/, void* /*context*/) {
   if (std::find(std::begin(kSavingKeys), std::end(kSavingKeys), keyPath) == std::end(kSavingKeys)) return;
-  if (isBusy()) return;
+  if (isBusy()) return noteUnsavedChange();
   FDYLogger::logDebug("Updating document because KVO deteched a change for the %@", keyPath);
   saveChange();
 }
@@ -317,11 +369,13 @@ bool QuiltDocument::hasBeenModified() const {
 }
 
 void QuiltDocument::resetModifiedDate() {
+  const platform::Uninterrupted whole;
   setModifiedDate(creationDate());
   if (!isProcessing()) update();
 }
 
 void QuiltDocument::invalidateCaches() {
+  const platform::Uninterrupted whole;
   setPosterImage(nullptr);
   performBlockOnMedia([](const auto& item) {
     item->invalidateCaches();

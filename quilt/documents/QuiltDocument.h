@@ -38,7 +38,11 @@ inline constexpr const char* kQuiltDocumentPropertiesFilename = "properties.plis
 ///
 /// A document saves itself: setting title, description, author, keywords, category, advisoryLabel, jukeboxOrder, theme,
 /// creationDate or lastPublishURL rewrites the properties file at once, on the setting thread, unless the document is
-/// processing. While a long operation or a load runs, isProcessing is true and saving is refused.
+/// processing. While a long operation or a load runs, isProcessing is true and saving is refused; what was changed
+/// meanwhile is saved when a long operation ends, however it ends.
+///
+/// A long operation holds the lock of the media list for as long as it walks it, and every call that takes that lock
+/// waits so long. docs/threads.md lists them, and those that never wait.
 class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserItem, public platform::PasteboardItem {
  public:
   // Construction
@@ -151,7 +155,11 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
   /// Whether a change is not to be saved now: a load, a long operation or a save of this thread runs. A save of another
   /// thread does not count; update() waits for it.
   bool isBusy() const;
-  /// Reads the package again when its file is newer than the document.
+  /// Of a change that is not to be saved now: the long operation that is running saves it at its end, whether it
+  /// succeeds or not. A change that a load or a merge makes on its own thread does not count.
+  void noteUnsavedChange();
+  /// Reads the package again when its file is newer than the document, as loadDictionary() does: items that the
+  /// document holds already are then there twice. To see a package as it is now, open it anew.
   void reload();
   /// Whether modifiedDate and creationDate are a second or more apart.
   bool hasBeenModified() const;
@@ -253,16 +261,17 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
 
   // Long operations, on the calling thread; the block gets 0 to 100
   /// Makes the document ready to be played: finalizes every item, writes what the theme reads, the thumbnail and the
-  /// properties file.
+  /// properties file. Holds the media list's lock throughout the items.
   bool finalizeWithProgressionBlock(const ProgressionBlock& withProgressionBlock);
   /// True when there are items and every one is flattened.
   bool isFlattened() const;
-  /// Copies every outside file into the package.
+  /// Copies every outside file into the package. Holds the media list's lock throughout.
   bool flattenWithProgressionBlock(const ProgressionBlock& withProgressionBlock);
   /// The formats that every item offers, in the first item's order.
   std::vector<std::string> availableFormats() const;
   /// Has every item make the format; false at the first that cannot, or when the block answers false. `followedBy`
-  /// as of the source's.
+  /// as of the source's. Holds the media list's lock throughout and leaves isProcessing as it is, so that a setter that
+  /// saves waits.
   bool convertToFormat(const std::string& format, const ProgressionBlock& withProgressionBlock,
                        const std::vector<std::string>& followedBy = {});
   /// Builds a finished copy, as a folder or zipped, in the folder `path` under a unique name made from the title. The
@@ -270,7 +279,8 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
   Path exportToPath(const Path& path, bool zipped, const std::vector<std::string>& usingFormats,
                     const ProgressionBlock& withProgressionBlock);
   /// Copies fields, poster and items, restricted to the formats, into another document. True also when an item lacked a
-  /// format and the copy stopped there. The block is never called.
+  /// format and the copy stopped there, and when the other document is null or this one: a critical line says so, and
+  /// nothing is changed. The block is never called.
   bool mergeIntoDocument(const std::shared_ptr<QuiltDocument>& document, const std::vector<std::string>& withFormats,
                          const ProgressionBlock& withProgressionBlock);
 
@@ -285,13 +295,21 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
   bool readProperties(const Path& file);
   void apply(Dictionary record);
   bool writeProperties();
+  bool writeRecord();
   /// What update() does; none, and nothing logged, while busy.
   std::optional<bool> saveUnlessBusy();
-  /// Sets isProcessing and answers the media lock, or none while busy. Waits for another thread's save.
-  std::optional<platform::MonitorLock> beginProcessing();
+  /// Runs the work with isProcessing set and answers what it answers; none, without running it, while busy. Waits for
+  /// another thread's save. Afterwards, also when the work throws, the document is free again and saves the changes
+  /// that were made meanwhile and that no record holds yet.
+  std::optional<bool> whileProcessing(const std::function<bool()>& work);
+  /// Runs the work with isProcessing set, whether it was or not, and cleared afterwards, also when the work throws.
+  /// What this thread changes meanwhile is not saved.
+  void withoutSaving(const std::function<void()>& work);
   enum class Outcome { Done, Failed, Cancelled };
+  bool finalizeAndSave(const ProgressionBlock& block);
   Outcome finalizeMedia(const ProgressionBlock& block);
   bool finalizeInteractive();
+  bool flattenAndSave(const ProgressionBlock& block);
   Outcome flattenMedia(const ProgressionBlock& block);
   Path exportCopy(const Path& path, bool zipped, const std::vector<std::string>& usingFormats,
                   const ProgressionBlock& block);
@@ -319,6 +337,8 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
   platform::Property<bool> _isProcessing{*this, "isProcessing"};
   platform::WeakProperty<QuiltCollection> _collectionOwner{*this, "collectionOwner"};
   std::atomic<platform::ThreadIdentity> _savingThread{nullptr};  // while update() runs
+  std::atomic<platform::ThreadIdentity> _quietThread{nullptr};   // while withoutSaving() runs
+  std::atomic<bool> _hasUnsavedChange{false};                    // made while the document was busy
   Dictionary _unknownEntries;
   std::vector<platform::Observation> _observations;  // last: ends before the properties do
 };

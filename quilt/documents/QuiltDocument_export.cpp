@@ -2,6 +2,7 @@
 #include <algorithm>
 
 #include "quilt/documents/QuiltDocument.h"
+#include "quilt/platform/base/CleanUp.h"
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/base/Paths.h"
 #include "quilt/platform/interfaces/Services.h"
@@ -11,6 +12,7 @@ namespace quilt {
 
 using platform::FDYLogger;
 using platform::integerPercentage;
+using platform::percentageInStep;
 using platform::report;
 using platform::services;
 
@@ -82,9 +84,11 @@ bool QuiltDocument::convertToFormat(const std::string& format, const Progression
   const std::size_t total = mediaCount();
   std::size_t position = 0;
   return performBlockOnMedia([&](const auto& item) {
-    const float start = static_cast<float>(position++) * 100.0F / static_cast<float>(total);
+    const bool isLate = position >= total;
+    const float start = isLate ? 100.0F : static_cast<float>(position) * 100.0F / static_cast<float>(total);
+    ++position;
     const auto intoStep = [&](double percentage) {
-      return report(withProgressionBlock, static_cast<double>(start) + percentage / static_cast<double>(total));
+      return report(withProgressionBlock, percentageInStep(static_cast<double>(start), percentage, total, isLate));
     };
     return item->convertToFormat(format, intoStep, followedBy);
   });
@@ -97,30 +101,29 @@ bool QuiltDocument::flattenWithProgressionBlock(const ProgressionBlock& withProg
     return false;
   }
   report(withProgressionBlock, 0);
-  if (!beginProcessing()) {
-    FDYLogger::logCritical(busy, path());
-    return false;
-  }
+  const std::optional<bool> flattened = whileProcessing([&] { return flattenAndSave(withProgressionBlock); });
+  if (!flattened) FDYLogger::logCritical(busy, path());
+  return flattened.value_or(false);
+}
 
-  Outcome outcome = flattenMedia(withProgressionBlock);
+bool QuiltDocument::flattenAndSave(const ProgressionBlock& block) {
+  Outcome outcome = flattenMedia(block);
   if (outcome == Outcome::Done && !writeProperties()) {
     FDYLogger::logDebug("Failed to update document at path \"%@\": \"Properties cannot be written\"", propertiesPath());
     outcome = Outcome::Failed;
   }
-
   switch (outcome) {
     case Outcome::Done:
-      report(withProgressionBlock, 100);
-      break;
+      report(block, 100);
+      return true;
     case Outcome::Failed:
       FDYLogger::logCritical("Failed to flatten document at path \"%@\"", path());
-      break;
+      return false;
     case Outcome::Cancelled:
       FDYLogger::logCritical("Flattening document at path \"%@\" has been cancelled", path());
-      break;
+      return false;
   }
-  setIsProcessing(false);
-  return outcome == Outcome::Done;
+  return false;
 }
 
 QuiltDocument::Outcome QuiltDocument::flattenMedia(const ProgressionBlock& block) {
@@ -135,6 +138,7 @@ QuiltDocument::Outcome QuiltDocument::flattenMedia(const ProgressionBlock& block
   Outcome outcome = Outcome::Done;
   std::size_t position = 0;
   _media.walk([&](const auto& item) {
+    const bool isLate = position >= total;
     const double start = integerPercentage(position++, total);
     if (!report(block, start)) {
       outcome = Outcome::Cancelled;
@@ -142,7 +146,7 @@ QuiltDocument::Outcome QuiltDocument::flattenMedia(const ProgressionBlock& block
     }
     if (item->isFlattened()) return true;
     const bool done = item->flattenWithProgressionBlock(
-        [&](double percentage) { return report(block, start + percentage / static_cast<double>(total)); });
+        [&](double percentage) { return report(block, percentageInStep(start, percentage, total, isLate)); });
     if (!done) outcome = Outcome::Failed;
     return done;
   });
@@ -152,16 +156,20 @@ QuiltDocument::Outcome QuiltDocument::flattenMedia(const ProgressionBlock& block
 Path QuiltDocument::exportToPath(const Path& path, bool zipped, const std::vector<std::string>& usingFormats,
                                  const ProgressionBlock& withProgressionBlock) {
   const bool isUntitled = !title();
-  const Path exported = exportCopy(path, zipped, usingFormats, withProgressionBlock);
-  if (isUntitled) forgetFallBackTitle();
-  return exported;
+  return platform::withCleanUp([&] { return exportCopy(path, zipped, usingFormats, withProgressionBlock); },
+                               [&] {
+                                 if (isUntitled) forgetFallBackTitle();
+                               });
 }
 
 void QuiltDocument::forgetFallBackTitle() {
-  const auto lock = beginProcessing();  // a save would give the title again
-  if (!lock) return;
-  if (title() == untitledEpisode()) setTitle(std::nullopt);
-  setIsProcessing(false);
+  if (isBusy()) return;
+  const platform::Uninterrupted whole;
+  const auto lock = _media.lock();  // another thread's save waits: it would give the title again
+  if (isProcessing()) return;
+  withoutSaving([this] {
+    if (title() == untitledEpisode()) setTitle(std::nullopt);
+  });
 }
 
 Path QuiltDocument::exportCopy(const Path& path, bool zipped, const std::vector<std::string>& usingFormats,
@@ -170,6 +178,7 @@ Path QuiltDocument::exportCopy(const Path& path, bool zipped, const std::vector<
   const std::string name = displayTitle();
   const std::string base = fileNameForTitle(name);
   const Path temporary = temporaryPath(path, kQuiltDocumentExtension);
+  const platform::OnException removeTemporary([&] { (void)services().files->removeItem(temporary, path); });
   const auto cleanUp = [&](const Path& final) {
     (void)services().files->removeItem(temporary, path);
     if (!final.empty()) (void)services().files->removeItem(final, path);
@@ -208,9 +217,15 @@ Path QuiltDocument::exportCopy(const Path& path, bool zipped, const std::vector<
   }
 
   const Path archive = temporaryPath(path, kZippedExtension);
+  const platform::OnException removeArchive([&] { (void)services().files->removeItem(archive, path); });
   // Unpacked, the package must not be hidden: inside the archive it has its final name.
   const std::string packageName = platform::withExtension(base, kQuiltDocumentExtension);
-  if (!services().archive->archiveFile(temporary, packageName, archive, band(block, kZipBand))) {
+  platform::CarriedException thrown;
+  const auto packed = services().archive->archiveFile(temporary, packageName, archive, [&](double percentage) {
+    return thrown.ask([&] { return report(block, percentage / 100 * kBandWidth + kZipBand); });
+  });
+  thrown.rethrow();
+  if (!packed) {
     FDYLogger::logWarning("Failed to archive temporary document copy of \"%@\" at path \"%@\" to path \"%@\"", name,
                           temporary, archive);
     return cleanUp({});

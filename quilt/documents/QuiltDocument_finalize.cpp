@@ -8,6 +8,7 @@ namespace quilt {
 
 using platform::FDYLogger;
 using platform::integerPercentage;
+using platform::percentageInStep;
 using platform::report;
 using platform::services;
 
@@ -18,12 +19,13 @@ bool QuiltDocument::finalizeWithProgressionBlock(const ProgressionBlock& withPro
     return false;
   }
   report(withProgressionBlock, 0);
-  if (!beginProcessing()) {
-    FDYLogger::logCritical(busy, path());
-    return false;
-  }
+  const std::optional<bool> finalized = whileProcessing([&] { return finalizeAndSave(withProgressionBlock); });
+  if (!finalized) FDYLogger::logCritical(busy, path());
+  return finalized.value_or(false);
+}
 
-  Outcome outcome = finalizeMedia(withProgressionBlock);
+bool QuiltDocument::finalizeAndSave(const ProgressionBlock& block) {
+  Outcome outcome = finalizeMedia(block);
   if (outcome == Outcome::Done && type() == kQuiltDocumentTypeInteractive && !finalizeInteractive())
     outcome = Outcome::Failed;
   if (outcome == Outcome::Done) {
@@ -37,17 +39,16 @@ bool QuiltDocument::finalizeWithProgressionBlock(const ProgressionBlock& withPro
 
   switch (outcome) {
     case Outcome::Done:
-      report(withProgressionBlock, 100);
-      break;
+      report(block, 100);
+      return true;
     case Outcome::Failed:
       FDYLogger::logCritical("Failed to finalize document at path \"%@\"", path());
-      break;
+      return false;
     case Outcome::Cancelled:
       FDYLogger::logCritical("Finalizing document at path \"%@\" has been cancelled", path());
-      break;
+      return false;
   }
-  setIsProcessing(false);
-  return outcome == Outcome::Done;
+  return false;
 }
 
 QuiltDocument::Outcome QuiltDocument::finalizeMedia(const ProgressionBlock& block) {
@@ -56,13 +57,14 @@ QuiltDocument::Outcome QuiltDocument::finalizeMedia(const ProgressionBlock& bloc
   Outcome outcome = Outcome::Done;
   std::size_t position = 0;
   _media.walk([&](const auto& item) {
+    const bool isLate = position >= total;
     const double start = integerPercentage(position++, total);
     if (!report(block, start)) {
       outcome = Outcome::Cancelled;
       return false;
     }
     const bool done = item->finalizeWithProgressionBlock(
-        [&](double percentage) { return report(block, start + percentage / static_cast<double>(total)); });
+        [&](double percentage) { return report(block, percentageInStep(start, percentage, total, isLate)); });
     if (done) {
       item->flattenPreviews();
       return true;

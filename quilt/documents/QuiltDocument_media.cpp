@@ -41,23 +41,27 @@ bool QuiltDocument::performBlockOnMedia(const std::function<bool(const std::shar
 
 void QuiltDocument::addMedia(const std::shared_ptr<QuiltMedia>& media) {
   if (!media) return;
+  const platform::Uninterrupted whole;
   _media.append(media);
   requestSave(shared(this));
 }
 
 void QuiltDocument::addMedia(const std::shared_ptr<QuiltMedia>& media, std::size_t atIndex) {
   if (!media) return;
+  const platform::Uninterrupted whole;
   _media.insert(media, atIndex);
   requestSave(shared(this));
 }
 
 void QuiltDocument::moveMediaAtIndexes(const IndexSet& indexes, std::size_t toIndex) {
+  const platform::Uninterrupted whole;
   _media.move(indexes, toIndex);
   requestSave(shared(this));
 }
 
 void QuiltDocument::removeMedia(const std::shared_ptr<QuiltMedia>& media) {
   if (!media) return;
+  const platform::Uninterrupted whole;
   {
     const auto guard = _media.lock();
     // The item's path leads through its owner, so its files go first.
@@ -68,17 +72,20 @@ void QuiltDocument::removeMedia(const std::shared_ptr<QuiltMedia>& media) {
 }
 
 void QuiltDocument::removeAllMedia() {
+  const platform::Uninterrupted whole;
   const auto guard = _media.lock();
   for (const auto& item : _media.copy()) removeMedia(item);
 }
 
 void QuiltDocument::removeAllEmptyMedia() {
+  const platform::Uninterrupted whole;
   const auto guard = _media.lock();
   for (const auto& item : _media.copy())
     if (item->sourcesCount() == 0) removeMedia(item);
 }
 
 void QuiltDocument::removeAllBrokenMedia() {
+  const platform::Uninterrupted whole;
   const auto guard = _media.lock();
   std::vector<std::shared_ptr<QuiltMedia>> broken;
   for (const auto& item : _media.copy())
@@ -87,6 +94,7 @@ void QuiltDocument::removeAllBrokenMedia() {
 }
 
 void QuiltDocument::removeAllBrokenMediaExtra() {
+  const platform::Uninterrupted whole;
   const auto guard = _media.lock();
   // One list for the whole pass: each item is asked to remove every broken extra found so far.
   std::vector<std::shared_ptr<QuiltMediaExtra>> broken;

@@ -124,32 +124,38 @@ class Merger {
 bool QuiltDocument::mergeIntoDocument(const std::shared_ptr<QuiltDocument>& document,
                                       const std::vector<std::string>& withFormats,
                                       const ProgressionBlock& /*withProgressionBlock*/) {
-  const SaveDeferral deferral;
-  document->setIsProcessing(true);  // no assignment saves
-  document->setUuid(uuid());
-  document->setTitle(title());
-  document->setDescription(description());
-  document->setAuthor(author());
-  document->setKeywords(keywords());
-  document->setCategory(category());
-  document->setAdvisoryLabel(advisoryLabel());
-  document->setJukeboxOrder(jukeboxOrder());
-  document->setTheme(theme());
-  document->setCollectionOwner(collectionOwner());
-  document->setCreationDate(creationDate());
-  document->setModifiedDate(modifiedDate());
-  document->setType(type());
-  document->setLastPublishURL(lastPublishURL());
-  document->updatePosterImage(posterImage());
-
-  const Merger merger(*this, withFormats);
-  performBlockOnMedia([&](const auto& item) {
-    const auto copy = merger.copyOf(*item);
-    if (!copy) return false;
-    document->addMedia(copy);
+  if (!document || document.get() == this) {
+    FDYLogger::logCritical("Failed to import document \"%@\": \"There is no other document to import it into\"",
+                           title());
     return true;
+  }
+  const platform::Uninterrupted whole;
+  const SaveDeferral deferral;
+  document->withoutSaving([&] {
+    document->setUuid(uuid());
+    document->setTitle(title());
+    document->setDescription(description());
+    document->setAuthor(author());
+    document->setKeywords(keywords());
+    document->setCategory(category());
+    document->setAdvisoryLabel(advisoryLabel());
+    document->setJukeboxOrder(jukeboxOrder());
+    document->setTheme(theme());
+    document->setCollectionOwner(collectionOwner());
+    document->setCreationDate(creationDate());
+    document->setModifiedDate(modifiedDate());
+    document->setType(type());
+    document->setLastPublishURL(lastPublishURL());
+    document->updatePosterImage(posterImage());
+
+    const Merger merger(*this, withFormats);
+    performBlockOnMedia([&](const auto& item) {
+      const auto copy = merger.copyOf(*item);
+      if (!copy) return false;
+      document->addMedia(copy);
+      return true;
+    });
   });
-  document->setIsProcessing(false);
   return true;
 }
 

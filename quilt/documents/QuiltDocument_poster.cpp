@@ -20,6 +20,7 @@ std::shared_ptr<ImageWrapper> placeholderPoster() {
 }  // namespace
 
 std::shared_ptr<ImageWrapper> QuiltDocument::posterImage() {
+  const platform::Uninterrupted whole;
   if (auto cached = _posterImage.get()) return cached;
   const Path file = posterImagePath();
   if (file.empty() || !services().files->fileExistsAtPath(file)) {
@@ -34,6 +35,7 @@ std::shared_ptr<ImageWrapper> QuiltDocument::posterImage() {
 }
 
 void QuiltDocument::updatePosterImage(const std::shared_ptr<ImageWrapper>& image) {
+  const platform::Uninterrupted whole;
   if (!image) {
     setPosterImage(placeholderPoster());
     return;

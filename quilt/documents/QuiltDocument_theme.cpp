@@ -2,6 +2,7 @@
 #include <algorithm>
 
 #include "quilt/documents/QuiltDocument.h"
+#include "quilt/platform/base/CleanUp.h"
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/base/Paths.h"
 #include "quilt/platform/interfaces/Services.h"
@@ -69,6 +70,7 @@ bool QuiltDocument::applyTheme(const std::shared_ptr<QuiltTheme>& theme, const P
     return false;
   };
 
+  const platform::OnException removeHalf([this] { removeTheme(); });
   if (!removeTheme()) return fail(std::nullopt);
   const Path folder = theme ? theme->templatePath() : Path();
   const auto entries = services().files->contentsOfDirectoryAtPath(folder);

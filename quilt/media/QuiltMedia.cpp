@@ -141,6 +141,7 @@ double QuiltMedia::totalSizeInMegaBytes() const {
 }
 
 void QuiltMedia::invalidateCaches() {
+  const platform::Uninterrupted whole;
   setPosterImage(nullptr);
   const auto invalidate = [](const auto& child) {
     child->invalidateCaches();

@@ -173,7 +173,8 @@ class QUILT_EXPORT QuiltMedia : public platform::Object, public ImageBrowserItem
   // Long operations, on the calling thread; the block gets 0 to 100
   /// Whether every child's files lie in the package.
   bool isFlattened() const;
-  /// Copies every child's files into the item's folder.
+  /// Copies every child's files into the item's folder. This, finalize and convert hold the lock of the list that they
+  /// are at, the sources' and then the extras', throughout.
   bool flattenWithProgressionBlock(const ProgressionBlock& withProgressionBlock);
   /// Makes the poster and every child's previews.
   bool finalizeWithProgressionBlock(const ProgressionBlock& withProgressionBlock);

@@ -11,6 +11,7 @@ void QuiltMedia::updateDocumentUnlessProcessing() const { requestSave(documentOw
 template <class List, class Child>
 void QuiltMedia::insertChild(List& list, const Child& child, std::size_t index) {
   if (!child) return;
+  const platform::Uninterrupted whole;
   list.insert(child, index);
   updateDocumentUnlessProcessing();
 }
@@ -18,12 +19,14 @@ void QuiltMedia::insertChild(List& list, const Child& child, std::size_t index) 
 template <class List, class Child>
 void QuiltMedia::appendChild(List& list, const Child& child) {
   if (!child) return;
+  const platform::Uninterrupted whole;
   list.append(child);
   updateDocumentUnlessProcessing();
 }
 
 template <class List>
 void QuiltMedia::moveChildren(List& list, const IndexSet& indexes, std::size_t target) {
+  const platform::Uninterrupted whole;
   list.move(indexes, target);
   updateDocumentUnlessProcessing();
 }
@@ -31,6 +34,7 @@ void QuiltMedia::moveChildren(List& list, const IndexSet& indexes, std::size_t t
 template <class List, class Child>
 void QuiltMedia::removeChild(List& list, const Child& child, const char* warning) {
   if (!child) return;
+  const platform::Uninterrupted whole;
   {
     const auto guard = list.lock();
     // The child's path leads through its owner, so its files go first.
@@ -66,6 +70,7 @@ void QuiltMedia::removeSource(const std::shared_ptr<QuiltMediaSource>& source) {
 }
 
 void QuiltMedia::removeAllSources() {
+  const platform::Uninterrupted whole;
   // The lock is not held across: each removal saves the document, whose lock comes first.
   for (const auto& source : _sources.copy()) removeSource(source);
 }
@@ -115,12 +120,14 @@ void QuiltMedia::removeExtra(const std::shared_ptr<QuiltMediaExtra>& extra) {
 }
 
 void QuiltMedia::removeAllExtras() {
+  const platform::Uninterrupted whole;
   for (const auto& extra : _extras.copy()) removeExtra(extra);
 }
 
 // ---- Audio commentary
 
 void QuiltMedia::setAudioCommentarySource(const std::shared_ptr<QuiltMediaSource>& source) {
+  const platform::Uninterrupted whole;
   if (const auto current = audioCommentarySource()) current->setMediaOwner(nullptr);
   _audioCommentarySource.set(source);
   if (source) source->setMediaOwner(shared(this));

@@ -18,18 +18,21 @@ constexpr const char* kNoMediaFolder = "Failed to create intermediate directorie
 constexpr const char* kNoSourcesFolder = "Failed to create intermediate directories for sources at path \"%@\": \"%@\"";
 constexpr const char* kNoExtrasFolder = "Failed to create intermediate directories for extras at path \"%@\": \"%@\"";
 
-/// Maps a child's percentage into its step of `total`; the step's start is an integer quotient.
-ProgressionBlock integerStep(const ProgressionBlock& block, std::size_t step, std::size_t total) {
-  return [&block, step, total](double percentage) {
-    return report(block, percentage / static_cast<double>(total) + platform::integerPercentage(step, total));
+/// Maps a child's percentage into its step of `total`; the step's start is an integer quotient. `isLate`: the child
+/// came after the children were counted.
+ProgressionBlock integerStep(const ProgressionBlock& block, std::size_t step, std::size_t total, bool isLate) {
+  return [&block, start = platform::integerPercentage(step, total), total, isLate](double percentage) {
+    return report(block, platform::percentageInStep(start, percentage, total, isLate));
   };
 }
 
-/// The same with the step's start computed in single precision.
+/// The same with the step's start computed in single precision; a step that was not counted is late.
 ProgressionBlock realStep(const ProgressionBlock& block, std::size_t step, std::size_t total) {
-  return [&block, step, total](double percentage) {
-    const float start = static_cast<float>(step) * 100.0F / static_cast<float>(total);
-    return report(block, percentage / static_cast<double>(total) + static_cast<double>(start));
+  const bool isLate = step >= total;
+  const float start =
+      isLate ? (total == 0 ? 0.0F : 100.0F) : static_cast<float>(step) * 100.0F / static_cast<float>(total);
+  return [&block, start = static_cast<double>(start), total, isLate](double percentage) {
+    return report(block, platform::percentageInStep(start, percentage, total, isLate));
   };
 }
 
@@ -71,7 +74,7 @@ bool QuiltMedia::flattenChildren(const ProgressionBlock& block) {
 
   const std::size_t total = sources + extras + (commentary ? 1 : 0);
   const auto flatten = [&](QuiltMediaSource& child, std::size_t step, const char* failure) {
-    if (child.flattenCopy(/*copy=*/true, integerStep(block, step, total))) return true;
+    if (child.flattenCopy(/*copy=*/true, integerStep(block, step, total, step >= total))) return true;
     FDYLogger::logDebug(failure, child.uuid());
     return false;
   };
@@ -118,7 +121,8 @@ bool QuiltMedia::finalizeChildren(const ProgressionBlock& block) {
   }
   const auto commentary = audioCommentarySource();
   const std::size_t extras = extraCount();
-  const std::size_t total = sourcesCount() + extras + (commentary ? 1 : 0);
+  const std::size_t sources = sourcesCount();
+  const std::size_t total = sources + extras + (commentary ? 1 : 0);
   report(block, 0);
   const auto document = documentOwner();
   if (!makeFolderInPackage(path(), document, kNoMediaFolder) ||
@@ -128,8 +132,9 @@ bool QuiltMedia::finalizeChildren(const ProgressionBlock& block) {
   posterImage();  // writes the poster into the package
 
   // Every source reports into the first step.
+  std::size_t position = 0;
   const bool sourcesDone = _sources.walk([&](const auto& source) {
-    if (source->finalizeWithProgressionBlock(integerStep(block, 0, total))) return true;
+    if (source->finalizeWithProgressionBlock(integerStep(block, 0, total, position++ >= sources))) return true;
     FDYLogger::logDebug("Failed to finalize source \"%@\" during finalizing media at path \"%@\"", source->uuid(),
                         path());
     return false;
@@ -138,13 +143,14 @@ bool QuiltMedia::finalizeChildren(const ProgressionBlock& block) {
 
   std::size_t step = 0;
   const bool extrasDone = _extras.walk([&](const auto& extra) {
-    if (extra->finalizeWithProgressionBlock(integerStep(block, ++step, total))) return true;
+    const bool isLate = step++ >= extras;
+    if (extra->finalizeWithProgressionBlock(integerStep(block, step, total, isLate))) return true;
     FDYLogger::logDebug("Failed to finalize extra \"%@\" during finalizing at \"%@\"", extra->uuid(), path());
     return false;
   });
   if (!extrasDone) return false;
 
-  if (commentary && !commentary->finalizeWithProgressionBlock(integerStep(block, 1 + extras, total))) {
+  if (commentary && !commentary->finalizeWithProgressionBlock(integerStep(block, 1 + extras, total, false))) {
     FDYLogger::logDebug("Failed to finalize audio commentary source \"%@\" during finalizing media at path \"%@\"",
                         commentary->uuid(), path());
     return false;

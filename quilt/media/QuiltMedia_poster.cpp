@@ -13,6 +13,7 @@ using platform::FDYLogger;
 using platform::services;
 
 std::shared_ptr<ImageWrapper> QuiltMedia::posterImage() {
+  const platform::Uninterrupted whole;
   // Making a first preview asks for a save, and a save reads the poster: it must be there by then.
   const SaveDeferral deferral;
   if (auto cached = _posterImage.get()) return cached;
@@ -74,6 +75,7 @@ platform::PropertyList QuiltMedia::posterImageHeight() {
 }
 
 void QuiltMedia::invalidatePosterImage() {
+  const platform::Uninterrupted whole;
   setPosterImage(nullptr);
   setPosterImageVersion(posterImageVersion() + 1);
   deleteFromPackage(posterImagePath(), documentOwner(), "Failed to delete poster image at path \"%@\": \"%@\"");

@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "quilt/documents/QuiltDocument.h"
+#include "quilt/platform/base/Uninterrupted.h"
 
 namespace quilt {
 
@@ -21,7 +22,8 @@ thread_local Deferred deferred;
 }  // namespace
 
 void requestSave(const std::shared_ptr<QuiltDocument>& document) {
-  if (!document || document->isBusy()) return;
+  if (!document) return;
+  if (document->isBusy()) return document->noteUnsavedChange();
   if (deferred.depth == 0) {
     document->saveChange();
   } else if (std::find(deferred.documents.begin(), deferred.documents.end(), document) == deferred.documents.end()) {
@@ -31,9 +33,14 @@ void requestSave(const std::shared_ptr<QuiltDocument>& document) {
 
 SaveDeferral::SaveDeferral() { ++deferred.depth; }
 
-SaveDeferral::~SaveDeferral() {
+SaveDeferral::~SaveDeferral() noexcept(false) {
   if (--deferred.depth > 0) return;
-  for (const auto& document : std::exchange(deferred.documents, {})) requestSave(document);
+  try {
+    const platform::Uninterrupted whole;
+    for (const auto& document : std::exchange(deferred.documents, {})) requestSave(document);
+  } catch (...) {
+    if (std::uncaught_exceptions() == _onTheirWay) throw;
+  }
 }
 
 }  // namespace quilt

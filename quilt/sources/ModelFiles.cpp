@@ -7,6 +7,7 @@
 
 #include "quilt/documents/QuiltDocument.h"
 #include "quilt/media/QuiltMedia.h"
+#include "quilt/platform/base/CleanUp.h"
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/interfaces/Services.h"
 #include "quilt/sources/copyfile_callback.h"
@@ -113,8 +114,18 @@ std::string untitledEpisode() { return services().resources->localizedString("Un
 int copyReportingPercentage(const Path& source, const Path& destination, std::uint64_t size,
                             const ProgressionBlock& block) {
   // Sizes beyond 2 GiB wrap, and so do the percentages reported for them; the copy itself does not depend on either.
-  CopyContext context{static_cast<std::int32_t>(size), block};
-  return services().files->copyfile(source, destination, copyfile_callback, &context);
+  platform::CarriedException thrown;
+  const ProgressionBlock carried = [&](double percentage) {
+    return thrown.ask([&] { return platform::report(block, percentage); });
+  };
+  CopyContext context{static_cast<std::int32_t>(size), carried};
+  const int result = services().files->copyfile(source, destination, copyfile_callback, &context);
+  // The copy may have been whole before it asked.
+  const platform::OnException removeCopy([&] {
+    if (result >= 0) (void)services().files->removeItem(destination, destination.parent_path());
+  });
+  thrown.rethrow();
+  return result;
 }
 
 }  // namespace quilt

@@ -117,6 +117,7 @@ bool QuiltMediaAudioSamples::flatten(const ContinueBlock& goesOn) {
     FDYLogger::logCritical("Failed to extract audio samples file at path \"%@\": \"%@\"", file, std::nullopt);
     return false;
   }
+  const platform::Uninterrupted whole;
   setSampleURL(destination);
   setIsFlattened(true);
   return true;

@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "quilt/documents/QuiltDocument.h"
+#include "quilt/platform/base/CleanUp.h"
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/base/Paths.h"
 #include "quilt/platform/interfaces/Services.h"
@@ -86,8 +87,13 @@ bool QuiltMediaDerivative::flattenCopy(bool copy, const ProgressionBlock& withPr
     FDYLogger::logCritical("Failed to flatten source derivative \"%@\" at \"%@\"", *from, to);
     return false;
   }
-  setUrl(to);
-  setIsFlattened(true);
+  {
+    const platform::Uninterrupted whole;
+    setUrl(to);
+    setIsFlattened(true);
+  }
+  // Should the document's flatten not come to its end, its record names the file all the same.
+  if (document->isBusy()) document->noteUnsavedChange();
   platform::report(withProgressionBlock, 100);
   return true;
 }

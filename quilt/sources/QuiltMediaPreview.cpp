@@ -81,6 +81,7 @@ Dictionary QuiltMediaPreview::dictionary() const {
 }
 
 void QuiltMediaPreview::adopt(const std::shared_ptr<ImageWrapper>& image) {
+  const platform::Uninterrupted whole;
   setImage(image);
   setWidth(static_cast<double>(static_cast<float>(image->size().width)));
   setHeight(static_cast<double>(static_cast<float>(image->size().height)));

@@ -244,6 +244,7 @@ std::optional<Url> QuiltMediaSource::previewItemURL() const {
 // ---- Invalidation
 
 void QuiltMediaSource::invalidateCaches() {
+  const platform::Uninterrupted whole;
   invalidateThumbnailImage();
   invalidatePosterImage();
   const auto invalidate = [](const auto& child) {
@@ -259,6 +260,7 @@ void QuiltMediaSource::invalidateCaches() {
 }
 
 void QuiltMediaSource::invalidateAll() {
+  const platform::Uninterrupted whole;
   const auto main = mainDerivative();
   for (const auto& derivative : _derivatives.copy())
     if (derivative != main) removeDerivative(derivative);
@@ -270,6 +272,7 @@ void QuiltMediaSource::invalidateAll() {
 }
 
 void QuiltMediaSource::setDirty(bool dirty) {
+  const platform::Uninterrupted whole;
   if (dirty) {
     invalidateAll();
     if (const auto main = mainDerivative())

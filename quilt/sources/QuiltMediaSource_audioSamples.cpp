@@ -44,6 +44,7 @@ bool QuiltMediaSource::addAudioSamplesForMainDerivative(const ContinueBlock& goe
 void QuiltMediaSource::addAudioSamples(const std::shared_ptr<QuiltMediaAudioSamples>& samples,
                                        const ContinueBlock& goesOn) {
   if (!samples) return;
+  const platform::Uninterrupted whole;
   const SamplesLock guard(audioSamples());
   samples->setSourceOwner(shared(this));
   if (samples->flatten(goesOn)) {
@@ -57,6 +58,7 @@ void QuiltMediaSource::addAudioSamples(const std::shared_ptr<QuiltMediaAudioSamp
 
 void QuiltMediaSource::removeAudioSamples(const std::shared_ptr<QuiltMediaAudioSamples>& samples) {
   if (!samples) return;
+  const platform::Uninterrupted whole;
   const SamplesLock guard(audioSamples());
   if (samples->isFlattened())
     deleteFromPackage(samples->path(), document(), "Failed to delete audio samples at path \"%@\": \"%@\"");

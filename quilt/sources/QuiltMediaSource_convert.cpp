@@ -2,6 +2,7 @@
 #include <algorithm>
 
 #include "quilt/media/QuiltMedia.h"
+#include "quilt/platform/base/CleanUp.h"
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/base/Paths.h"
 #include "quilt/platform/interfaces/Services.h"
@@ -16,9 +17,10 @@ using platform::services;
 
 namespace {
 
-platform::TranscoderProgressBlock stopWhenCancelled(const ProgressionBlock& block) {
-  return [&block](float progress, bool& stop) {
-    if (!platform::report(block, static_cast<double>(progress))) stop = true;
+/// The transcoder is stopped when the block answers false or throws; `thrown` keeps what it threw.
+platform::TranscoderProgressBlock stopWhenCancelled(const ProgressionBlock& block, platform::CarriedException& thrown) {
+  return [&block, &thrown](float progress, bool& stop) {
+    if (!thrown.ask([&] { return platform::report(block, static_cast<double>(progress)); })) stop = true;
   };
 }
 
@@ -110,7 +112,9 @@ bool QuiltMediaSource::convertAudio(const std::string& format, const Progression
   const auto url = previewItemURL();
   const Path file = newHiddenFile("m4a");
   if (!url || file.empty()) return false;
-  const auto made = services().transcoder->transcodeToAudio(*url, Url::fileUrl(file), stopWhenCancelled(block));
+  platform::CarriedException thrown;
+  const auto made = services().transcoder->transcodeToAudio(*url, Url::fileUrl(file), stopWhenCancelled(block, thrown));
+  thrown.rethrow();
   if (made) return adoptConverted(file, format);
   FDYLogger::logCritical("Failed to convert file at URL \"%@\" to audio: \"%@\"", url, made.error());
   return false;
@@ -137,7 +141,8 @@ bool QuiltMediaSource::convertMovie(const std::string& format, const Progression
   Path otherFile;
   if (isOtherNext && !derivativeWithFormat(other) && isBetter(*main, other)) otherFile = newHiddenFile("m4v");
 
-  const auto transcode = [&, stop = stopWhenCancelled(block)] {
+  platform::CarriedException thrown;
+  const auto transcode = [&, stop = stopWhenCancelled(block, thrown)] {
     const bool isHigh = format == k720p;
     if (otherFile.empty())
       return isHigh ? transcoder.transcodeToHD(*url, destination, stop)
@@ -147,6 +152,7 @@ bool QuiltMediaSource::convertMovie(const std::string& format, const Progression
                                          isHigh ? otherDestination : destination, stop);
   };
   const auto made = transcode();
+  thrown.rethrow();
   if (!made) {
     // The line names HD for both sizes.
     FDYLogger::logCritical("Failed to convert video at URL \"%@\" to HD: \"%@\"", url, made.error());
@@ -161,6 +167,7 @@ bool QuiltMediaSource::convertMovie(const std::string& format, const Progression
 bool QuiltMediaSource::adoptConverted(const Path& file, const std::string& format) {
   const auto derivative = QuiltMediaDerivative::initWithPath(file);
   if (!derivative) return false;
+  const platform::Uninterrupted whole;
   auto tags = derivative->compatibilityTags().value_or(std::vector<std::string>());
   tags.push_back(format);
   derivative->setCompatibilityTags(std::move(tags));

@@ -25,12 +25,14 @@ bool QuiltMediaSource::performBlockOnDerivatives(
 
 void QuiltMediaSource::addDerivative(const std::shared_ptr<QuiltMediaDerivative>& derivative) {
   if (!derivative) return;
+  const platform::Uninterrupted whole;
   _derivatives.append(derivative);
   updateDocumentUnlessProcessing();
 }
 
 void QuiltMediaSource::removeDerivative(const std::shared_ptr<QuiltMediaDerivative>& derivative) {
   if (!derivative) return;
+  const platform::Uninterrupted whole;
   {
     const auto guard = _derivatives.lock();
     const auto url = derivative->url();
@@ -43,6 +45,7 @@ void QuiltMediaSource::removeDerivative(const std::shared_ptr<QuiltMediaDerivati
 }
 
 void QuiltMediaSource::removeAllDerivatives() {
+  const platform::Uninterrupted whole;
   // The lock is not held across: each removal saves the document, whose lock comes first.
   for (const auto& derivative : _derivatives.copy()) removeDerivative(derivative);
 }

@@ -10,6 +10,7 @@ namespace quilt {
 
 using platform::FDYLogger;
 using platform::integerPercentage;
+using platform::percentageInStep;
 using platform::report;
 
 namespace {
@@ -56,11 +57,12 @@ bool QuiltMediaSource::flattenCopy(bool copy, const ProgressionBlock& withProgre
 
     std::size_t step = 0;
     const bool copied = _derivatives.walk([&](const auto& derivative) {
+      const bool isLate = step >= total;
       const double start = integerPercentage(step++, total);
       if (derivative->isFlattened()) return true;
       const auto url = derivative->url();
       const bool done = derivative->flattenCopy(
-          copy, [&](double percentage) { return progress.report(start + percentage / static_cast<double>(total)); });
+          copy, [&](double percentage) { return progress.report(percentageInStep(start, percentage, total, isLate)); });
       if (!done)
         FDYLogger::logDebug("Failed to flatten source derivative \"%@\" during flattening at path \"%@\"", url, path());
       return done;

@@ -210,12 +210,14 @@ void QuiltMediaSource::setPreviews(std::vector<std::shared_ptr<QuiltMediaPreview
 
 void QuiltMediaSource::addPreview(const std::shared_ptr<QuiltMediaPreview>& preview) {
   if (!preview) return;
+  const platform::Uninterrupted whole;
   _previews.append(preview);
   updateDocumentUnlessProcessing();
 }
 
 void QuiltMediaSource::removePreview(const std::shared_ptr<QuiltMediaPreview>& preview) {
   if (!preview) return;
+  const platform::Uninterrupted whole;
   {
     const auto guard = _previews.lock();
     deleteFromPackage(preview->path(), document(), "Failed to delete preview at path \"%@\": \"%@\"");
@@ -225,6 +227,7 @@ void QuiltMediaSource::removePreview(const std::shared_ptr<QuiltMediaPreview>& p
 }
 
 void QuiltMediaSource::removeAllPreviews() {
+  const platform::Uninterrupted whole;
   for (const auto& preview : _previews.copy()) removePreview(preview);
 }
 

@@ -4,6 +4,7 @@
 namespace quilt {
 
 bool RepeatedReport::report(double percentage) {
+  _thrown.rethrow();
   _percentage = percentage;
   const bool answer = platform::report(_block, percentage);
   _reported = Clock::now();
@@ -12,7 +13,8 @@ bool RepeatedReport::report(double percentage) {
 
 bool RepeatedReport::goesOn() {
   constexpr std::chrono::milliseconds pause(250);
-  if (!_isCancelled && Clock::now() - _reported >= pause) _isCancelled = !report(_percentage);
+  if (!_isCancelled && Clock::now() - _reported >= pause)
+    _isCancelled = !_thrown.ask([this] { return report(_percentage); });
   return !_isCancelled;
 }
 

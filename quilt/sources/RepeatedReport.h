@@ -3,6 +3,7 @@
 
 #include <chrono>
 
+#include "quilt/platform/base/CleanUp.h"
 #include "quilt/sources/ModelTypes.h"
 
 namespace quilt {
@@ -16,13 +17,18 @@ class RepeatedReport {
 
   /// Passes the percentage to the block, and its answer back.
   bool report(double percentage);
-  /// False for good once the block answered false here.
+  /// False for good once the block answered false here, or threw. The step may be one that exceptions must not pass, so
+  /// what the block threw comes out of wasCancelled() or the next report().
   bool goesOn();
   /// goesOn() for services; this object outlives it.
   [[nodiscard]] ContinueBlock continueBlock() {
     return [this] { return goesOn(); };
   }
-  [[nodiscard]] bool wasCancelled() const { return _isCancelled; }
+  /// Whether goesOn() answered false. To be asked after each step.
+  [[nodiscard]] bool wasCancelled() {
+    _thrown.rethrow();
+    return _isCancelled;
+  }
 
  private:
   using Clock = std::chrono::steady_clock;
@@ -31,6 +37,7 @@ class RepeatedReport {
   double _percentage = 0;
   Clock::time_point _reported = Clock::now();
   bool _isCancelled = false;
+  platform::CarriedException _thrown;
 };
 
 }  // namespace quilt

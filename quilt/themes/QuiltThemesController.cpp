@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "quilt/themes/QuiltThemesController.h"
 
+#include "quilt/platform/base/CleanUp.h"
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/interfaces/Services.h"
 
@@ -27,8 +28,10 @@ std::shared_ptr<QuiltThemesController> QuiltThemesController::init() {
 }
 
 bool QuiltThemesController::loadWithProgressionBlock(const ObjectProgressionBlock<QuiltTheme>& withProgressionBlock) {
-  // The exchange lets one of two threads pass; the look before it keeps a refused load from announcing anything.
-  if (loadingThemes() || _loadingThemes.exchange(true)) return false;
+  return platform::whileSet(_loadingThemes, [&] { return loadThemes(withProgressionBlock); }).value_or(false);
+}
+
+bool QuiltThemesController::loadThemes(const ObjectProgressionBlock<QuiltTheme>& block) {
   FDYLogger::logDebug("Loading themes...");
   _themes.assign({});
 
@@ -41,13 +44,11 @@ bool QuiltThemesController::loadWithProgressionBlock(const ObjectProgressionBloc
       FDYLogger::logDebug("Loaded theme \"%@\"", theme->localizedName());
       _themes.append(theme);
     }
-    if (!platform::report(withProgressionBlock, theme, platform::integerPercentage(++done, paths.size()))) {
+    if (!platform::report(block, theme, platform::integerPercentage(++done, paths.size()))) {
       FDYLogger::logCritical("Loading themes has been cancelled");
-      setLoadingThemes(false);
       return false;
     }
   }
-  setLoadingThemes(false);
   return true;
 }
 

@@ -47,6 +47,7 @@ class QUILT_EXPORT QuiltThemesController : public platform::Object {
   QuiltThemesController() = default;
 
  private:
+  bool loadThemes(const ObjectProgressionBlock<QuiltTheme>& block);
   platform::Property<bool> _loadingThemes{*this, "loadingThemes"};
   platform::ChildList<QuiltTheme, QuiltThemesController> _themes{*this, "themes"};
 };

@@ -13,6 +13,7 @@
 #include "quilt/platform/base/IndexSet.h"
 #include "quilt/platform/base/Object.h"
 #include "quilt/platform/base/RecursiveMonitor.h"
+#include "quilt/platform/base/Uninterrupted.h"
 
 namespace quilt::platform {
 
@@ -21,7 +22,8 @@ namespace quilt::platform {
 ///
 /// Each operation holds the list's recursive lock for its whole run; lock() holds it over several. A change that
 /// someone observes is made on the main thread, between the will- and did-change announcements of the list's key, while
-/// the calling thread keeps the lock. A change that no one observes is made where it is.
+/// the calling thread keeps the lock. A change that no one observes is made where it is. An observer that throws stops
+/// no change: list and back-pointer are changed, the others are told, and then the exception goes to the caller.
 template <class Child, class Owner>
 class ChildList {
  public:
@@ -95,6 +97,7 @@ class ChildList {
   /// Detaches the child and removes every occurrence of it. Announces also when the list does not hold it.
   void remove(const Pointer& child) {
     if (!child) return;
+    const Uninterrupted whole;
     const MonitorLock guard = lock();
     if (_setOwner) ((*child).*_setOwner)(nullptr);
     change([&] { std::erase(_children, child); });
@@ -129,6 +132,9 @@ class ChildList {
   }
 
   void place(const Pointer& child, std::size_t index) {
+    const Uninterrupted whole;
+    // Room first: nothing fails between the child's back-pointer and its place.
+    if (_children.size() == _children.capacity()) _children.reserve(std::max<std::size_t>(4, 2 * _children.size()));
     if (_setOwner) ((*child).*_setOwner)(std::static_pointer_cast<Owner>(_owner.shared_from_this()));
     change([&] { _children.insert(at(_children, index), child); });
   }

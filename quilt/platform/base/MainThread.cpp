@@ -10,6 +10,7 @@
 #include <vector>
 
 #include "quilt/platform/base/MonitorWait.h"
+#include "quilt/platform/base/Uninterrupted.h"
 
 namespace quilt::platform {
 
@@ -50,6 +51,7 @@ std::vector<ThreadIdentity>& actingFor() {
 void run(QueuedBlock& queued) {
   actingFor().push_back(queued.caller);
   try {
+    const Uninterrupted::Suspended anew;  // it belongs to another thread's operation, not to what this one waits in
     (*queued.block)();
   } catch (...) {
     queued.thrown = std::current_exception();
@@ -114,12 +116,20 @@ void MainThread::performBlock(const std::function<void()>& block) {
     wake = queue().wake;
   }
   queue().mainMayRun.notify_all();
-  if (wake) wake();
+  std::exception_ptr thrown;
+  try {
+    if (wake) wake();
+  } catch (...) {
+    thrown = std::current_exception();
+  }
   {
     std::unique_lock lock(queue().mutex);
+    // Without its wake the main thread may never come: the block is taken back, unless it runs already.
+    if (thrown && std::erase(queue().blocks, &queued) > 0) std::rethrow_exception(thrown);
     queue().blockDone.wait(lock, [&queued] { return queued.done; });
   }
   if (queued.thrown) std::rethrow_exception(queued.thrown);
+  if (thrown) std::rethrow_exception(thrown);
 }
 
 void MainThread::setWakeFunction(std::function<void()> wake) {

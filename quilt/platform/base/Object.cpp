@@ -6,6 +6,7 @@
 
 #include "quilt/platform/base/MainThread.h"
 #include "quilt/platform/base/RecursiveMonitor.h"
+#include "quilt/platform/base/Uninterrupted.h"
 
 namespace quilt::platform {
 
@@ -116,11 +117,18 @@ void Object::changeOnMainThread(std::string_view key, const std::function<void()
     mutation();
     return;
   }
-  MainThread::performBlock([&] {
-    willChangeValueForKey(key);
-    mutation();
-    didChangeValueForKey(key);
-  });
+  const Uninterrupted whole;
+  try {
+    MainThread::performBlock([&] {
+      const Uninterrupted change;
+      willChangeValueForKey(key);
+      mutation();
+      didChangeValueForKey(key);
+    });
+  } catch (...) {
+    // On its way here from the main thread: the observers' own, after the change.
+    Uninterrupted::hold(std::current_exception());
+  }
 }
 
 void Object::performBlockOnMainThread(const std::function<void()>& block) { MainThread::performBlock(block); }
@@ -128,6 +136,7 @@ void Object::performBlockOnMainThread(const std::function<void()>& block) { Main
 std::vector<std::string_view> Object::keysDependingOn(std::string_view) const { return {}; }
 
 void Object::announce(std::string_view key, ChangePhase phase) {
+  const Uninterrupted whole;
   notify(key, phase);
   for (const std::string_view dependent : keysDependingOn(key)) notify(dependent, phase);
 }
@@ -141,7 +150,14 @@ void Object::notify(std::string_view key, ChangePhase phase) {
       if (entry->key == key && (phase == ChangePhase::Did || entry->options == ObservationOptions::Prior))
         listeners.push_back(entry);
   }
-  for (const auto& entry : listeners) entry->tell(ChangeNotice{*this, key, phase});
+  for (const auto& entry : listeners) {
+    try {
+      const Uninterrupted::Suspended anew;
+      entry->tell(ChangeNotice{*this, key, phase});
+    } catch (...) {
+      Uninterrupted::hold(std::current_exception());
+    }
+  }
 }
 
 }  // namespace quilt::platform

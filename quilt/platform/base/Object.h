@@ -43,7 +43,8 @@ class QUILT_EXPORT Object : public std::enable_shared_from_this<Object> {
   [[nodiscard]] bool isObserved(std::string_view key) const;
 
   /// Makes a change that observers see on the main thread: will-change, the mutation, did-change. When no one observes
-  /// the key, the mutation is made at once where it is.
+  /// the key, the mutation is made at once where it is. What an observer throws is thrown here, after the change; so is
+  /// what the mutation throws.
   void changeOnMainThread(std::string_view key, const std::function<void()>& mutation);
 
   /// Runs the block on the main thread and returns after it has run; at once when called there.

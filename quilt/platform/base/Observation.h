@@ -30,7 +30,8 @@ struct ChangeNotice {
 };
 
 /// Called on the thread that changes the value: the setting thread for a property, the main thread for a list. When
-/// two threads set a property at once, it runs on both at once.
+/// two threads set a property at once, it runs on both at once. What it throws goes to whoever called the operation
+/// that changes the value, once the change is whole and every other observer has been told.
 using ChangeObserver = std::function<void(const ChangeNotice&)>;
 
 /// An observation that ends with the handle. After reset() or destruction the observer is not running on any other

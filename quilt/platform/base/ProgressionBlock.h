@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <algorithm>
+#include <cstddef>
 #include <functional>
 #include <memory>
 
@@ -27,10 +29,18 @@ bool report(const ObjectProgressionBlock<T>& block, const std::shared_ptr<T>& ob
   return !block || block(object, percentage);
 }
 
-/// (done × 100) / total in unsigned integer arithmetic, the percentage of a walk over `total` steps; total is not 0.
+/// (done × 100) / total in unsigned integer arithmetic, the percentage of a walk over `total` steps. A walk that found
+/// more to do than was counted stays at 100; one for which nothing was counted begins at 0.
 inline double integerPercentage(std::size_t done, std::size_t total) {
-  const std::size_t percentage = done * 100 / total;
-  return static_cast<double>(percentage);
+  const std::size_t percentage = done * 100 / std::max<std::size_t>(total, 1);
+  return static_cast<double>(std::min<std::size_t>(percentage, 100));
+}
+
+/// Where a `percentage` of the step that begins at `start` lies among `total` steps of equal width. A step that was
+/// counted has its place; one that came after the count (`isLate`) ends at 100, and is the whole when none was counted.
+inline double percentageInStep(double start, double percentage, std::size_t total, bool isLate) {
+  const double inWalk = start + percentage / static_cast<double>(std::max<std::size_t>(total, 1));
+  return isLate ? std::min(inWalk, 100.0) : inWalk;
 }
 
 }  // namespace quilt::platform

@@ -7,11 +7,13 @@
 #include <utility>
 
 #include "quilt/platform/base/Object.h"
+#include "quilt/platform/base/Uninterrupted.h"
 
 namespace quilt::platform {
 
 /// One observable value of an object. Each get and each set is indivisible; every set announces its key, before and
-/// after, on the setting thread and with no lock held, also when the value stays the same.
+/// after, on the setting thread and with no lock held, also when the value stays the same. An observer that throws
+/// stops neither the change nor the other observers; what it throws comes out of the set, when the value is set.
 template <class T>
 class Property {
  public:
@@ -36,6 +38,7 @@ class Property {
 
   /// Sets the value between its announcements.
   void set(T value) {
+    const Uninterrupted whole;
     _owner.willChangeValueForKey(_key);
     store(std::move(value));
     _owner.didChangeValueForKey(_key);
@@ -43,6 +46,7 @@ class Property {
 
   /// Sets the value, with its announcements, and answers the old one; no other set comes between.
   T exchange(T value) {
+    const Uninterrupted whole;
     _owner.willChangeValueForKey(_key);
     {
       const std::lock_guard guard(_owner._mutex);

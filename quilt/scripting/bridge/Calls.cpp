@@ -184,6 +184,8 @@ http::Response Calls::call(const std::string& body) {
             act();
         } catch (const std::exception& error) {
           done->result = platform::Error{ErrorKind::InputOutput, error.what(), {}};
+        } catch (...) {
+          done->result = platform::Error{ErrorKind::InputOutput, "A host's observer threw", {}};
         }
       },
       _within);

@@ -2,6 +2,7 @@
 #include "quilt/scripting/bridge/EditKeeper.h"
 
 #include "quilt/documents/DataScript.h"
+#include "quilt/platform/base/CleanUp.h"
 #include "quilt/platform/interfaces/Services.h"
 
 namespace quilt::scripting {
@@ -30,8 +31,7 @@ bool EditKeeper::keep(const std::function<bool()>& edit) {
   const auto before = recordOf(*_document);
   _hasSaved = false;
   _editor = std::this_thread::get_id();
-  const bool hasEdited = edit();
-  _editor = std::thread::id();
+  const bool hasEdited = platform::withCleanUp(edit, [this] { _editor = std::thread::id(); });
   if (!hasEdited) return true;
   // By the model itself. A save of another thread may have read the document before the edit.
   if (_hasSaved && recordOf(*_document) != before) return true;

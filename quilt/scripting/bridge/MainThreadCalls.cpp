@@ -3,6 +3,7 @@
 
 #include <utility>
 
+#include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/base/MainThread.h"
 
 namespace quilt::scripting {
@@ -46,7 +47,12 @@ void MainThreadCalls::run(Call& call) {
     if (call.state != State::Waiting || _isEnding) return;
     call.state = State::Running;
   }
-  std::exchange(call.block, nullptr)();  // what it holds goes before the caller learns that it is done
+  try {
+    std::exchange(call.block, nullptr)();  // what it holds goes before the caller learns that it is done
+  } catch (...) {
+    // A block that has someone to tell catches by itself; the courier has no one.
+    platform::FDYLogger::logCritical("Something unexpected happened on the main thread");
+  }
   {
     const std::lock_guard guard(_mutex);
     call.state = State::Done;
