@@ -657,8 +657,10 @@ TEST_F(QuiltCollectionTest, ResettingTheModificationDateSavesWithAFreshStamp) {
 TEST_F(QuiltCollectionTest, ResettingTheModificationDateWhileLoadingKeepsTheCreationDate) {
   const auto collection = made();
   collection->setIsLoading(true);
+  collection->setCreationDate(dateOf("2001-01-01T00:00:00Z"));
+  ASSERT_TRUE(collection->hasBeenModified());
   collection->resetModifiedDate();
-  EXPECT_EQ(collection->modifiedDate(), collection->creationDate());
+  EXPECT_EQ(collection->modifiedDate(), dateOf("2001-01-01T00:00:00Z"));
   EXPECT_FALSE(collection->hasBeenModified());
 }
 

@@ -387,13 +387,16 @@ TEST_F(QuiltCollectionDocumentsTest, APackageWhoseMediaRecordsAreAllRefusedStays
 
 TEST_F(QuiltCollectionDocumentsTest, ANewDocumentTakesAuthorAndThemeAndIsSaved) {
   collection->setAuthor("Ann");
+  const auto theme = QuiltTheme::initWithPath(QUILT_SOURCE_FOLDER "/quilt/resources/themes/olive.qth");
+  ASSERT_NE(theme, nullptr);
+  collection->setPreferredTheme(theme);
   takeLines();
 
   const auto document = collection->newDocumentWithType(kQuiltDocumentTypeInteractive);
 
   ASSERT_TRUE(document);
   EXPECT_EQ(document->author(), "Ann");
-  EXPECT_EQ(document->theme(), collection->preferredTheme());
+  EXPECT_EQ(document->theme(), theme);
   EXPECT_EQ(document->type(), "Interactive");
   EXPECT_EQ(document->collectionOwner(), collection);
   EXPECT_EQ(collection->documentAtIndex(0), document);
@@ -403,6 +406,7 @@ TEST_F(QuiltCollectionDocumentsTest, ANewDocumentTakesAuthorAndThemeAndIsSaved) 
   const Dictionary record = readRecord(document->propertiesPath());
   EXPECT_EQ(record.string("Author"), "Ann");
   EXPECT_EQ(record.string("Type"), "Interactive");
+  EXPECT_EQ(record.string("ThemePath"), theme->path().native());
   Lines expected{debug("Created new document at \"" + document->path().native() + "\"")};
   for (const Line& line : saves({"author", "theme", "creationDate"})) expected.push_back(line);
   EXPECT_EQ(takeLines(), expected);

@@ -378,6 +378,7 @@ TEST_F(QuiltCollectionsControllerTest, ANewCollectionIsMadeInTheFolderOfItsIdent
   EXPECT_EQ(collection->path(), directory() / uuid);
   EXPECT_EQ(collection->collectionControllerOwner(), controller);
   EXPECT_FALSE(collection->hasBeenModified());
+  ASSERT_TRUE(collection->creationDate());
   EXPECT_EQ(collection->creationDate(), collection->modifiedDate());
   EXPECT_EQ(controller->collectionWithUUID(uuid), collection);
   EXPECT_TRUE(std::filesystem::exists(directory() / uuid / "collection.plist"));

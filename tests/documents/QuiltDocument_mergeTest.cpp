@@ -64,6 +64,8 @@ class QuiltDocumentMergeTest : public support::DocumentFixture {
 TEST_F(QuiltDocumentMergeTest, EveryFieldIsCopied) {
   const auto collection = QuiltCollection::initWithPath(folder() / "collection");
   const auto theme = QuiltTheme::initWithPath(themeBundle());
+  ASSERT_NE(theme, nullptr);
+  ASSERT_NE(collection, nullptr);
   source->setUuid("SOURCE");
   source->setDescription("Description");
   source->setAuthor("Author");

@@ -62,7 +62,8 @@ TEST_F(QuiltDocumentRepresentationsTest, ANewPosterRaisesTheVersionAndIsShownByI
 TEST_F(QuiltDocumentRepresentationsTest, ADeletedPosterFileLeavesTheCachedImage) {
   const auto document = made();
   document->updatePosterImage(picture(40, 30));
-  std::filesystem::remove(document->posterImagePath());
+  ASSERT_TRUE(std::filesystem::remove(document->posterImagePath()));
+  ASSERT_NE(document->posterImage(), nullptr);
   EXPECT_EQ(document->imageRepresentationType(), kImageBrowserImageRepresentationType);
   EXPECT_EQ(document->imageRepresentation(), ImageRepresentation(document->posterImage()));
 }

@@ -276,6 +276,7 @@ TEST_F(QuiltMediaTest, UnknownKeysAreWrittenBackAfterOurs) {
 }
 
 TEST_F(QuiltMediaTest, TheRecordLooksAtEachFileOnceAndSaysSoEachTimeWhenItIsGone) {
+  keepDocumentBusy();
   class CountingFiles final : public platform::ForwardingFileManager {
    public:
     CountingFiles() : ForwardingFileManager(platform::services().files) {}
@@ -311,6 +312,7 @@ TEST_F(QuiltMediaTest, TheRecordLooksAtEachFileOnceAndSaysSoEachTimeWhenItIsGone
 }
 
 TEST_F(QuiltMediaTest, ARecordSurvivesTheRoundTrip) {
+  keepDocumentBusy();
   addSource(pictureFile(64, 48));
   item()->setTitle("T");
   item()->setDescription("D");
@@ -339,6 +341,7 @@ TEST_F(QuiltMediaTest, TheOnlySourceGivesTheCategoryForGood) {
 }
 
 TEST_F(QuiltMediaTest, TwoSourcesGiveNoCategory) {
+  keepDocumentBusy();
   addSource(pictureFile(8, 8));
   item()->addSource(link());
   EXPECT_EQ(item()->contentCategory(), std::nullopt);
@@ -412,6 +415,7 @@ TEST_F(QuiltMediaTest, AMontageLastsAsLongAsItsCommentary) {
 }
 
 TEST_F(QuiltMediaTest, OtherItemsHaveNoDuration) {
+  keepDocumentBusy();
   item()->addSource(playing(3));
   item()->addSource(playing(3));
   item()->setAudioCommentarySource(playing(3));

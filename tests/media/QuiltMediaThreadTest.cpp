@@ -110,6 +110,7 @@ TEST_F(QuiltMediaThreadTest, EveryReadOfAListWaitsForTheWalkOverIt) {
 }
 
 TEST_F(QuiltMediaThreadTest, ALongOperationHoldsTheListOfTheChildThatItDrivesAndNeverBoth) {
+  keepDocumentBusy();
   addLink();
   addExtraLink();
   const auto stages = [this](const std::function<bool(const ProgressionBlock&)>& operation) {
@@ -143,7 +144,6 @@ TEST_F(QuiltMediaThreadTest, AnOperationThatFailsLeavesNoListLocked) {
 }
 
 TEST_F(QuiltMediaThreadTest, AChangeMadeByAWorkerIsSeenOnTheMainThreadAndSavedAfterIt) {
-  letDocumentSave();
   std::vector<bool> onMainThread;
   const auto observation = item()->observe(
       "sources", [&](const auto&) { onMainThread.push_back(MainThread::isCurrent()); },

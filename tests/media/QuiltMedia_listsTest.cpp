@@ -178,7 +178,6 @@ TYPED_TEST(QuiltMediaListsTest, AChildIsAttachedBeforeItIsSeen) {
 }
 
 TYPED_TEST(QuiltMediaListsTest, NoneIsIgnored) {
-  this->letDocumentSave();
   const Installed<FaultyPropertyLists> lists(&Services::propertyLists);
   int announced = 0;
   const auto observation = this->observe([&](bool) { ++announced; });
@@ -213,7 +212,6 @@ TYPED_TEST(QuiltMediaListsTest, AGroupMovesToAPositionCountedBeforeTheMove) {
 
 TYPED_TEST(QuiltMediaListsTest, MovingNothingIsAnnouncedAndSavedAllTheSame) {
   this->fill("AB");
-  this->letDocumentSave();
   const Installed<FaultyPropertyLists> lists(&Services::propertyLists);
   std::vector<bool> phases;
   const auto observation = this->observe([&](bool before) { phases.push_back(before); });
@@ -316,7 +314,6 @@ TYPED_TEST(QuiltMediaListsTest, RemovingAllDeletesAnnouncesAndSavesForEachInOrde
   this->fill("ABC");
   for (const auto& child : TypeParam::all(*this->item())) this->withFiles(child);
   const Path parent = TypeParam::at(*this->item(), 0)->path().parent_path();
-  this->letDocumentSave();
   const Installed<FaultyPropertyLists> lists(&Services::propertyLists);
   std::vector<std::string> after;
   const auto observation = this->observe([&](bool before) {
@@ -331,7 +328,6 @@ TYPED_TEST(QuiltMediaListsTest, RemovingAllDeletesAnnouncesAndSavesForEachInOrde
 // ---- Saving
 
 TYPED_TEST(QuiltMediaListsTest, EachChangeSavesTheDocumentAfterItWasMade) {
-  this->letDocumentSave();
   const Installed<FaultyPropertyLists> lists(&Services::propertyLists);
   const auto savedNames = [this] {
     const Dictionary record = this->readRecord(this->document()->propertiesPath());
@@ -356,6 +352,7 @@ TYPED_TEST(QuiltMediaListsTest, EachChangeSavesTheDocumentAfterItWasMade) {
 }
 
 TYPED_TEST(QuiltMediaListsTest, NothingIsSavedWhileTheDocumentIsProcessing) {
+  this->keepDocumentBusy();
   const Installed<FaultyPropertyLists> lists(&Services::propertyLists);
   this->moved({0}, 2);
   TypeParam::removeAll(*this->item());
@@ -465,7 +462,6 @@ TEST_F(QuiltMediaCommentaryTest, ReplacingDeletesNoFileAndSavesNothing) {
   const auto commentary = QuiltMediaSource::init();
   item()->setAudioCommentarySource(commentary);
   const Path file = writeFile(commentary->path() / "derivatives/d.m4a", "content");
-  letDocumentSave();
   const Installed<FaultyPropertyLists> lists(&Services::propertyLists);
   item()->setAudioCommentarySource(QuiltMediaSource::init());
   item()->setAudioCommentarySource(nullptr);

@@ -218,6 +218,7 @@ TEST_F(QuiltMediaOperationsTest, FlatteningCopiesEveryChildIntoTheItemsFolder) {
 }
 
 TEST_F(QuiltMediaOperationsTest, ASourceThatIsFlattenedStillTakesItsStep) {
+  keepDocumentBusy();
   const Installed<HalfwayFiles> files(&Services::files);
   addSource(pictureFile(64, 48));
   added(flattenedLink());
@@ -231,6 +232,7 @@ TEST_F(QuiltMediaOperationsTest, ASourceThatIsFlattenedStillTakesItsStep) {
 }
 
 TEST_F(QuiltMediaOperationsTest, AnExtraThatIsFlattenedTakesNoStep) {
+  keepDocumentBusy();
   addLink();
   item()->addExtra(flattenedLink<QuiltMediaExtra>());
   addExtraLink();
@@ -239,6 +241,7 @@ TEST_F(QuiltMediaOperationsTest, AnExtraThatIsFlattenedTakesNoStep) {
 }
 
 TEST_F(QuiltMediaOperationsTest, TheCommentaryTakesTheStepBetweenSourcesAndExtras) {
+  keepDocumentBusy();
   addLink();
   item()->addExtra(flattenedLink<QuiltMediaExtra>());
   addExtraLink();
@@ -248,6 +251,7 @@ TEST_F(QuiltMediaOperationsTest, TheCommentaryTakesTheStepBetweenSourcesAndExtra
 }
 
 TEST_F(QuiltMediaOperationsTest, ACommentaryThatIsFlattenedStillTakesItsStep) {
+  keepDocumentBusy();
   addLink();
   addExtraLink();
   item()->setAudioCommentarySource(flattenedLink());
@@ -293,6 +297,7 @@ TEST_F(QuiltMediaOperationsTest, AFlattenWithoutAPathFails) {
 }
 
 TEST_F(QuiltMediaOperationsTest, AFlattenFailsWithoutTheItemsFolder) {
+  keepDocumentBusy();
   addLink();
   EXPECT_FALSE(flattenFailingAt(at(item()->path())));
   EXPECT_EQ(takeLines(), (Lines{flattening(), noFolder(kNoMediaFolder, item()->path()), flattenFailed()}));
@@ -307,6 +312,7 @@ TEST_F(QuiltMediaOperationsTest, AFlattenFailsWithoutTheSourcesFolder) {
 }
 
 TEST_F(QuiltMediaOperationsTest, AFlattenFailsWithoutTheExtrasFolderWhenSourcesAndCommentaryAreDone) {
+  keepDocumentBusy();
   const auto source = addLink();
   const auto commentary = setCommentaryLink();
   addExtraLink();
@@ -334,6 +340,7 @@ TEST_F(QuiltMediaOperationsTest, AFlattenFailsWithASourceAndKeepsWhatWasDone) {
 }
 
 TEST_F(QuiltMediaOperationsTest, AFlattenFailsWithTheCommentary) {
+  keepDocumentBusy();
   const auto source = addLink();
   const auto commentary = setCommentaryLink();
   EXPECT_FALSE(flattenFailingAt(at(commentary->path())));
@@ -345,6 +352,7 @@ TEST_F(QuiltMediaOperationsTest, AFlattenFailsWithTheCommentary) {
 }
 
 TEST_F(QuiltMediaOperationsTest, AFlattenFailsWithAnExtra) {
+  keepDocumentBusy();
   const auto source = addLink();
   const auto first = addExtraLink();
   const auto second = addExtraLink();
@@ -359,6 +367,7 @@ TEST_F(QuiltMediaOperationsTest, AFlattenFailsWithAnExtra) {
 }
 
 TEST_F(QuiltMediaOperationsTest, ACancelInsideACopyFailsTheFlattenAndLeavesNoFile) {
+  keepDocumentBusy();
   const Installed<HalfwayFiles> files(&Services::files);
   const auto source = addSource(pictureFile(64, 48));
   addSource(pictureFile(32, 24));
@@ -375,6 +384,7 @@ TEST_F(QuiltMediaOperationsTest, ACancelInsideACopyFailsTheFlattenAndLeavesNoFil
 }
 
 TEST_F(QuiltMediaOperationsTest, AFlattenIsNotLedOutOfTheDocumentByALink) {
+  keepDocumentBusy();
   const auto source = addSource(pictureFile(64, 48));
   const Path outside = folder() / "outside";
   std::filesystem::create_directories(outside);
@@ -465,6 +475,7 @@ TEST_F(QuiltMediaOperationsTest, FinalizingLogsTheItemAndThenEachChildInOrder) {
 }
 
 TEST_F(QuiltMediaOperationsTest, ThePosterIsThereBeforeAChildIsFinalized) {
+  keepDocumentBusy();
   addLink();
   std::vector<bool> wasThere;
   EXPECT_TRUE(item()->finalizeWithProgressionBlock([&](double) {
@@ -475,6 +486,7 @@ TEST_F(QuiltMediaOperationsTest, ThePosterIsThereBeforeAChildIsFinalized) {
 }
 
 TEST_F(QuiltMediaOperationsTest, AnItemWithoutAPosterIsFinalizedAllTheSame) {
+  keepDocumentBusy();
   addLink();
   writeFile(item()->posterImagePath(), "no image");
   takeLines();
@@ -523,6 +535,7 @@ TEST_F(QuiltMediaOperationsTest, AFinalizeWithoutAPathFails) {
 }
 
 TEST_F(QuiltMediaOperationsTest, AFinalizeFailsWithoutTheItemsFolder) {
+  keepDocumentBusy();
   addLink();
   EXPECT_FALSE(finalizeFailingAt(at(item()->path())));
   EXPECT_EQ(takeLines(), (Lines{finalizing(), noFolder(kNoMediaFolder, item()->path()), finalizeFailed()}));
@@ -694,6 +707,7 @@ class QuiltMediaExportTest : public QuiltMediaOperationsTest {
  protected:
   /// An item of a document that may be worked on, with two pictures.
   QuiltMediaExportTest() {
+    keepDocumentBusy();  // what is exported has no poster yet
     document()->setTitle("Talk");
     addSource(pictureFile(64, 48));
     addSource(pictureFile(32, 24));
@@ -828,7 +842,6 @@ TEST_F(QuiltMediaExportTest, AFalseAnswerStopsTheStageItIsGivenTo) {
 
 TEST_F(QuiltMediaExportTest, TheFirstAndTheLastAnswerHaveNoEffect) {
   item()->removeAllSources();
-  letDocumentSave();
   std::vector<double> seen;
   EXPECT_TRUE(item()->exportToPath(destination(), "Desktop", [&](double value) {
     seen.push_back(value);

@@ -45,6 +45,7 @@ class QuiltMediaPosterTest : public support::PackageFixture {
 // ---- Making it
 
 TEST_F(QuiltMediaPosterTest, TheFirstSourcesPictureIsKeptInStandardDefinitionAndSaved) {
+  keepDocumentBusy();
   addSource(pictureFile(1280, 960));
   addSource(pictureFile(8, 8));
   takeLines();
@@ -74,6 +75,7 @@ TEST_F(QuiltMediaPosterTest, AMovieShowsAFrame) {
 }
 
 TEST_F(QuiltMediaPosterTest, ThePosterIsMadeOnce) {
+  keepDocumentBusy();
   addSource(pictureFile(64, 48));
   const auto poster = item()->posterImage();
   std::filesystem::remove(posterFile());
@@ -83,6 +85,7 @@ TEST_F(QuiltMediaPosterTest, ThePosterIsMadeOnce) {
 }
 
 TEST_F(QuiltMediaPosterTest, APosterThatWasSetIsAnsweredAsItIs) {
+  keepDocumentBusy();
   const auto set = picture(2000, 1000);
   item()->setPosterImage(set);
   EXPECT_EQ(item()->posterImage(), set);
@@ -91,6 +94,7 @@ TEST_F(QuiltMediaPosterTest, APosterThatWasSetIsAnsweredAsItIs) {
 }
 
 TEST_F(QuiltMediaPosterTest, TheSaveThatANewPosterAsksForKnowsItsSize) {
+  keepDocumentBusy();
   addSource(pictureFile(64, 48));
   letDocumentSave();
   ASSERT_NE(item()->posterImage(), nullptr);
@@ -103,6 +107,7 @@ TEST_F(QuiltMediaPosterTest, TheSaveThatANewPosterAsksForKnowsItsSize) {
 // ---- None to be had
 
 TEST_F(QuiltMediaPosterTest, WithoutAPreviewThereIsNoneAndNoMessage) {
+  keepDocumentBusy();
   EXPECT_EQ(item()->posterImage(), nullptr);
   EXPECT_EQ(item()->posterImageVersion(), 2u) << "raised all the same";
   addEmptySource();
@@ -113,6 +118,7 @@ TEST_F(QuiltMediaPosterTest, WithoutAPreviewThereIsNoneAndNoMessage) {
 }
 
 TEST_F(QuiltMediaPosterTest, AFirstSourceWithoutAPosterOfItsOwnGivesNone) {
+  keepDocumentBusy();
   const auto source = addSource(pictureFile(8, 8));
   source->addPreview(QuiltMediaPreview::initWithDictionary({{"Index", 0}, {"IsFlattened", true}}, source));
   takeLines();
@@ -137,6 +143,7 @@ TEST_F(QuiltMediaPosterTest, ACompositionThatAnotherRunSavedIsShown) {
 // ---- Reading it
 
 TEST_F(QuiltMediaPosterTest, APosterFileIsReducedAndNeitherSavedAgainNorCounted) {
+  keepDocumentBusy();
   addSource(pictureFile(64, 48));
   const std::string before = readFile(writePoster(1280, 960));
   const Installed<FaultyImages> images(&Services::images);
@@ -150,6 +157,7 @@ TEST_F(QuiltMediaPosterTest, APosterFileIsReducedAndNeitherSavedAgainNorCounted)
 }
 
 TEST_F(QuiltMediaPosterTest, APosterFileThatIsNoImageIsReportedEachTimeAndStays) {
+  keepDocumentBusy();
   addSource(pictureFile(64, 48));
   writeFile(posterFile(), "no image");
   takeLines();
@@ -164,6 +172,7 @@ TEST_F(QuiltMediaPosterTest, APosterFileThatIsNoImageIsReportedEachTimeAndStays)
 }
 
 TEST_F(QuiltMediaPosterTest, APosterFileThatLeadsOutOfTheDocumentIsNotRead) {
+  keepDocumentBusy();
   addSource(pictureFile(64, 48));
   const Path outside = pictureFile(32, 24, "jpg");
   std::filesystem::create_directories(item()->path());
@@ -178,6 +187,7 @@ TEST_F(QuiltMediaPosterTest, APosterFileThatLeadsOutOfTheDocumentIsNotRead) {
 // ---- Faults
 
 TEST_F(QuiltMediaPosterTest, AFolderThatCannotBeMadeIsCriticalAndTheSaveIsStillTried) {
+  keepDocumentBusy();
   const Installed<FaultyImages> images(&Services::images);
   addSource(pictureFile(64, 48));
   const Installed<FaultyFiles> files(&Services::files);
@@ -205,6 +215,7 @@ TEST_F(QuiltMediaPosterTest, AFailedSaveIsNotReported) {
 }
 
 TEST_F(QuiltMediaPosterTest, APosterIsNotWrittenThroughAFolderThatLeadsOutOfTheDocument) {
+  keepDocumentBusy();
   addSource(pictureFile(64, 48));
   const Path outside = folder() / "outside";
   std::filesystem::create_directories(outside);
@@ -265,6 +276,7 @@ TEST_F(QuiltMediaPosterTest, AfterTheCachesWereDroppedTheFileIsReadAndTheVersion
 }
 
 TEST_F(QuiltMediaPosterTest, AfterThePosterWasInvalidatedItIsDrawnAnewAndTheVersionHasGrownByTwo) {
+  keepDocumentBusy();
   addSource(pictureFile(64, 48));
   writePoster(20, 10);
   ASSERT_EQ(item()->posterImage()->size(), (Size{20, 10}));
@@ -280,6 +292,7 @@ TEST_F(QuiltMediaPosterTest, AfterThePosterWasInvalidatedItIsDrawnAnewAndTheVers
 }
 
 TEST_F(QuiltMediaPosterTest, InvalidatingWithoutAFileLogsNothing) {
+  keepDocumentBusy();
   item()->invalidatePosterImage();
   EXPECT_EQ(item()->posterImageVersion(), 2u);
   EXPECT_THAT(takeLines(), IsEmpty());
@@ -295,6 +308,7 @@ TEST_F(QuiltMediaPosterTest, InvalidatingWithoutADocumentOnlyDropsTheCacheAndRai
 }
 
 TEST_F(QuiltMediaPosterTest, APosterFileThatCannotBeDeletedIsReportedAndTheCacheIsDroppedAllTheSame) {
+  keepDocumentBusy();
   const auto cached = picture(8, 8);
   item()->setPosterImage(cached);
   writePoster(20, 10);
@@ -309,6 +323,7 @@ TEST_F(QuiltMediaPosterTest, APosterFileThatCannotBeDeletedIsReportedAndTheCache
 }
 
 TEST_F(QuiltMediaPosterTest, ObserversHearOfEachNewVersion) {
+  keepDocumentBusy();
   std::vector<std::uint64_t> versions;
   const auto observation =
       item()->observe("posterImageVersion", [&](const auto&) { versions.push_back(item()->posterImageVersion()); });

@@ -64,8 +64,8 @@ TEST_F(QuiltMediaRepresentationsTest, AMontageIsShownByItsPosterFile) {
 
 TEST_F(QuiltMediaRepresentationsTest, AMontageWhosePosterFileWasDeletedIsShownAsABitmapUntilItIsDrawnAgain) {
   makeMontage();
-  item()->posterImage();
-  std::filesystem::remove(item()->posterImagePath());
+  ASSERT_NE(item()->posterImage(), nullptr);
+  ASSERT_TRUE(std::filesystem::remove(item()->posterImagePath()));
   EXPECT_EQ(item()->imageRepresentationType(), kImageBrowserBitmapRepresentationType);
   EXPECT_EQ(item()->imageRepresentation(), ImageRepresentation(item()->posterImage()));
   item()->invalidatePosterImage();
@@ -73,6 +73,7 @@ TEST_F(QuiltMediaRepresentationsTest, AMontageWhosePosterFileWasDeletedIsShownAs
 }
 
 TEST_F(QuiltMediaRepresentationsTest, ADualSourceItemWithoutAPosterHasNothingToShow) {
+  keepDocumentBusy();
   addSource(pictureFile(8, 8));
   item()->setContentCategory(kQuiltMediaContentCategoryDualSource);
   EXPECT_EQ(item()->imageRepresentationType(), kImageBrowserBitmapRepresentationType);
@@ -80,6 +81,7 @@ TEST_F(QuiltMediaRepresentationsTest, ADualSourceItemWithoutAPosterHasNothingToS
 }
 
 TEST_F(QuiltMediaRepresentationsTest, TheVersionRisesWhenThePosterIsDrawnOrInvalidated) {
+  keepDocumentBusy();
   makeMontage();
   const std::uint64_t before = item()->imageVersion();
   item()->posterImage();

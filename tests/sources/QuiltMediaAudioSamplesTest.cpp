@@ -97,6 +97,7 @@ TEST_F(QuiltMediaAudioSamplesTest, ACopyIsASecondObjectWithTheSameValuesAndOwner
   const auto copy = samples->copy();
   EXPECT_NE(copy, samples);
   EXPECT_EQ(copy->uuid(), "S");
+  EXPECT_TRUE(copy->sampleURL() && copy->sourceURL());
   EXPECT_EQ(copy->sampleURL(), samples->sampleURL());
   EXPECT_EQ(copy->sourceURL(), samples->sourceURL());
   EXPECT_TRUE(copy->isFlattened());

@@ -268,6 +268,7 @@ TEST_F(QuiltMediaDerivativeFlattenTest, WhateverChangeOfTheDiskFailsNothingIsLef
 // ---- Export
 
 TEST_F(QuiltMediaDerivativeFlattenTest, ExportingTwiceCountsWithTheTitleAsItIs) {
+  keepDocumentBusy();
   const auto derivative = outside();
   document()->setTitle("My.Show/1");
   EXPECT_EQ(derivative->exportToPath(exports(), progress.block()), exports() / "My_Show-1.m4v");

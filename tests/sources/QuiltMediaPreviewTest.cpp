@@ -101,17 +101,20 @@ class QuiltMediaPreviewTest : public support::PackageFixture {
 };
 
 TEST_F(QuiltMediaPreviewTest, ALongMovieIsShownAtTenSecondsAndAShortOneInTheMiddle) {
+  keepDocumentBusy();
   EXPECT_EQ(posterTimeOf([](ToldMovie& movie) { movie.theDuration = 90; }), 10);
   EXPECT_EQ(posterTimeOf([](ToldMovie& movie) { movie.theDuration = 12; }), 6);
   EXPECT_EQ(posterTimeOf([](ToldMovie& movie) { movie.theDuration = 20; }), 10);
 }
 
 TEST_F(QuiltMediaPreviewTest, TheTimeMovesBackToItsKeyFrameUnlessThatIsTheStart) {
+  keepDocumentBusy();
   EXPECT_EQ(posterTimeOf([](ToldMovie& movie) { movie.theDuration = 90, movie.theKeyFrame = 8.5; }), 8.5);
   EXPECT_EQ(posterTimeOf([](ToldMovie& movie) { movie.theDuration = 90, movie.theKeyFrame = 0; }), 10);
 }
 
 TEST_F(QuiltMediaPreviewTest, TheAuthorsPosterTimeComesFirstUnlessItIsZero) {
+  keepDocumentBusy();
   EXPECT_EQ(posterTimeOf([](ToldMovie& movie) { movie.theDuration = 90, movie.thePosterTime = 42; }), 42);
   EXPECT_EQ(posterTimeOf([](ToldMovie& movie) { movie.theDuration = 90, movie.thePosterTime = 0; }), 10);
 }
@@ -151,6 +154,7 @@ TEST_F(QuiltMediaPreviewTest, AskingTwiceGivesTheSamePreview) {
 }
 
 TEST_F(QuiltMediaPreviewTest, APreviewThatWasRecordedButNeverWrittenIsMadeAgain) {
+  keepDocumentBusy();
   const auto source = addSource(pictureFile(8, 8));
   const auto recorded = QuiltMediaPreview::initWithDictionary({{"Index", 0}}, source);
   source->addPreview(recorded);
@@ -180,6 +184,7 @@ TEST_F(QuiltMediaPreviewTest, NothingHasNoPreviews) {
 }
 
 TEST_F(QuiltMediaPreviewTest, AMovieThatCannotBeOpenedSaysSo) {
+  keepDocumentBusy();
   const auto source = addSource(support::makeMedia(movieOf(1)));
   const auto toolkit = std::make_shared<ToldToolkit>();
   toolkit->opens = false;

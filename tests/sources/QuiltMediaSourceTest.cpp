@@ -199,7 +199,6 @@ TEST_F(QuiltMediaSourceTest, AvailableFormatsNameEachTagOnceInListOrder) {
 }
 
 TEST_F(QuiltMediaSourceTest, AddingAttachesAnnouncesAndSaves) {
-  letDocumentSave();
   const auto source = addEmptySource();
   std::vector<platform::ChangePhase> phases;
   const auto observation = source->observe(
@@ -217,6 +216,8 @@ TEST_F(QuiltMediaSourceTest, AddingAttachesAnnouncesAndSaves) {
 }
 
 TEST_F(QuiltMediaSourceTest, AddingWhileTheDocumentIsProcessingDoesNotSave) {
+  keepDocumentBusy();
+  std::filesystem::remove(document()->propertiesPath());
   addEmptySource()->addDerivative(derivativeTagged({"Desktop"}));
   EXPECT_FALSE(std::filesystem::exists(document()->propertiesPath()));
 }
@@ -370,6 +371,7 @@ TEST_F(QuiltMediaSourceTest, ThumbnailAndPosterAreCachedUntilInvalidated) {
 }
 
 TEST_F(QuiltMediaSourceTest, AThumbnailThatCannotBeMadeIsNotCached) {
+  keepDocumentBusy();
   const auto source = addEmptySource();
   const auto derivative = derivativeTagged({"Desktop"});
   derivative->setUrl(Url::fileUrl(folder() / "gone.jpg"));
@@ -382,6 +384,7 @@ TEST_F(QuiltMediaSourceTest, AThumbnailThatCannotBeMadeIsNotCached) {
 }
 
 TEST_F(QuiltMediaSourceTest, APosterWhosePreviewHasNoPictureSaysWhichUrl) {
+  keepDocumentBusy();
   const auto source = addSource(pictureFile(8, 8));
   source->addPreview(QuiltMediaPreview::initWithDictionary({{"Index", 0}, {"IsFlattened", true}}, source));
   takeLines();

@@ -194,7 +194,6 @@ TEST_F(QuiltMediaSourceAudioSamplesTest, SamplesWithoutValuesAreNamedAsNothing) 
 
 TEST_F(QuiltMediaSourceAudioSamplesTest, AddingSavesTheDocumentAlsoWhenItFails) {
   const auto source = soundSource();
-  letDocumentSave();
   std::filesystem::remove(document()->propertiesPath());
   source->addAudioSamples(flattenedSamples(*source, "S"));
   EXPECT_TRUE(std::filesystem::exists(document()->propertiesPath()));
@@ -204,6 +203,8 @@ TEST_F(QuiltMediaSourceAudioSamplesTest, AddingSavesTheDocumentAlsoWhenItFails) 
 }
 
 TEST_F(QuiltMediaSourceAudioSamplesTest, NothingIsSavedWhileTheDocumentIsProcessing) {
+  keepDocumentBusy();
+  std::filesystem::remove(document()->propertiesPath());
   const auto source = soundSource();
   const auto samples = flattenedSamples(*source, "S");
   source->addAudioSamples(samples);
@@ -245,6 +246,7 @@ TEST_F(QuiltMediaSourceAudioSamplesTest, ASourcesRecordCarriesItsSamples) {
   const auto loaded = QuiltMediaSource::initWithDictionary(record, item());
   ASSERT_NE(loaded->audioSamples(), nullptr);
   EXPECT_TRUE(loaded->audioSamples()->isFlattened());
+  EXPECT_GT(source->audioSamples()->totalSizeInMegaBytes(), 0);
   EXPECT_EQ(loaded->audioSamples()->totalSizeInMegaBytes(), source->audioSamples()->totalSizeInMegaBytes());
 }
 
@@ -309,7 +311,6 @@ TEST_F(QuiltMediaSourceAudioSamplesTest, ADeletionThatFailsIsLoggedAndTheSlotEmp
 
 TEST_F(QuiltMediaSourceAudioSamplesTest, RemovingSavesTheDocument) {
   const auto source = sampledSource();
-  letDocumentSave();
   std::filesystem::remove(document()->propertiesPath());
   source->removeAudioSamples(source->audioSamples());
   EXPECT_TRUE(std::filesystem::exists(document()->propertiesPath()));

@@ -564,7 +564,6 @@ TEST_F(QuiltMediaSourceConvertTest, ARealSoundIsConverted) {
 
 TEST_F(QuiltMediaSourceConvertTest, WhatWasMadeIsRecordedByName) {
   const auto source = this->source(pictureFile(1600, 1200));
-  letDocumentSave();
   EXPECT_TRUE(source->convertToFormat("720p", {}));
   document()->update();
   const Dictionary record = readRecord(document()->propertiesPath());

@@ -61,7 +61,6 @@ TEST_F(QuiltMediaSourceDerivativesTest, TheListKeepsTheOrderOfAddingAndEndsAtIts
 }
 
 TEST_F(QuiltMediaSourceDerivativesTest, RemovingAnnouncesSavesAndIgnoresNothing) {
-  letDocumentSave();
   const auto source = addEmptySource();
   const auto derivative = derivativeTagged({"Desktop"});
   source->addDerivative(derivative);
@@ -259,6 +258,7 @@ TEST_F(QuiltMediaSourceDerivativesTest, ReloadMapsTheCopyIntoTheRangeFromTwentyT
 }
 
 TEST_F(QuiltMediaSourceDerivativesTest, ACancelStopsTheCopyOfAReloadWhichEndsAllTheSame) {
+  keepDocumentBusy();
   const auto source = addEmptySource();
   const Path file = writeFile(folder() / "file.pdf", "%PDF-1.4");
   const Installed<ToldFiles> files(&Services::files);
@@ -310,7 +310,6 @@ TEST_F(QuiltMediaSourceDerivativesTest, ReloadDropsWhatWasMadeFromTheOldFile) {
 
 TEST_F(QuiltMediaSourceDerivativesTest, ReloadSavesAtTheEnd) {
   const auto source = addEmptySource();
-  letDocumentSave();
   EXPECT_TRUE(saves([&] { source->reloadWithFileAtPath(folder() / "gone.pdf", {}); }));
 }
 

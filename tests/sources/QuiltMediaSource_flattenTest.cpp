@@ -176,6 +176,7 @@ TEST_F(QuiltMediaSourceFlattenTest, EverythingComesToLieInTheSourcesFolder) {
 }
 
 TEST_F(QuiltMediaSourceFlattenTest, MovingTakesTheUsersFile) {
+  keepDocumentBusy();
   const auto source = soundSource();
   EXPECT_TRUE(source->flattenCopy(false, progress.block()));
   EXPECT_FALSE(std::filesystem::exists(folder() / "sound.m4a"));
@@ -196,6 +197,7 @@ TEST_F(QuiltMediaSourceFlattenTest, AnEmptySourceMakesItsFoldersAndHasNoSamples)
 }
 
 TEST_F(QuiltMediaSourceFlattenTest, AWebLinkIsFlattenedWithoutCopying) {
+  keepDocumentBusy();
   const auto source = QuiltMediaSource::initWithURL(*Url::parse("https://example.org/"));
   item()->addSource(source);
   takeLines();
@@ -391,7 +393,6 @@ TEST_F(QuiltMediaSourceFlattenTest, ACancelBetweenPreviewsHasItsOwnLineAlone) {
 
 TEST_F(QuiltMediaSourceFlattenTest, ASaveWaitsUntilTheFlattenIsDone) {
   const auto source = soundSource();
-  letDocumentSave();
   std::filesystem::remove(document()->propertiesPath());
   bool savedMeanwhile = false;
   EXPECT_TRUE(source->flattenCopy(true, [&](double) {

@@ -125,6 +125,7 @@ TEST_F(QuiltMediaSourcePreviewsTest, APreviewWithoutAPlaceHasNoPictureAndSaysNot
 // ---- Documents
 
 TEST_F(QuiltMediaSourcePreviewsTest, ADocumentThatTakesLongToPrepareRepeatsTheStartUntilItIsCancelled) {
+  keepDocumentBusy();
   const Installed<ToldGlance> glance(&Services::glance);
   glance->preparesForEver = true;
   const auto source = documentSource();
@@ -159,6 +160,7 @@ TEST_F(QuiltMediaSourcePreviewsTest, ADocumentHasAPreviewForEachPageWithItsText)
 }
 
 TEST_F(QuiltMediaSourcePreviewsTest, PagesAreAskedForOnTheMainThreadAlsoByAWorker) {
+  keepDocumentBusy();
   const Installed<ToldGlance> glance(&Services::glance);
   glance->pages = {{picture(4, 4), "Page"}};
   const auto source = documentSource();
@@ -187,6 +189,7 @@ TEST_F(QuiltMediaSourcePreviewsTest, ADocumentWithoutPagesHasNoPosterAndSaysNoth
 // ---- Movies
 
 TEST_F(QuiltMediaSourcePreviewsTest, AMovieThatKnowsNoTimesIsShownAtItsStart) {
+  keepDocumentBusy();
   const auto source = movieSource();
   const Installed<BareToolkit> movies(&Services::movies);
   movies->frame = picture(4, 4);
@@ -208,6 +211,7 @@ TEST_F(QuiltMediaSourcePreviewsTest, AChapterIsShownAtItsStart) {
 }
 
 TEST_F(QuiltMediaSourcePreviewsTest, AFrameThatCannotBeTakenGivesNoPreviewAndTheWalkGoesOn) {
+  keepDocumentBusy();
   const auto source = movieSource();
   const Installed<BareToolkit> movies(&Services::movies);
   movies->chapters = {{"One", 0}, {"Two", 1}};
@@ -235,6 +239,7 @@ TEST_F(QuiltMediaSourcePreviewsTest, SharesOfTheWalkAreIntegerQuotients) {
 }
 
 TEST_F(QuiltMediaSourcePreviewsTest, ASourceIsPreviewedWhenEveryIndexHasAPreview) {
+  keepDocumentBusy();
   const auto source = movieSource();
   const Installed<BareToolkit> movies(&Services::movies);
   movies->frame = picture(4, 4);
@@ -307,7 +312,6 @@ TEST_F(QuiltMediaSourcePreviewsTest, RemovingAPreviewThatWasNeverWrittenIsNoFail
 }
 
 TEST_F(QuiltMediaSourcePreviewsTest, AddingAndRemovingAnnounceAndSave) {
-  letDocumentSave();
   const auto source = addSource(pictureFile(8, 8));
   std::vector<platform::ChangePhase> phases;
   const auto observation = source->observe(

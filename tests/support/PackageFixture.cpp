@@ -4,7 +4,6 @@
 namespace quilt::support {
 
 PackageFixture::PackageFixture() : _document(QuiltDocument::initWithPath(folder() / "package.qpk")) {
-  _document->setIsProcessing(true);
   _document->addMedia(_item);
   takeLines();
 }

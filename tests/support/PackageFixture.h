@@ -7,8 +7,8 @@
 
 namespace quilt::support {
 
-/// A test with a document package on disk that holds one media item, and verbs for what goes into it. The document does
-/// not save by itself unless a test asks for it with letDocumentSave().
+/// A test with a document package on disk that holds one media item, and verbs for what goes into it. The document is
+/// idle, as a host's is: it saves itself with every change.
 class PackageFixture : public ModelFixture {
  protected:
   PackageFixture();
@@ -16,7 +16,12 @@ class PackageFixture : public ModelFixture {
   const std::shared_ptr<QuiltDocument>& document() const { return _document; }
   const std::shared_ptr<QuiltMedia>& item() const { return _item; }
 
+  /// @{
+  /// For a test of one step, which would otherwise see what each save makes and writes: the poster, its preview and
+  /// their folders. The document is as in the middle of a long operation, until letDocumentSave().
+  void keepDocumentBusy() { _document->setIsProcessing(true); }
   void letDocumentSave() { _document->setIsProcessing(false); }
+  /// @}
 
   /// A source of the item, made of a file.
   std::shared_ptr<QuiltMediaSource> addSource(const Path& file);

@@ -116,7 +116,6 @@ TEST_F(BridgeChangesThreadTest, EveryAnswerThatCanChangeHasItsKey) {
 }
 
 TEST_F(BridgeChangesThreadTest, EditsOfTwoClientsRaceToOneConsistentEnd) {
-  letDocumentSave();
   for (int i = 0; i < 40; ++i) item()->addExtra(QuiltMediaExtra::init());
   meanwhile([&] {
     const auto edit = [this](const std::string& name) {

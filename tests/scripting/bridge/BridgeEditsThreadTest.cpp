@@ -19,7 +19,6 @@ class BridgeEditsThreadTest : public support::BridgeFixture {
   BridgeEditsThreadTest() {
     source = addEmptySource();
     item()->addExtra(extra);
-    letDocumentSave();
     EXPECT_TRUE(document()->update());
   }
 
