@@ -14,6 +14,7 @@
 
 namespace quilt {
 
+class PackageChanges;
 class QuiltCollection;
 
 /// @{
@@ -157,6 +158,14 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
   bool hasBeenModified() const;
   /// Makes the document count as never modified, and saves unless it is processing.
   void resetModifiedDate();
+  /// @{
+  /// For what the document holds. Files come before the record that names them, and go after the record that no longer
+  /// does: willMakeItem() is told of a file or folder before it is made below the media folder, removeItem() takes one
+  /// away, out of sight at once and for good with the next save. A removal that fails logs `warning` with the path and
+  /// the error's text. What a process that was killed in between left is put right before the next one's first change.
+  void willMakeItem(const Path& item);
+  void removeItem(const Path& item, const char* warning);
+  /// @}
   /// Drops the cached poster and every cache of the items. Files stay.
   void invalidateCaches();
   /// What the document's own observations call: saves when the key is one that saves and nothing else is under way.
@@ -322,6 +331,7 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
   platform::WeakProperty<QuiltCollection> _collectionOwner{*this, "collectionOwner"};
   std::atomic<platform::ThreadIdentity> _savingThread{nullptr};  // while update() runs
   Dictionary _unknownEntries;
+  const std::shared_ptr<PackageChanges> _changes;
   std::vector<platform::Observation> _observations;  // last: ends before the properties do
 };
 

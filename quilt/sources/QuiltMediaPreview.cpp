@@ -144,6 +144,7 @@ platform::Result<void> QuiltMediaPreview::writePicture() {
   }
   if (!isInsidePackage(file, document, "source preview"))
     return Error{ErrorKind::Unsafe, "The file leads out of the document.", file};
+  if (document) document->willMakeItem(file);
   if (auto saved = picture->saveAsJPGAtPath(file); !saved) {
     if (!cannotBeDrawn(saved.error()))
       FDYLogger::logCritical("Failed to write media source preview at path \"%@\": \"%@\"", file, saved.error());

@@ -1,10 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <algorithm>
 
+#include "quilt/documents/QuiltDocument.h"
 #include "quilt/media/QuiltMedia.h"
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/base/Paths.h"
 #include "quilt/platform/interfaces/Services.h"
+#include "quilt/sources/DocumentSave.h"
 #include "quilt/sources/Grades.h"
 #include "quilt/sources/ModelFiles.h"
 #include "quilt/sources/QuiltMediaSource.h"
@@ -54,6 +56,7 @@ std::vector<std::string> QuiltMediaSource::availableFormats() const {
 
 bool QuiltMediaSource::convertToFormat(const std::string& format, const ProgressionBlock& withProgressionBlock,
                                        const std::vector<std::string>& followedBy) {
+  const SaveDeferral deferral;  // a record names what was made under its final name
   platform::report(withProgressionBlock, 0);
   bool done = !dirty() && derivativeWithFormat(format);
   if (!done) {
@@ -191,7 +194,9 @@ bool QuiltMediaSource::adoptConverted(const Path& file, const std::string& forma
   tags.push_back(format);
   derivative->setCompatibilityTags(std::move(tags));
   addDerivative(derivative);
-  return derivative->flattenCopy(/*copy=*/false, [](double) { return true; });
+  if (derivative->flattenCopy(/*copy=*/false, [](double) { return true; })) return true;
+  removeDerivative(derivative);  // no record is to name a hidden file
+  return false;
 }
 
 platform::Result<Path> QuiltMediaSource::newHiddenFile(const std::string& extension) const {
@@ -202,6 +207,7 @@ platform::Result<Path> QuiltMediaSource::newHiddenFile(const std::string& extens
   do {
     file = folder / platform::withExtension("." + platform::generateUUID(), extension);
   } while (services().files->fileExistsAtPath(file));
+  document()->willMakeItem(file);
   return file;
 }
 
