@@ -11,6 +11,7 @@
 #include "cli/Failure.h"
 #include "cli/Text.h"
 #include "quilt/documents/QuiltDocument.h"
+#include "quilt/platform/base/TemporaryNames.h"
 #include "quilt/platform/interfaces/Services.h"
 
 namespace quilt::cli {
@@ -44,9 +45,10 @@ Path homeFolder() {
 std::vector<std::string> visibleNames(const Path& folder) {
   Result<std::vector<std::string>> names = services().files->contentsOfDirectoryAtPath(folder);
   if (!names) throw Failure("Cannot read the folder " + inQuotes(folder.native()), names.error());
-  std::erase_if(*names, [](const std::string& name) { return name.starts_with('.'); });
-  std::sort(names->begin(), names->end());
-  return *std::move(names);
+  // What is being made at this moment, or was when its maker was killed, is not there yet.
+  std::vector<std::string> finished = platform::finishedNames(*names);
+  std::sort(finished.begin(), finished.end());
+  return finished;
 }
 
 bool isFolder(const Path& path) { return services().files->kindOfItemAtPath(path) == FileKind::Folder; }

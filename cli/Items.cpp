@@ -190,13 +190,13 @@ std::shared_ptr<QuiltMediaSource> setCommentary(QuiltDocument& document, QuiltMe
   const Path filesBefore = before ? before->path() : Path();
   const auto removeFiles = [&document](const Path& folder) {
     if (!folder.empty() && services().files->fileExistsAtPath(folder))
-      (void)services().files->removeItem(folder, document.path());
+      document.removeItem(folder, "Failed to delete audio commentary at path \"%@\": \"%@\"");
   };
   Transaction transaction(document);
   item.setAudioCommentarySource(commentary);
-  if (commentary->flattenCopy(/*copy=*/true, block) && transaction.save()) {
-    removeFiles(filesBefore);
-    return commentary;
+  if (commentary->flattenCopy(/*copy=*/true, block)) {
+    removeFiles(filesBefore);  // for good with the save, which brings them back when it fails
+    if (transaction.save()) return commentary;
   }
   removeFiles(commentary->path());
   item.setAudioCommentarySource(before);

@@ -76,7 +76,7 @@ std::shared_ptr<QuiltDocument> LibrarySession::open(const FoundDocument& found) 
 }
 
 std::shared_ptr<QuiltCollection> LibrarySession::makeCollection(const std::string& title) {
-  const std::shared_ptr<QuiltCollection> collection = _controller->newCollection();
+  const std::shared_ptr<QuiltCollection> collection = _controller->newCollectionWithUUID(std::nullopt, title);
   if (!collection)
     throw Failure(ExitCode::InputOutput,
                   "The collection " + inQuotes(title) + " cannot be made in " + inQuotes(_catalogue.library.native()),

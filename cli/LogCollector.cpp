@@ -6,6 +6,7 @@
 #include <filesystem>
 #include <system_error>
 
+#include "cli/DiskTrouble.h"
 #include "cli/Text.h"
 
 namespace quilt::cli {
@@ -57,6 +58,7 @@ void LogCollector::write(platform::LogLevel level, const std::string& message) {
 }
 
 void LogCollector::beginOperation() {
+  DiskTrouble::forget();
   const std::lock_guard guard(_mutex);
   _lines.clear();
 }

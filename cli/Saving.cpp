@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "cli/Saving.h"
 
+#include "cli/DiskTrouble.h"
 #include "cli/Text.h"
 
 namespace quilt::cli {
@@ -34,9 +35,13 @@ Failure explain(const std::string& what, const LogCollector& log, const Path& fi
   const std::string cause = log.cause();
   ExitCode code = exitCodeForCause(cause);
   std::string message = what;
-  if (code == ExitCode::Failed && isDiskFull(target)) {
+  const auto trouble = code == ExitCode::Failed ? DiskTrouble::first() : std::nullopt;
+  if (code == ExitCode::Failed && (isDiskFull(target) || (trouble && trouble->kind == platform::ErrorKind::NoSpace))) {
     code = ExitCode::InputOutput;
     message += ": The disk is full";
+  } else if (trouble) {
+    code = exitCodeFor(trouble->kind);
+    message += ": " + escaped(trouble->text) + " (" + escaped(trouble->file.native()) + ")";
   } else if (!cause.empty()) {
     message += ": " + escaped(cause);
   }

@@ -85,10 +85,13 @@ BuildPlan look(const BuildRequest& request, const Context& context) {
   return plan;
 }
 
-/// A folder that is removed with all that is in it.
+/// A folder that is removed with all that is in it; what a killed process left beside it is removed first.
 class TemporaryFolder {
  public:
-  explicit TemporaryFolder(const Path& in) : _in(in), _path(in / platform::hiddenNameBeside("build")) {}
+  explicit TemporaryFolder(const Path& in) : _in(in), _path(in / platform::hiddenNameBeside("build")) {
+    (void)services().files->sweepFolder(in, platform::SweepDepth::Level, {});
+    _hold = services().files->holdFolder(in);
+  }
   TemporaryFolder(const TemporaryFolder&) = delete;
   TemporaryFolder& operator=(const TemporaryFolder&) = delete;
   ~TemporaryFolder() { (void)services().files->removeItem(_path, _in); }
@@ -98,6 +101,7 @@ class TemporaryFolder {
  private:
   const Path _in;
   const Path _path;
+  std::unique_ptr<platform::FolderHold> _hold;
 };
 
 /// A document in a library that goes again, with the collection that was made for it, unless it is kept.

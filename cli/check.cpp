@@ -22,6 +22,33 @@ using platform::Dictionary;
 using platform::FileKind;
 using platform::services;
 
+constexpr const char* kLeftover = "It was left by an operation that did not end";
+
+/// Tells what killed operations left beside the documents and collections; answers how many.
+std::size_t findLeftovers(const Catalogue& catalogue, Output& output) {
+  std::size_t count = 0;
+  const auto look = [&](const Path& folder, const std::string& uuid, const std::string& title) {
+    const auto names = services().files->contentsOfDirectoryAtPath(folder);
+    if (!names) return;
+    for (const std::string& name : *names) {
+      if (!platform::isHiddenTemporaryName(name)) continue;
+      ++count;
+      const std::string path = (folder / name).native();
+      output.item({{"uuid", uuid},
+                   {"title", title},
+                   {"type", "Collection"},
+                   {"path", path},
+                   {"kind", "unreferenced"},
+                   {"message", kLeftover}},
+                  fmt::format("{}\tunreferenced\t{}\t{}", escaped(uuid), escaped(path), kLeftover));
+    }
+  };
+  for (const CollectionEntry& collection : catalogue.collections)
+    look(collection.path, collection.uuid, collection.title);
+  if (!catalogue.collections.empty()) look(catalogue.collections.front().path.parent_path(), "", "");
+  return count;
+}
+
 /// Looks through one package, and tells what is wrong with it.
 class Check {
  public:
@@ -35,6 +62,7 @@ class Check {
       return _count;
     }
     each(*record, "Media", [this](const Dictionary& item) { checkItem(item); });
+    findLeftovers(_document.path);
     findUnreferenced(_document.path / "media");
     return _count;
   }
@@ -135,6 +163,14 @@ class Check {
     tell("outside", url->relativePath(), "It was not copied into the package");
   }
 
+  /// One level: below "media" every file is looked at, and what lies elsewhere is the theme's.
+  void findLeftovers(const Path& folder) {
+    const auto names = services().files->contentsOfDirectoryAtPath(folder);
+    if (!names) return;
+    for (const std::string& name : *names)
+      if (platform::isHiddenTemporaryName(name)) tell("unreferenced", folder / name, kLeftover);
+  }
+
   /// Sizes of previews are not recorded, nor are posters: they count as referenced when their place is known.
   void findUnreferenced(const Path& folder) {
     const auto names = services().files->contentsOfDirectoryAtPath(folder);
@@ -142,7 +178,7 @@ class Check {
     for (const std::string& name : *names) {
       const Path path = folder / name;
       if (platform::isHiddenTemporaryName(name)) {
-        tell("unreferenced", path, "It was left by an operation that did not end");
+        tell("unreferenced", path, kLeftover);
       } else if (services().files->kindOfItemAtPath(path) == FileKind::Folder) {
         findUnreferenced(path);
       } else if (!_referenced.contains(path)) {
@@ -172,7 +208,7 @@ void ActingDelegate::perform(const CheckRequest& request) {
   _context.output.beginList();
   const Catalogue catalogue = readCatalogue(library());
   const std::vector<const DocumentEntry*> documents = documentsOf(request, catalogue);
-  std::size_t findings = 0;
+  std::size_t findings = request.documents.empty() ? findLeftovers(catalogue, _context.output) : 0;
   std::size_t done = 0;
   for (const DocumentEntry* document : documents) {
     if (Interrupt::isRequested()) throw Interrupt::failure("The rest was not checked");

@@ -9,11 +9,15 @@
 #include "cli/Saving.h"
 #include "cli/Text.h"
 #include "quilt/media/QuiltMediaExtra.h"
+#include "quilt/platform/base/TemporaryNames.h"
 #include "quilt/platform/base/Worker.h"
+#include "quilt/platform/interfaces/Services.h"
 
 namespace quilt::cli {
 
 namespace {
+
+using platform::services;
 
 /// Calls the block on every source of the document: those of the items, their extras and commentaries.
 void forEachSource(const QuiltDocument& document,
@@ -59,6 +63,44 @@ void printNew(const QuiltDocument& document, Identities& known, Output& output) 
   });
 }
 
+/// Takes away what no record names.
+void removeNew(const QuiltDocument& document, const Identities& known) {
+  forEachSource(document, [&known](const QuiltMedia&, const QuiltMediaSource& source) {
+    for (const auto& derivative : source.derivatives())
+      if (!known.contains(derivative->uuid())) const_cast<QuiltMediaSource&>(source).removeDerivative(derivative);
+  });
+}
+
+/// The space that the record will need, kept free while files are made that may fill the disk: hours of work would else
+/// be lost for a few bytes.
+class RecordSpace {
+ public:
+  explicit RecordSpace(const QuiltDocument& document) : _package(document.path()) {
+    constexpr std::uint64_t kForNew = std::uint64_t{64} << 10;
+    const auto attributes = services().files->attributesOfItemAtPath(document.propertiesPath());
+    const std::string filling(static_cast<std::size_t>(kForNew + (attributes ? attributes->size : 0)), '\xA5');
+    _kept = _package / platform::hiddenNameBeside("space");
+    _outcome = services().files->writeAtomically(_kept, filling);
+    _hold = services().files->holdFolder(_package);
+  }
+  RecordSpace(const RecordSpace&) = delete;
+  RecordSpace& operator=(const RecordSpace&) = delete;
+  ~RecordSpace() { release(); }
+
+  [[nodiscard]] const platform::Result<void>& outcome() const { return _outcome; }
+  void release() {
+    if (!_kept.empty()) (void)services().files->removeItem(_kept, _package);
+    _kept.clear();
+    _hold = nullptr;
+  }
+
+ private:
+  const Path _package;
+  Path _kept;
+  platform::Result<void> _outcome;
+  std::unique_ptr<platform::FolderHold> _hold;
+};
+
 }  // namespace
 
 void ActingDelegate::perform(const ConvertRequest& request) {
@@ -69,10 +111,14 @@ void ActingDelegate::perform(const ConvertRequest& request) {
   const auto document = session.open(found);
   Identities known = derivativesOf(*document);
   const auto formats = static_cast<double>(request.formats.size());
+  const std::string cannot =
+      "The document " + inQuotes(found.document->title, found.document->uuid) + " cannot be converted to ";
   double before = 0;
   for (auto wanted = request.formats.begin(); wanted != request.formats.end(); ++wanted) {
     const std::string& format = *wanted;
     _context.log.beginOperation();
+    RecordSpace space(*document);
+    if (!space.outcome()) throw Failure(cannot + format, space.outcome().error());
     bool converted = false;
     platform::runOnWorker([&] {
       converted = document->convertToFormat(format,
@@ -83,13 +129,19 @@ void ActingDelegate::perform(const ConvertRequest& request) {
                                             },
                                             {std::next(wanted), request.formats.end()});
     });
+    space.release();
+    const Failure failure = explain(cannot + format, _context.log, document->path(), document->path());
+    // The document saves itself as its lists change, and tells nobody when it cannot.
+    _context.log.beginOperation();
+    if (derivativesOf(*document) != known && !document->update()) {
+      const Failure unsaved = explain(cannot + format, _context.log, document->path(), document->path());
+      removeNew(*document, known);
+      throw unsaved;
+    }
     // What was made before a failure stays, and is told.
     printNew(*document, known, _context.output);
     if (Interrupt::isRequested()) throw Interrupt::failure("The rest was not converted");
-    if (!converted)
-      throw explain(
-          "The document " + inQuotes(found.document->title, found.document->uuid) + " cannot be converted to " + format,
-          _context.log, document->path(), document->path());
+    if (!converted) throw failure;
     before += 100 / formats;
   }
 }

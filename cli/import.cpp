@@ -26,9 +26,8 @@ constexpr const char* kNotImported = "files could not be imported";
 /// A file that can be imported.
 struct ImportedFile {
   Path path;
-  std::string title;         ///< the title in its metadata, else its name
-  bool hasOwnTitle = false;  ///< the library will find the title itself
-  std::uint64_t size = 0;    ///< bytes
+  std::string title;       ///< the title in its metadata, else its name
+  std::uint64_t size = 0;  ///< bytes
 };
 
 std::vector<std::string> readList(char end) {
@@ -79,7 +78,7 @@ ImportedFile check(const std::string& name) {
   if (!QuiltMediaSource::initWithPath(path))
     throw Failure(ExitCode::Invalid, cannot + ": It suits none of the formats Desktop, 720p and 480p", path);
   const bool hasOwnTitle = facts->metadataTitle && !facts->metadataTitle->empty();
-  return {path, hasOwnTitle ? *facts->metadataTitle : asTitle(path.stem().native()), hasOwnTitle, attributes->size};
+  return {path, hasOwnTitle ? *facts->metadataTitle : asTitle(path.stem().native()), attributes->size};
 }
 
 // Looks at every file before anything is changed; what is wrong with one is added to the failures.
@@ -135,25 +134,10 @@ class Import {
       return !Interrupt::isRequested();
     };
     block(0);
-    // Under an identity of our own, so that what a failure leaves can be found.
-    const std::string uuid = platform::generateUUID();
-    const auto document = _collection.importDocumentFromPath(candidate.path, uuid, block);
-    if (!document) {
-      removePackage(uuid);
-      if (!Interrupt::isRequested())
-        failures.push_back(explain(cannot, _context.log, candidate.path, _collection.path()));
-      return nullptr;
-    }
-    if (candidate.hasOwnTitle || changeAndSave(*document, [&] { document->setTitle(candidate.title); }))
-      return document;
-    _collection.removeDocument(document, true);
-    failures.push_back(explain(cannot, _context.log, candidate.path, _collection.path()));
-    return nullptr;
-  }
-
-  void removePackage(const std::string& uuid) const {
-    const Path package = _collection.path() / platform::withExtension(uuid, kQuiltDocumentExtension);
-    if (services().files->fileExistsAtPath(package)) (void)services().files->removeItem(package, _collection.path());
+    const auto document = _collection.importDocumentFromPath(candidate.path, std::nullopt, candidate.title, block);
+    if (!document && !Interrupt::isRequested())
+      failures.push_back(explain(cannot, _context.log, candidate.path, _collection.path()));
+    return document;
   }
 
   void print(const ImportedFile& candidate, const QuiltDocument& document) {

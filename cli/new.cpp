@@ -17,10 +17,7 @@ Json json(const std::string& uuid, const std::string& title, const std::string& 
 std::shared_ptr<QuiltDocument> makeDocument(const NewDocumentRequest& request, QuiltCollection& collection,
                                             const LogCollector& log) {
   const std::string cannot = "The document " + inQuotes(request.title) + " cannot be made";
-  const auto document = collection.newDocumentWithType(request.type);
-  if (!document) throw explain(cannot, log, collection.path(), collection.path());
-  if (changeAndSave(*document, [&] { document->setTitle(request.title); })) return document;
-  collection.removeDocument(document, true);
+  if (const auto document = collection.newDocumentWithType(request.type, request.title)) return document;
   throw explain(cannot, log, collection.path(), collection.path());
 }
 

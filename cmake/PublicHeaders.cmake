@@ -13,7 +13,7 @@ foreach(folder platform/base platform/interfaces sources media themes documents 
   list(APPEND quilt_public_headers_model ${found})
 endforeach()
 list(REMOVE_ITEM quilt_public_headers_model
-     quilt/platform/base/ByteTable.h quilt/platform/base/MonitorWait.h quilt/documents/DataScript.h
+     quilt/platform/base/ByteTable.h quilt/platform/base/MonitorWait.h quilt/documents/DataScript.h quilt/documents/PackageChanges.h quilt/collections/UnfinishedItem.h
      quilt/sources/DocumentSave.h quilt/sources/Grades.h quilt/sources/ModelFiles.h quilt/sources/RecordNames.h quilt/sources/RepeatedReport.h)
 set(quilt_public_headers_platform quilt/platform/install.h)
 set(quilt_public_headers_bridge quilt/scripting/bridge/Bridge.h quilt/scripting/bridge/http/Limits.h)

@@ -7,9 +7,12 @@
 #include <new>
 
 #include "quilt/collections/QuiltCollectionsController.h"
+#include "quilt/collections/UnfinishedItem.h"
 #include "quilt/platform/base/CleanUp.h"
 #include "quilt/platform/base/FDYLogger.h"
+#include "quilt/platform/base/TemporaryNames.h"
 #include "quilt/platform/interfaces/Services.h"
+#include "quilt/sources/ModelFiles.h"
 
 namespace quilt {
 
@@ -55,6 +58,10 @@ std::shared_ptr<QuiltCollection> QuiltCollection::init() {
 }
 
 std::shared_ptr<QuiltCollection> QuiltCollection::initWithPath(const Path& path) {
+  return initWithPath(path, std::nullopt);
+}
+
+std::shared_ptr<QuiltCollection> QuiltCollection::initWithPath(const Path& path, const Text& newTitle) {
   auto collection = init();
   collection->setPath(path);
   platform::FileManager& files = *services().files;
@@ -63,11 +70,13 @@ std::shared_ptr<QuiltCollection> QuiltCollection::initWithPath(const Path& path)
     collection->removeAllBrokenDocuments();
     return collection;
   }
+  UnfinishedItem unfinished(path);
   if (const Result<void> made = files.createDirectoryAtPath(path); !made) {
     FDYLogger::logCritical("Failed to create collection at path \"%@\": \"%@\"", path, made.error());
     return nullptr;
   }
-  if (!collection->update()) {
+  if (newTitle) collection->_title.store(newTitle);
+  if (!collection->update() || !unfinished.finish()) {
     FDYLogger::logCritical("Failed to create collection at path \"%@\"", path);
     return nullptr;
   }
@@ -166,14 +175,14 @@ bool QuiltCollection::_loadDocuments() {
     return false;
   }
   FDYLogger::logDebug("Loading collection \"%@\"...", title());
+  sweepLevel(folder);
   const platform::FileManager& files = *services().files;
   const Result<std::vector<std::string>> names = files.contentsOfDirectoryAtPath(folder);
   if (!names) {
     FDYLogger::logWarning("Failed to load collection at path \"%@\": \"%@\"", folder, names.error());
     return false;
   }
-  for (const std::string& name : *names) {
-    if (name.starts_with(".")) continue;
+  for (const std::string& name : platform::finishedNames(*names)) {
     const Path entry = folder / name;
     if (files.kindOfItemAtPath(entry) != platform::FileKind::Folder) continue;
     addDocument(QuiltDocument::initWithPath(entry));

@@ -25,6 +25,8 @@ class QUILT_EXPORT QuiltCollection : public platform::Object {
   /// Opens the folder with its documents, or makes it when nothing is there. Null when that fails; the reason is
   /// logged.
   static std::shared_ptr<QuiltCollection> initWithPath(const Path& path);
+  /// The same; one that has to be made has the title from its first save on.
+  static std::shared_ptr<QuiltCollection> initWithPath(const Path& path, const Text& newTitle);
 
   // Properties
   /// Names the folder in its library.
@@ -136,14 +138,18 @@ class QUILT_EXPORT QuiltCollection : public platform::Object {
   void removeAllBrokenDocuments();
   /// Makes and saves an empty document with the collection's author and theme. Null after a critical line.
   std::shared_ptr<QuiltDocument> newDocumentWithType(const Text& type);
+  /// The same; the document has the title, when one is given, before anybody can see it.
+  std::shared_ptr<QuiltDocument> newDocumentWithType(const Text& type, const Text& title);
   /// @{
   /// Makes a document of a file: inspects it, adds it as the one item, and copies it into the package, which is named
   /// by `withUUID` (a fresh one for none). A file of a type that cannot be imported gives an empty document. Null,
   /// after a critical line, on failure or when the block answers false; the package is then gone, unless it was there
-  /// before. Reports 10 to 100, on the calling thread.
+  /// before. Reports 10 to 100, on the calling thread. With `orTitle`, that is its title when the file has none.
   std::shared_ptr<QuiltDocument> importDocumentFromPath(const Path& path, const Text& withUUID,
                                                         const ProgressionBlock& withProgressionBlock);
   std::shared_ptr<QuiltDocument> importDocumentFromPath(const Path& path, const ProgressionBlock& withProgressionBlock);
+  std::shared_ptr<QuiltDocument> importDocumentFromPath(const Path& path, const Text& withUUID, const Text& orTitle,
+                                                        const ProgressionBlock& withProgressionBlock);
   /// @}
 
  protected:

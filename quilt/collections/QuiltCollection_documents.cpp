@@ -2,10 +2,12 @@
 #include <algorithm>
 
 #include "quilt/collections/QuiltCollection.h"
+#include "quilt/collections/UnfinishedItem.h"
 #include "quilt/platform/base/CleanUp.h"
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/base/Paths.h"
 #include "quilt/platform/interfaces/Services.h"
+#include "quilt/sources/ModelFiles.h"
 
 namespace quilt {
 
@@ -109,6 +111,7 @@ void QuiltCollection::removeDocument(const std::shared_ptr<QuiltDocument>& docum
 
 void QuiltCollection::deletePackage(const Path& package) const {
   platform::FileManager& files = *services().files;
+  sweepLevel(path());
   if (package.empty() || !files.fileExistsAtPath(package)) return;
   if (const Result<void> removed = files.removeItem(package, path()); !removed)
     FDYLogger::logWarning("Failed to remove document at path \"%@\": \"%@\"", package, removed.error());
@@ -135,20 +138,25 @@ Path QuiltCollection::packagePath(const std::string& uuid) const {
 }
 
 std::shared_ptr<QuiltDocument> QuiltCollection::newDocumentWithType(const Text& type) {
+  return newDocumentWithType(type, std::nullopt);
+}
+
+std::shared_ptr<QuiltDocument> QuiltCollection::newDocumentWithType(const Text& type, const Text& title) {
   const platform::Uninterrupted whole;
   const Path package = packagePath(platform::generateUUID());
-  const auto document = package.empty() ? nullptr : QuiltDocument::initWithPath(package);
-  if (!document) {
+  const auto fail = [&package]() -> std::shared_ptr<QuiltDocument> {
     FDYLogger::logCritical(kCannotCreate, package);
     return nullptr;
-  }
+  };
+  if (package.empty()) return fail();
+  UnfinishedItem unfinished(package);
+  const auto document = QuiltDocument::initWithPath(package);
+  if (!document) return fail();
   document->setAuthor(author());
   document->setTheme(preferredTheme());
   document->setType(type);
-  if (!document->update()) {
-    FDYLogger::logCritical(kCannotCreate, package);
-    return nullptr;
-  }
+  if (title) document->setTitle(title);
+  if (!document->update() || !unfinished.finish()) return fail();
   document->setCreationDate(document->modifiedDate());
   addDocument(document);
   return document;
@@ -161,17 +169,21 @@ std::shared_ptr<QuiltDocument> QuiltCollection::importDocumentFromPath(const Pat
 
 std::shared_ptr<QuiltDocument> QuiltCollection::importDocumentFromPath(const Path& path, const Text& withUUID,
                                                                        const ProgressionBlock& withProgressionBlock) {
+  return importDocumentFromPath(path, withUUID, std::nullopt, withProgressionBlock);
+}
+
+std::shared_ptr<QuiltDocument> QuiltCollection::importDocumentFromPath(const Path& path, const Text& withUUID,
+                                                                       const Text& orTitle,
+                                                                       const ProgressionBlock& withProgressionBlock) {
   const Path package = packagePath(withUUID ? *withUUID : platform::generateUUID());
   // A package that was there before is not this import's to delete.
   const bool isNewPackage = !services().files->fileExistsAtPath(package);
+  std::optional<UnfinishedItem> unfinished;
+  if (isNewPackage && !package.empty()) unfinished.emplace(package);
   const auto document = package.empty() ? nullptr : QuiltDocument::initWithPath(package);
   const auto fail = [&]() -> std::shared_ptr<QuiltDocument> {
     FDYLogger::logCritical(kCannotCreate, path);
     return nullptr;
-  };
-  const auto discard = [&]() -> std::shared_ptr<QuiltDocument> {
-    if (isNewPackage) (void)services().files->removeItem(package, this->path());
-    return fail();
   };
   if (!document) return fail();
   const platform::OnException discardDocument([&] {
@@ -182,17 +194,18 @@ std::shared_ptr<QuiltDocument> QuiltCollection::importDocumentFromPath(const Pat
   const Text identifier = platform::FDYTypePreferredIdentifier(path);
   if (identifier && contains(QuiltDocument::allSupportedImportUTIs(), *identifier)) {
     const auto medium = FDYMedia::initWithPath(path);
-    if (!medium) return discard();
+    if (!medium) return fail();
     fillFromMedium(*document, *medium, *identifier, path);
-    if (!platform::report(withProgressionBlock, 10)) return discard();
+    if (!platform::report(withProgressionBlock, 10)) return fail();
   }
-  if (!document->update()) return discard();
+  if (orTitle && document->title().value_or("").empty()) document->setTitle(orTitle);
+  if (!document->update()) return fail();
   addDocument(document);
 
   const bool flattened = document->flattenWithProgressionBlock([&withProgressionBlock](double percentage) {
     return platform::report(withProgressionBlock, percentage * 9 / 10 + 10);
   });
-  if (flattened) return document;
+  if (flattened && (!unfinished || unfinished->finish())) return document;
   FDYLogger::logCritical("Failed to flatted...");
   removeDocument(document, isNewPackage);
   return fail();

@@ -6,7 +6,9 @@
 #include "quilt/platform/base/CleanUp.h"
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/base/Paths.h"
+#include "quilt/platform/base/TemporaryNames.h"
 #include "quilt/platform/interfaces/Services.h"
+#include "quilt/sources/ModelFiles.h"
 
 namespace quilt {
 
@@ -62,17 +64,17 @@ bool QuiltCollectionsController::loadCollections(const Path& path, const ObjectP
     if (const Result<void> made = files.createDirectoryAtPath(directory); !made)
       FDYLogger::logCritical("Failed to create collections directory at path \"%@\": \"%@\"", directory, made.error());
 
+  sweepLevel(directory);
   const Result<std::vector<std::string>> listing = files.contentsOfDirectoryAtPath(directory);
   if (!listing) {
     mayLoadAgain = false;
     FDYLogger::logCritical("Failed to load collections in directory \"%@\": \"%@\"", directory, listing.error());
     return false;
   }
-  const auto isVisible = [](const std::string& name) { return !name.starts_with("."); };
-  const auto total = static_cast<std::size_t>(std::count_if(listing->begin(), listing->end(), isVisible));
+  const std::vector<std::string> names = platform::finishedNames(*listing);
+  const std::size_t total = names.size();
   std::size_t done = 0;
-  for (const std::string& name : *listing) {
-    if (!isVisible(name)) continue;
+  for (const std::string& name : names) {
     const auto collection = QuiltCollection::initWithPath(directory / name);
     addCollection(collection);
     if (!platform::report(block, collection, platform::integerPercentage(++done, total))) {
@@ -119,26 +121,42 @@ void QuiltCollectionsController::removeCollection(const std::shared_ptr<QuiltCol
   if (!collection) return;
   const platform::Uninterrupted whole;
   const platform::MonitorLock lock = _collections.lock();
+  const Path folder = collection->path();
+  // The folder goes out of sight in one step, so that no half of it is ever there; its documents go with it.
+  const Path aside = andDeleteDocuments ? setAside(folder) : Path();
   collection->removeAllDocumentsAndDelete(andDeleteDocuments);
-  if (andDeleteDocuments) deleteFolder(collection->path());
+  if (andDeleteDocuments) deleteFolder(aside.empty() ? folder : aside, folder);
   _collections.remove(collection);
 }
 
-void QuiltCollectionsController::deleteFolder(const Path& folder) const {
+Path QuiltCollectionsController::setAside(const Path& folder) const {
+  platform::FileManager& files = *services().files;
+  sweepLevel(_collectionsDirectory());
+  if (folder.empty() || !files.fileExistsAtPath(folder)) return {};
+  auto aside = files.setAside(folder, _collectionsDirectory(), /*forGood=*/true);
+  return aside ? *std::move(aside) : Path();
+}
+
+void QuiltCollectionsController::deleteFolder(const Path& folder, const Path& called) const {
   platform::FileManager& files = *services().files;
   if (folder.empty() || !files.fileExistsAtPath(folder)) return;
   if (const Result<void> removed = files.removeItem(folder, _collectionsDirectory()); !removed)
-    FDYLogger::logWarning("Failed to remove collection at path \"%@\": \"%@\"", folder, removed.error());
+    FDYLogger::logWarning("Failed to remove collection at path \"%@\": \"%@\"", called, removed.error());
 }
 
 std::shared_ptr<QuiltCollection> QuiltCollectionsController::newCollectionWithUUID(const Text& uuid) {
+  return newCollectionWithUUID(uuid, std::nullopt);
+}
+
+std::shared_ptr<QuiltCollection> QuiltCollectionsController::newCollectionWithUUID(const Text& uuid,
+                                                                                   const Text& title) {
   const platform::Uninterrupted whole;
   const std::string name = uuid ? *uuid : platform::generateUUID();
   const Path directory = _collectionsDirectory();
   const Path folder = directory.empty() ? directory : directory / name;
   // Without a library, or with an identity that would lead out of it, there is no place to make the folder.
   const bool hasPlace = !folder.empty() && platform::isPlainComponent(name);
-  const auto collection = hasPlace ? QuiltCollection::initWithPath(folder) : nullptr;
+  const auto collection = hasPlace ? QuiltCollection::initWithPath(folder, title) : nullptr;
   if (!collection) {
     FDYLogger::logCritical("Failed to create a new empty collection at path \"%@\"", folder);
     return nullptr;

@@ -53,8 +53,10 @@ class QUILT_EXPORT QuiltCollectionsController : public platform::Object {
   /// Takes the collection and its documents out; with `andDeleteDocuments` also deletes their folders.
   void removeCollection(const std::shared_ptr<QuiltCollection>& collection, bool andDeleteDocuments);
   /// @{
-  /// Makes a collection in a folder named by the identity (a fresh one for none). Null after a critical line.
+  /// Makes a collection in a folder named by the identity (a fresh one for none), with the title from its first save
+  /// on. Null after a critical line.
   std::shared_ptr<QuiltCollection> newCollectionWithUUID(const Text& uuid);
+  std::shared_ptr<QuiltCollection> newCollectionWithUUID(const Text& uuid, const Text& title);
   std::shared_ptr<QuiltCollection> newCollection() { return newCollectionWithUUID(std::nullopt); }
   /// @}
 
@@ -63,7 +65,8 @@ class QUILT_EXPORT QuiltCollectionsController : public platform::Object {
 
  private:
   bool loadCollections(const Path& path, const ObjectProgressionBlock<QuiltCollection>& block, bool& mayLoadAgain);
-  void deleteFolder(const Path& folder) const;
+  Path setAside(const Path& folder) const;
+  void deleteFolder(const Path& folder, const Path& called) const;
 
   platform::Property<Path> _libraryPath{*this, "libraryPath"};
   platform::Property<bool> _loadingCollections{*this, "loadingCollections"};

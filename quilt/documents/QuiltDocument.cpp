@@ -5,6 +5,7 @@
 #include <utility>
 
 #include "quilt/collections/QuiltCollection.h"
+#include "quilt/documents/PackageChanges.h"
 #include "quilt/platform/base/CleanUp.h"
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/base/Paths.h"
@@ -48,7 +49,7 @@ platform::Result<Dictionary> readPropertiesOf(const Path& package, const Path& f
 
 // ---- Construction
 
-QuiltDocument::QuiltDocument() {
+QuiltDocument::QuiltDocument() : _changes(std::make_shared<PackageChanges>()) {
   _uuid.store(platform::generateUUID());
   for (const char* key : kObservedKeys) {
     _observations.push_back(observe(key, [this](const platform::ChangeNotice& notice) {
@@ -72,6 +73,7 @@ std::shared_ptr<QuiltDocument> QuiltDocument::initWithPath(const Path& path) {
     FDYLogger::logWarning("Failed to create document at path \"%@\": \"@\"", path, created.error());
     return nullptr;
   }
+  document->_changes->beginNew();
   const Date now = services().clock->now();
   // Stored, not set: a setter would save, and an empty package has no properties file until it is first changed.
   document->_creationDate.store(now);
@@ -261,8 +263,20 @@ bool QuiltDocument::writeRecord() {
   // First, and also without a file to write to: the record gives an untitled document its title.
   const Dictionary record = dictionary();
   const Path file = propertiesPath();
-  return !file.empty() && services().propertyLists->writeDictionary(record, file);
+  if (file.empty()) return false;
+  const Path package = path();
+  _changes->begin(package);
+  if (!services().propertyLists->writeDictionary(record, file)) {
+    _changes->notRecorded(package);
+    return false;
+  }
+  _changes->recorded(package, record);
+  return true;
 }
+
+void QuiltDocument::willMakeItem(const Path& item) { _changes->willMake(path(), item); }
+
+void QuiltDocument::removeItem(const Path& item, const char* warning) { _changes->remove(path(), item, warning); }
 
 bool QuiltDocument::isBusy() const {
   // A save on another thread is not refused but waited for: refusing would lose the change that asks for this one. It

@@ -14,6 +14,7 @@
 
 namespace quilt {
 
+class PackageChanges;
 class QuiltCollection;
 
 /// @{
@@ -165,6 +166,14 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
   bool hasBeenModified() const;
   /// Makes the document count as never modified, and saves unless it is processing.
   void resetModifiedDate();
+  /// @{
+  /// For what the document holds. Files come before the record that names them, and go after the record that no longer
+  /// does: willMakeItem() is told of a file or folder before it is made below the media folder, removeItem() takes one
+  /// away, out of sight at once and for good with the next save. A removal that fails logs `warning` with the path and
+  /// the error's text. What a process that was killed in between left is put right before the next one's first change.
+  void willMakeItem(const Path& item);
+  void removeItem(const Path& item, const char* warning);
+  /// @}
   /// Drops the cached poster and every cache of the items. Files stay.
   void invalidateCaches();
   /// What the document's own observations call: saves when the key is one that saves and nothing else is under way.
@@ -289,6 +298,8 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
 
  private:
   bool isShownByFile();
+  /// For a poster that has no file: what it is read from may go. One that cannot be drawn gives way to the placeholder.
+  void keepPosterInMemory(const std::shared_ptr<ImageWrapper>& poster);
   Path inPackage(std::initializer_list<const char*> components) const;
   /// The title, or the fall-back for a missing or empty one.
   std::string displayTitle() const;
@@ -340,6 +351,7 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
   std::atomic<platform::ThreadIdentity> _quietThread{nullptr};   // while withoutSaving() runs
   std::atomic<bool> _hasUnsavedChange{false};                    // made while the document was busy
   Dictionary _unknownEntries;
+  const std::shared_ptr<PackageChanges> _changes;
   std::vector<platform::Observation> _observations;  // last: ends before the properties do
 };
 

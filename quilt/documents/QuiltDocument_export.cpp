@@ -177,6 +177,9 @@ Path QuiltDocument::exportCopy(const Path& path, bool zipped, const std::vector<
   report(block, 0);
   const std::string name = displayTitle();
   const std::string base = fileNameForTitle(name);
+  // What a killed export left goes, and nobody takes for such what this one makes.
+  sweepLevel(path);
+  const auto hold = services().files->holdFolder(path);
   const Path temporary = temporaryPath(path, kQuiltDocumentExtension);
   const platform::OnException removeTemporary([&] { (void)services().files->removeItem(temporary, path); });
   const auto cleanUp = [&](const Path& final) {

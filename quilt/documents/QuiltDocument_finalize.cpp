@@ -83,6 +83,14 @@ bool QuiltDocument::finalizeInteractive() {
     FDYLogger::logCritical("Failed to finalize document at path \"%@\": \"No valid theme found\"", path());
     return false;
   }
+  // A template that is not there takes nothing away: applyTheme() begins by removing the player that works.
+  const Path folder = chosen->templatePath();
+  if (const auto entries = services().files->contentsOfDirectoryAtPath(folder); !entries) {
+    FDYLogger::logDebug("Failed to get content of theme at path \"%@\": \"%@\"", folder, entries.error());
+    FDYLogger::logCritical("Failed to apply theme \"%@\" on document at path \"%@\": \"%@\"", chosen->localizedName(),
+                           path(), entries.error());
+    return false;
+  }
   if (!applyTheme(chosen, [](double) { return true; })) return false;
 
   const auto poster = posterImage();

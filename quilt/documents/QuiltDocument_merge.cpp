@@ -102,17 +102,20 @@ class Merger {
   }
 
   static bool copyPreviews(QuiltMediaSource& from, const std::shared_ptr<QuiltMediaSource>& to) {
-    return from.previewWithProgressionBlock([&to](const std::shared_ptr<QuiltMediaPreview>& preview, double) {
-      const auto twin = preview ? QuiltMediaPreview::initWithImageWrapper(preview->image()) : nullptr;
-      if (!twin) return true;
-      twin->setUuid(preview->uuid());
-      twin->setTitle(preview->title());
-      twin->setContent(preview->content());
-      twin->setIndex(preview->index());
-      twin->setTimecode(preview->timecode());
-      to->addPreview(twin);
-      return true;
-    });
+    const bool walked =
+        from.previewWithProgressionBlock([&to](const std::shared_ptr<QuiltMediaPreview>& preview, double) {
+          const auto twin = preview ? QuiltMediaPreview::initWithImageWrapper(preview->image()) : nullptr;
+          if (!twin) return true;
+          twin->setUuid(preview->uuid());
+          twin->setTitle(preview->title());
+          twin->setContent(preview->content());
+          twin->setIndex(preview->index());
+          twin->setTimecode(preview->timecode());
+          to->addPreview(twin);
+          return true;
+        });
+    to->setPreviewsLeftOut(from.previewsLeftOut());
+    return walked;
   }
 
   const Text _title;

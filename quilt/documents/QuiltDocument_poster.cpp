@@ -44,14 +44,31 @@ void QuiltDocument::updatePosterImage(const std::shared_ptr<ImageWrapper>& image
   setPosterImage(poster);
   setPosterImageVersion(posterImageVersion() + 1);
   const Path file = posterImagePath();
-  if (file.empty() || !poster) return;
+  if (!poster) return;
+  if (file.empty()) return keepPosterInMemory(poster);
   if (const auto created = createDirectoryIfMissing(file.parent_path()); !created) {
     FDYLogger::logCritical("Failed to create intermediate directories for document at path \"%@\": \"%@\"",
                            file.parent_path(), created.error());
-    return;
+    return keepPosterInMemory(poster);
   }
-  // Without the file the cache still shows the poster; the next finalize or update tries again.
-  (void)poster->saveAsPNGAtURL(Url::fileUrl(file));
+  if (const auto saved = poster->saveAsPNGAtURL(Url::fileUrl(file)); !saved) {
+    FDYLogger::logWarning("Document poster image cannot be saved at path \"%@\": \"%@\"", file, saved.error());
+    return keepPosterInMemory(poster);
+  }
+  // Read from the package from now on: the given image may refer to a file that its owner moves or deletes.
+  if (const auto stored = ImageWrapper::imageWithPath(file)) _posterImage.store(stored);
+}
+
+void QuiltDocument::keepPosterInMemory(const std::shared_ptr<ImageWrapper>& poster) {
+  auto pixels = poster->bitmap();
+  auto held = pixels ? services().images->imageWithBitmap(*std::move(pixels)) : pixels.error();
+  if (held) {
+    _posterImage.store(*held);
+  } else if (cannotBeDrawn(held.error())) {
+    FDYLogger::logWarning("The image given as poster of document at path \"%@\" cannot be drawn: \"%@\"", path(),
+                          held.error());
+    setPosterImage(placeholderPoster());
+  }
 }
 
 bool QuiltDocument::glanceUpdate() {

@@ -111,6 +111,11 @@ Text QuiltMedia::contentCategory() const {
   return category;
 }
 
+bool QuiltMedia::isComposed() const {
+  const Text category = contentCategory();
+  return category == kQuiltMediaContentCategoryDualSource || category == kQuiltMediaContentCategoryMontage;
+}
+
 Path QuiltMedia::path() const { return folderOf(*this); }
 Path QuiltMedia::sourcesFolderPath() const { return pathBelow(folderOf(*this), {"sources"}); }
 Path QuiltMedia::extrasFolderPath() const { return pathBelow(folderOf(*this), {"extras"}); }

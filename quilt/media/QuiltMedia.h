@@ -37,6 +37,8 @@ class QUILT_EXPORT QuiltMedia : public platform::Object, public ImageBrowserItem
   Text description() const { return _description.get(); }
   void setDescription(Text description) { _description.set(std::move(description)); }
   /// @}
+  /// Whether a picture is drawn of several sources: a montage, two sources; any other item is shown by its file.
+  bool isComposed() const;
   /// The category that was set; else, once, that of the only source; else none.
   Text contentCategory() const;
   void setContentCategory(Text contentCategory) { _contentCategory.set(std::move(contentCategory)); }
@@ -208,6 +210,12 @@ class QUILT_EXPORT QuiltMedia : public platform::Object, public ImageBrowserItem
   void removeChild(List& list, const Child& child, const char* warning);
   bool flattenChildren(const ProgressionBlock& block);
   bool finalizeChildren(const ProgressionBlock& block);
+  /// The poster anew; null silently when an ordinary item has no preview, else after a warning.
+  std::shared_ptr<ImageWrapper> drawnPoster();
+  /// Writes the poster into the package, and has one that was made from a file read from there from then on.
+  platform::Result<void> savePoster(const std::shared_ptr<ImageWrapper>& poster);
+  /// Writes a poster that is in memory alone, because it could not be saved or its file is gone; else draws it anew.
+  void savePosterIfMissing();
   /// The second source's poster with the first's as an inset; null without the second's.
   std::shared_ptr<ImageWrapper> dualSourcePoster();
   /// The first four sources' posters in a grid, under a badge.

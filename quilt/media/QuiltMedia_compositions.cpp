@@ -22,11 +22,14 @@ constexpr Size kCanvas{512, 512};
 Size sizeOf(const Bitmap& image) { return {static_cast<double>(image.width), static_cast<double>(image.height)}; }
 Rect wholeOf(Size size) { return {0, 0, size.width, size.height}; }
 
-/// The source's poster in pixels; empty without one.
+/// The source's poster in pixels; empty without one, and after a warning when it cannot be drawn.
 Bitmap posterOf(const std::shared_ptr<QuiltMediaSource>& source) {
   const auto poster = source ? source->posterImage() : nullptr;
   auto pixels = poster ? poster->bitmap() : platform::Result<Bitmap>(Bitmap());
-  return pixels ? *std::move(pixels) : Bitmap();
+  if (pixels) return *std::move(pixels);
+  source->leaveOutPreview(0, pixels.error());
+  source->invalidatePosterImage();
+  return Bitmap();
 }
 
 std::unique_ptr<Canvas> blackCanvas(Size size) {

@@ -97,6 +97,7 @@ bool QuiltMedia::flattenChildren(const ProgressionBlock& block) {
     return extra->isFlattened() || flatten(*extra, step++, "Failed to flatten extra \"%@\"");
   });
   if (!extrasDone) return false;
+  savePosterIfMissing();
   report(block, 100);
   return true;
 }
@@ -130,6 +131,7 @@ bool QuiltMedia::finalizeChildren(const ProgressionBlock& block) {
       !makeFolderInPackage(extrasFolderPath(), document, kNoExtrasFolder))
     return false;
   posterImage();  // writes the poster into the package
+  savePosterIfMissing();
 
   // Every source reports into the first step.
   std::size_t position = 0;

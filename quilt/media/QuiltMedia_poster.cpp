@@ -32,6 +32,19 @@ std::shared_ptr<ImageWrapper> QuiltMedia::posterImage() {
   }
 
   setPosterImageVersion(posterImageVersion() + 1);
+  const auto poster = drawnPoster();
+  if (!poster) return nullptr;
+  setPosterImage(poster);
+  const auto saved = savePoster(poster);
+  if (!saved && cannotBeDrawn(saved.error())) {
+    setPosterImage(nullptr);
+    if (const auto first = sourceAtIndex(0)) first->leaveOutPreview(0, saved.error());
+    return nullptr;
+  }
+  return _posterImage.get();
+}
+
+std::shared_ptr<ImageWrapper> QuiltMedia::drawnPoster() {
   const Text category = contentCategory();
   std::shared_ptr<ImageWrapper> poster;
   if (category == kQuiltMediaContentCategoryDualSource) {
@@ -44,24 +57,39 @@ std::shared_ptr<ImageWrapper> QuiltMedia::posterImage() {
     const auto picture = first ? first->posterImage() : nullptr;
     poster = picture ? picture->convertToSD() : nullptr;
   }
-  if (!poster) {
-    FDYLogger::logWarning("Media poster image cannot be previewed");
-    return nullptr;
-  }
-  setPosterImage(poster);
+  if (!poster) FDYLogger::logWarning("Media poster image cannot be previewed");
+  return poster;
+}
 
+platform::Result<void> QuiltMedia::savePoster(const std::shared_ptr<ImageWrapper>& poster) {
+  using platform::Error;
+  using platform::ErrorKind;
+  const Path file = posterImagePath();
   const Path folder = file.parent_path();
-  const auto created =
-      file.empty()
-          ? platform::Result<void>(platform::Error{platform::ErrorKind::NotFound, "The item is not in a document", {}})
-          : createDirectoryInPackage(folder, documentOwner());
+  const auto created = file.empty()
+                           ? platform::Result<void>(Error{ErrorKind::NotFound, "The item is not in a document", {}})
+                           : createDirectoryInPackage(folder, documentOwner());
   if (!created)
     FDYLogger::logCritical("Failed to create intermediate directories for media at path \"%@\": \"%@\"", folder,
                            created.error());
-  // A poster that could not be saved is drawn again when it is needed next.
-  if (!file.empty() && isInsidePackage(file, documentOwner(), "media poster image"))
-    (void)poster->saveAsJPGAtPath(file);
-  return poster;
+  if (file.empty()) return created;
+  if (!isInsidePackage(file, documentOwner(), "media poster image"))
+    return Error{ErrorKind::Unsafe, "The file leads out of the document.", file};
+  if (auto saved = poster->saveAsJPGAtPath(file); !saved) return saved;
+  // A composition is in memory; any other poster would go on reading what it was made from.
+  if (isComposed()) return {};
+  const auto stored = ImageWrapper::imageWithPath(file);
+  if (const auto small = stored ? stored->convertToSD() : nullptr) _posterImage.store(small);
+  return {};
+}
+
+void QuiltMedia::savePosterIfMissing() {
+  const auto poster = _posterImage.get();
+  const Path file = posterImagePath();
+  if (!poster || file.empty() || services().files->fileExistsAtPath(file)) return;
+  if (savePoster(poster)) return;
+  setPosterImage(nullptr);
+  posterImage();
 }
 
 platform::PropertyList QuiltMedia::posterImageWidth() {

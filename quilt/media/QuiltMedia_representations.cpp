@@ -20,12 +20,6 @@ std::vector<std::string> QuiltMedia::writableTypesForPasteboard(const platform::
 
 namespace {
 
-/// Whether a picture is drawn of several sources; any other item is shown by its file.
-bool isComposed(const QuiltMedia& item) {
-  const Text category = item.contentCategory();
-  return category == kQuiltMediaContentCategoryDualSource || category == kQuiltMediaContentCategoryMontage;
-}
-
 bool hasPosterFile(QuiltMedia& item) {
   const auto poster = item.posterImage();
   const Path file = item.posterImagePath();
@@ -35,12 +29,12 @@ bool hasPosterFile(QuiltMedia& item) {
 }  // namespace
 
 std::string QuiltMedia::imageRepresentationType() {
-  if (!isComposed(*this)) return kImageBrowserPreviewPathRepresentationType;
+  if (!isComposed()) return kImageBrowserPreviewPathRepresentationType;
   return hasPosterFile(*this) ? kImageBrowserPathRepresentationType : kImageBrowserBitmapRepresentationType;
 }
 
 ImageRepresentation QuiltMedia::imageRepresentation() {
-  if (!isComposed(*this)) {
+  if (!isComposed()) {
     const auto url = previewItemURL();
     return url ? ImageRepresentation(*url) : ImageRepresentation();
   }
@@ -52,7 +46,7 @@ ImageRepresentation QuiltMedia::imageRepresentation() {
 // ---- Quick preview
 
 std::optional<Url> QuiltMedia::previewItemURL() const {
-  if (isComposed(*this)) return std::nullopt;
+  if (isComposed()) return std::nullopt;
   const auto source = sourceAtIndex(0);
   const auto main = source ? source->mainDerivative() : nullptr;
   return main ? main->url() : std::nullopt;

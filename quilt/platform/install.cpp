@@ -11,6 +11,7 @@
 #include "quilt/platform/inspection/InspectionByKind.h"
 #include "quilt/platform/interfaces/Services.h"
 #include "quilt/platform/office/OfficeDocuments.h"
+#include "quilt/platform/office/OfficeInspector.h"
 #include "quilt/platform/plist/XmlPropertyLists.h"
 #include "quilt/platform/runloop/BuiltInRunLoop.h"
 #include "quilt/platform/text/IcuDateFormatter.h"
@@ -104,7 +105,8 @@ std::shared_ptr<MediaInspector> makeInspector() {
 #else
   const auto documents = std::make_shared<AbsentInspector>("Inspection of PDF and EPUB files");
 #endif
-  return std::make_shared<CachedInspection>(std::make_shared<InspectionByKind>(movies, images, documents));
+  return std::make_shared<CachedInspection>(
+      std::make_shared<InspectionByKind>(movies, images, documents, std::make_shared<OfficeInspector>()));
 }
 
 }  // namespace

@@ -85,4 +85,9 @@ platform::Result<Value> perform(platform::Object& receiver, std::string_view nam
   return accessor->perform(receiver, arguments.empty() ? Value() : arguments[0]);
 }
 
+bool answersStandIn(const platform::Object& receiver, std::string_view name) {
+  const Accessor* accessor = accessorOf(receiver, name);
+  return accessor && accessor->standsIn && accessor->standsIn(receiver);
+}
+
 }  // namespace quilt::scripting

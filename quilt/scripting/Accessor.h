@@ -33,6 +33,8 @@ struct Accessor {
   std::string_view summary;  ///< one sentence for people who write scripts
   Value (*perform)(platform::Object& receiver,
                    const Value& argument);  ///< the receiver is of the class; the argument fits
+  /// Whether the answer now stands where nothing is stored; null for an accessor that answers what is stored.
+  bool (*standsIn)(const platform::Object& receiver) = nullptr;
 };
 
 /// One class that scripts may reach.
@@ -60,5 +62,10 @@ QUILT_EXPORT bool isExcludedFromScripts(const platform::Object& object, std::str
 /// model saves it as the setter does. Any thread that may call the receiver's class.
 QUILT_EXPORT platform::Result<Value> perform(platform::Object& receiver, std::string_view name,
                                              std::span<const Value> arguments);
+
+/// Whether the accessor of that name answers something at present although the object stores nothing there, as a
+/// document without a title or description does. False for a name that is excluded. Any thread that may call the
+/// receiver's class.
+QUILT_EXPORT bool answersStandIn(const platform::Object& receiver, std::string_view name);
 
 }  // namespace quilt::scripting

@@ -68,6 +68,18 @@ Accessor getter(std::string_view name, std::string_view summary, Get) {
           [](platform::Object& receiver, const Value&) { return valueOf(Get{}(as<T>(receiver))); }};
 }
 
+/// A getter that answers a text of its own where the receiver stores none: `stored` takes the receiver and answers the
+/// text that it stores.
+template <class T, class Get, class Stored>
+Accessor getterWithStandIn(std::string_view name, std::string_view summary, Get get, Stored) {
+  Accessor accessor = getter<T>(name, summary, get);
+  accessor.standsIn = [](const platform::Object& receiver) {
+    const std::optional<std::string> text = Stored{}(static_cast<const T&>(receiver));
+    return !text || text->empty();
+  };
+  return accessor;
+}
+
 /// `get` takes the receiver and the index as the script gave it.
 template <class T, class Get>
 Accessor indexGetter(std::string_view name, std::string_view summary, Get) {

@@ -29,23 +29,26 @@ std::span<const Accessor> ofDocument() {
                      FDYLogger::logDebug("Conveyor is getting document \"%@\" uuid", document.uuid());
                      return document.uuid();
                    }),
-      getter<Self>("cvTitle", "Its title; a localised \"Untitled Episode\" when it has none.",
-                   [](const Self& document) {
-                     FDYLogger::logDebug("Conveyor is getting document \"%@\" title \"%@\"", document.uuid(),
-                                         document.title());
-                     return orElse(document.title(), untitledEpisode());
-                   }),
+      getterWithStandIn<Self>(
+          "cvTitle", "Its title; a localised \"Untitled Episode\" when it has none.",
+          [](const Self& document) {
+            FDYLogger::logDebug("Conveyor is getting document \"%@\" title \"%@\"", document.uuid(), document.title());
+            return orElse(document.title(), untitledEpisode());
+          },
+          [](const Self& document) { return document.title(); }),
       setter<Self>("cvSetTitle:", "Changes the title.",
                    [](Self& document, const Text& title) {
                      FDYLogger::logDebug("Conveyor is setting document \"%@\" title to \"%@\"", document.uuid(), title);
                      document.setTitle(title);
                    }),
-      getter<Self>("cvDescription", "Its description; a placeholder text when it has none.",
-                   [](const Self& document) {
-                     FDYLogger::logDebug("Conveyor is getting document \"%@\" description \"%@\"", document.uuid(),
-                                         document.description());
-                     return orElse(document.description(), kPlaceholder);
-                   }),
+      getterWithStandIn<Self>(
+          "cvDescription", "Its description; a placeholder text when it has none.",
+          [](const Self& document) {
+            FDYLogger::logDebug("Conveyor is getting document \"%@\" description \"%@\"", document.uuid(),
+                                document.description());
+            return orElse(document.description(), kPlaceholder);
+          },
+          [](const Self& document) { return document.description(); }),
       setter<Self>("cvSetDescription:", "Changes the description.",
                    [](Self& document, const Text& description) {
                      FDYLogger::logDebug("Conveyor is setting document \"%@\" description to \"%@\"", document.uuid(),

@@ -66,6 +66,8 @@ platform::Result<void> createDirectoryIfMissing(const Path& path) {
 platform::Result<void> createDirectoryInPackage(const Path& path, const std::shared_ptr<QuiltDocument>& document) {
   if (document && !document->path().empty() && !services().files->isConfined(path, document->path()))
     return platform::Error{platform::ErrorKind::Unsafe, "The folder leads out of the document", path};
+  if (services().files->fileExistsAtPath(path)) return {};
+  if (document) document->willMakeItem(path);
   return createDirectoryIfMissing(path);
 }
 
@@ -77,8 +79,14 @@ bool makeFolderInPackage(const Path& path, const std::shared_ptr<QuiltDocument>&
 
 void deleteFromPackage(const Path& path, const std::shared_ptr<QuiltDocument>& document, const char* warning) {
   if (path.empty() || !services().files->fileExistsAtPath(path)) return;
-  const auto removed = services().files->removeItem(path, document ? document->path() : Path());
+  if (document) return document->removeItem(path, warning);
+  const auto removed = services().files->removeItem(path, Path());
   if (!removed) platform::FDYLogger::logWarning(warning, path, removed.error());
+}
+
+void sweepLevel(const Path& folder) {
+  const auto nothingIsRecorded = [](const Path&) -> std::optional<bool> { return false; };
+  (void)services().files->sweepFolder(folder, platform::SweepDepth::Level, nothingIsRecorded);
 }
 
 OneLookAtEachFile::OneLookAtEachFile() { ++looks.depth; }
@@ -92,6 +100,10 @@ platform::Result<double> megaBytesOfFile(const Path& path) {
   const auto known = looks.sizes.find(path.native());
   if (known != looks.sizes.end()) return known->second;
   return looks.sizes.emplace(path.native(), measured(path)).first->second;
+}
+
+bool cannotBeDrawn(const platform::Error& error) {
+  return error.kind == platform::ErrorKind::Damaged || error.kind == platform::ErrorKind::Unsupported;
 }
 
 std::string fileNameForTitle(const std::string& title) {

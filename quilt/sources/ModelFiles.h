@@ -34,9 +34,14 @@ platform::Result<void> createDirectoryInPackage(const Path& path, const std::sha
 /// The same; a failure logs the debug line `failure` with the path and the error's text, and answers false.
 bool makeFolderInPackage(const Path& path, const std::shared_ptr<QuiltDocument>& document, const char* failure);
 
-/// Deletes a file or folder of the document's package, when something is there. A failure (also: the item lies outside
-/// the package, or there is no document) logs `warning` with the path and the error's text.
+/// Takes a file or folder out of the document's package, when something is there: QuiltDocument::removeItem(). A
+/// failure (also: the item lies outside the package, or there is no document) logs `warning` with the path and the
+/// error's text.
 void deleteFromPackage(const Path& path, const std::shared_ptr<QuiltDocument>& document, const char* warning);
+
+/// Clears away what killed processes left half made in a folder in which nothing is recorded but what is there: one of
+/// packages, of collections, of exports. One level; costs one listing.
+void sweepLevel(const Path& folder);
 
 /// A size in megabytes: the bytes in single precision, divided twice by 1024.
 platform::Result<double> megaBytesOfFile(const Path& path);
@@ -50,6 +55,10 @@ class OneLookAtEachFile {
   OneLookAtEachFile& operator=(const OneLookAtEachFile&) = delete;
   ~OneLookAtEachFile();
 };
+
+/// Whether a picture was not written because of what it is, and not because of where it was to be written: the same
+/// attempt would fail again.
+bool cannotBeDrawn(const platform::Error& error);
 
 /// A title as the base of a file name: "." becomes "_" and "/" becomes "-". Cut, between characters, to leave room for
 /// a counter and an extension in a file name's 255 bytes.

@@ -111,6 +111,7 @@ bool QuiltMediaAudioSamples::flatten(const ContinueBlock& goesOn) {
     FDYLogger::logCritical("Didn't expect audio samples file at path \"%@\": \"%@\"", file, std::nullopt);
     return false;
   }
+  if (const auto document = documentOf(sourceOwner())) document->willMakeItem(file);
   const Url destination = Url::fileUrl(file);
   const auto source = sourceURL();
   if (!source || !services().audioPreview->extractAudioSamplesFromAssetURL(*source, destination, goesOn)) {

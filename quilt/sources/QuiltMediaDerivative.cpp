@@ -108,9 +108,9 @@ bool QuiltMediaDerivative::classify(const Url& url) {
     tags = compatibilityTagsForURL(url, QuiltMediaSource::contentCategoryForContentType(contentType()));
   } else if (canInitWithURL(url)) {
     const Path file = url.relativePath();
-    const auto media = FDYMedia::initWithPath(file);
-    Text type = FDYTypePreferredIdentifier(file);
-    if (media) {
+    // What cannot be opened can be shown to no one.
+    if (const auto media = FDYMedia::initWithPath(file)) {
+      Text type = FDYTypePreferredIdentifier(file);
       if (conforms(type, types::kMovie) && media->hasAudio() && !media->hasVideo()) {
         type = types::kAudio;
       } else if (conforms(type, types::kAudio) && media->hasAudio() && media->hasVideo()) {
@@ -120,9 +120,9 @@ bool QuiltMediaDerivative::classify(const Url& url) {
       setHeight(media->height());
       setWidth(media->width());
       setDuration(media->duration());
+      tags = compatibilityTagsForURL(url, QuiltMediaSource::contentCategoryForContentType(type));
+      setContentType(std::move(type));
     }
-    setContentType(type);
-    tags = compatibilityTagsForURL(url, QuiltMediaSource::contentCategoryForContentType(type));
   }
   if (tags.empty()) {
     FDYLogger::logDebug("Failed to create source derivative for url \"%@\": \"Not a compatible file\"", url);

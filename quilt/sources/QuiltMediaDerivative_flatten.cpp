@@ -1,8 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
+#include <utility>
+
 #include "quilt/documents/QuiltDocument.h"
 #include "quilt/platform/base/CleanUp.h"
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/base/Paths.h"
+#include "quilt/platform/base/TemporaryNames.h"
 #include "quilt/platform/interfaces/Services.h"
 #include "quilt/sources/ModelFiles.h"
 #include "quilt/sources/QuiltMediaDerivative.h"
@@ -52,17 +55,49 @@ bool prepareFolder(const Path& folder, const std::shared_ptr<QuiltDocument>& doc
   return false;
 }
 
-/// folder/title.ext, or, while something is there, folder/"Title 2".ext and so on. The counted names use the title as
-/// it is, so a title with "/" names a file in a subfolder. Empty when that would leave the folder.
-Path uniqueExportPath(const Path& folder, const std::string& title, const std::string& extension) {
-  Path candidate = folder / platform::withExtension(fileNameForTitle(title), extension);
-  for (int counter = 2; services().files->fileExistsAtPath(candidate); ++counter) {
-    const std::string name = title + " " + std::to_string(counter);
-    candidate = Path(folder.native() + "/" + platform::withExtension(name, extension)).lexically_normal();
-    const Path relative = candidate.lexically_relative(folder.lexically_normal());
-    if (relative.empty() || *relative.begin() == "..") return {};
+/// The names under which a file is exported: folder/title.ext, then folder/"Title 2".ext and so on. The counted names
+/// use the title as it is, so a title with "/" names a file in a subfolder.
+class ExportNames {
+ public:
+  ExportNames(Path folder, std::string title, std::string extension)
+      : _folder(std::move(folder)),
+        _title(std::move(title)),
+        _extension(std::move(extension)),
+        _current(_folder / platform::withExtension(fileNameForTitle(_title), _extension)) {}
+
+  /// The next one from here on that nothing has; empty when it would leave the folder.
+  Path nextFree() {
+    while (services().files->fileExistsAtPath(_current)) {
+      const std::string name = _title + " " + std::to_string(_counter++);
+      _current = Path(_folder.native() + "/" + platform::withExtension(name, _extension)).lexically_normal();
+      const Path relative = _current.lexically_relative(_folder.lexically_normal());
+      if (relative.empty() || *relative.begin() == "..") return {};
+    }
+    return _current;
   }
-  return candidate;
+
+ private:
+  const Path _folder;
+  const std::string _title;
+  const std::string _extension;
+  Path _current;
+  int _counter = 2;
+};
+
+/// Puts the hidden file under the first name that is free, with its name and content on the disk. Two that look for one
+/// at once both find one: a rename never replaces. Empty when there is none, or none can be taken.
+Path moveToFreeName(const Path& hidden, ExportNames& names) {
+  for (;;) {
+    const Path destination = names.nextFree();
+    if (destination.empty()) return {};
+    // For a counted name in a subfolder. Where there can be none, the move fails and says so.
+    (void)createDirectoryIfMissing(destination.parent_path());
+    const auto moved = services().files->moveItem(hidden, destination);
+    if (moved) return destination;
+    if (moved.error().kind == platform::ErrorKind::AlreadyExists) continue;
+    FDYLogger::logDebug("Failed to move exported file \"%@\" to \"%@\": \"%@\"", hidden, destination, moved.error());
+    return {};
+  }
 }
 
 }  // namespace
@@ -81,8 +116,10 @@ bool QuiltMediaDerivative::flattenCopy(bool copy, const ProgressionBlock& withPr
   const Path file = from->relativePath();
   const Path folder = source->derivativesFolderPath();
   const Url to = Url::fileUrl(folder / platform::withExtension(uuid(), platform::pathExtension(file)));
-  const bool done = prepareFolder(folder, document) &&
-                    (copy ? copyInto(file, to.relativePath(), withProgressionBlock) : moveInto(*from, to));
+  const bool isPrepared = prepareFolder(folder, document);
+  if (isPrepared) document->willMakeItem(to.relativePath());
+  const bool done =
+      isPrepared && (copy ? copyInto(file, to.relativePath(), withProgressionBlock) : moveInto(*from, to));
   if (!done) {
     FDYLogger::logCritical("Failed to flatten source derivative \"%@\" at \"%@\"", *from, to);
     return false;
@@ -105,22 +142,24 @@ Path QuiltMediaDerivative::exportToPath(const Path& path, const ProgressionBlock
 
   const Path file = from->relativePath();
   const Text title = document->title();
-  const Path destination =
-      uniqueExportPath(path, title && !title->empty() ? *title : untitledEpisode(), platform::pathExtension(file));
-  if (destination.empty()) return {};
+  ExportNames names(path, title && !title->empty() ? *title : untitledEpisode(), platform::pathExtension(file));
+  const Path wanted = names.nextFree();
+  if (wanted.empty()) return {};
 
   const auto attributes = services().files->attributesOfItemAtPath(file);
   if (!attributes) {
     FDYLogger::logWarning(kCannotBeSized, file, attributes.error());
     return {};
   }
-  // For a counted name in a subfolder. Where there can be none, the copy fails and says so.
-  (void)createDirectoryIfMissing(destination.parent_path());
-  const int result = copyReportingPercentage(file, destination, attributes->size, withProgressionBlock);
-  if (result < 0) {
-    FDYLogger::logDebug(kCopyFailed, result);
-    // The copy removes what it wrote; this takes away what an interrupted one may have left.
-    (void)services().files->removeItem(destination, path);
+  sweepLevel(path);
+  const auto hold = services().files->holdFolder(path);
+  const Path hidden = path / platform::hiddenNameBeside(wanted.filename().native());
+  const int result = copyReportingPercentage(file, hidden, attributes->size, withProgressionBlock);
+  const int synced = result < 0 ? result : services().files->syncItem(hidden);
+  if (synced < 0) FDYLogger::logDebug(kCopyFailed, synced);
+  const Path destination = synced < 0 ? Path() : moveToFreeName(hidden, names);
+  if (destination.empty()) {
+    (void)services().files->removeItem(hidden, path);
     return {};
   }
   platform::report(withProgressionBlock, 100);

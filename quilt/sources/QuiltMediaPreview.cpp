@@ -54,6 +54,9 @@ std::shared_ptr<QuiltMediaPreview> QuiltMediaPreview::initWithDictionary(
   if (const auto index = dictionary.integer("Index")) preview->_index.initialize(static_cast<std::size_t>(*index));
   if (const auto timecode = dictionary.real("Timecode")) preview->_timecode.initialize(*timecode);
   if (const auto flattened = dictionary.boolean("IsFlattened")) preview->_isFlattened.initialize(*flattened);
+  preview->_isRenewable.initialize(true);
+  preview->_recordedWidth = dictionary.real("Width");
+  preview->_recordedHeight = dictionary.real("Height");
   preview->_unknownEntries = platform::entriesBeyond(kPreviewKeys, dictionary);
   return preview;
 }
@@ -69,8 +72,10 @@ Dictionary QuiltMediaPreview::dictionary() const {
   // Signed, as every integer of a record: no index is written as -1 and read back as the largest unsigned value.
   record.append("Index", static_cast<std::int64_t>(index()));
   record.append("Timecode", timecode());
-  if (const auto pixels = width()) record.append("Width", *pixels);
-  if (const auto pixels = height()) record.append("Height", *pixels);
+  const auto wide = width();
+  const auto high = height();
+  if (const auto pixels = wide ? wide : _recordedWidth) record.append("Width", *pixels);
+  if (const auto pixels = high ? high : _recordedHeight) record.append("Height", *pixels);
   record.append("IsFlattened", isFlattened());
   if (!file.empty()) {
     record.append("Filename", file.substr(file.rfind('/') + 1));
@@ -115,29 +120,47 @@ std::string QuiltMediaPreview::pathIn(const std::shared_ptr<QuiltMediaSource>& s
 }
 
 bool QuiltMediaPreview::hasPicture() const {
-  if (isFlattened() || _image.get()) return true;
   const Path file = path();
-  return !file.empty() && services().files->fileExistsAtPath(file);
+  if (file.empty()) return isFlattened() || _image.get();
+  // An image in memory that was read from the package is worth no more than its file.
+  return (!isFlattened() && _image.get()) || services().files->fileExistsAtPath(file);
 }
 
-bool QuiltMediaPreview::flatten() {
-  if (isFlattened()) return true;
+platform::Result<void> QuiltMediaPreview::writePicture() {
+  using platform::Error;
+  using platform::ErrorKind;
+  if (isFlattened()) return {};
   const Path file = path();
-  if (file.empty()) return false;
+  if (file.empty()) return Error{ErrorKind::NotFound, "The preview has no place in a document.", {}};
   const auto picture = image();
   if (!picture) {
     FDYLogger::logCritical("Failed to flatten media source preview because image is unavailable");
-    return false;
+    return Error{ErrorKind::NotFound, "The preview has no picture.", file};
   }
-  if (const auto created = createDirectoryInPackage(file.parent_path(), documentOf(sourceOwner())); !created) {
+  const auto document = documentOf(sourceOwner());
+  if (auto created = createDirectoryInPackage(file.parent_path(), document); !created) {
     FDYLogger::logCritical("Failed to flatten intermediate directories for media preview at path \"%@\": \"%@\"",
                            file.parent_path(), created.error());
-    return false;
+    return created;
   }
-  if (!isInsidePackage(file, documentOf(sourceOwner()), "source preview")) return false;
-  if (!picture->saveAsJPGAtPath(file)) return false;
+  if (!isInsidePackage(file, document, "source preview"))
+    return Error{ErrorKind::Unsafe, "The file leads out of the document.", file};
+  if (document) document->willMakeItem(file);
+  if (auto saved = picture->saveAsJPGAtPath(file); !saved) {
+    if (!cannotBeDrawn(saved.error()))
+      FDYLogger::logCritical("Failed to write media source preview at path \"%@\": \"%@\"", file, saved.error());
+    return saved;
+  }
   setIsFlattened(true);
-  return true;
+  _image.store(nullptr);
+  return {};
+}
+
+bool QuiltMediaPreview::flatten() {
+  const auto written = writePicture();
+  if (!written && cannotBeDrawn(written.error()))
+    FDYLogger::logWarning("Media source preview at path \"%@\" cannot be drawn: \"%@\"", path(), written.error());
+  return written.hasValue();
 }
 
 double QuiltMediaPreview::totalSizeInMegaBytes() const {

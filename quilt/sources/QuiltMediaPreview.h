@@ -3,6 +3,7 @@
 
 #include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Property.h"
+#include "quilt/platform/base/Result.h"
 #include "quilt/sources/ModelTypes.h"
 
 namespace quilt {
@@ -10,7 +11,10 @@ namespace quilt {
 class QuiltMediaSource;
 
 /// One still of a source: a movie's chapter or poster frame, a document's page, the picture of an image. Owned by its
-/// source; any thread may call it. Holds its image once that was asked for.
+/// source; any thread may call it.
+///
+/// Its picture is in one of two places: in the package, and then it is read from there and from nowhere else; or, until
+/// it is written there, in memory or in the file that it is made from.
 class QUILT_EXPORT QuiltMediaPreview : public platform::Object {
  public:
   /// A fresh identity, no picture, no index and no timecode.
@@ -55,9 +59,18 @@ class QUILT_EXPORT QuiltMediaPreview : public platform::Object {
 
   /// Where the picture lies in the package: index (or identity) and "jpg"; empty without a place in a document.
   Path path() const;
-  /// Whether there is a picture or ought to be one: in memory, marked as written, or a file at the path.
+  /// Whether there is a picture: one that is still to be written, or a file at the path.
   bool hasPicture() const;
-  /// Writes the picture into the package. True at once when it is there.
+  /// Whether its source may make it again of its main derivative: it made it, or it was read from a record. What a host
+  /// or a merge brought is theirs.
+  bool isRenewable() const { return _isRenewable.get(); }
+  void setIsRenewable(bool isRenewable) { _isRenewable.set(isRenewable); }
+  /// Writes the picture into the package, unless it is marked as written. From then on it is read from there: what it
+  /// was made from may go. NotFound without a place in a document or without a picture, Damaged or Unsupported when the
+  /// picture cannot be drawn, else what kept it from being written; logs a critical line, but for what cannot be drawn
+  /// or has no place, and then it is as it was.
+  platform::Result<void> writePicture();
+  /// writePicture(), after a warning when the picture cannot be drawn. Whether the picture is in the package.
   bool flatten();
   /// 0 unless flattened.
   double totalSizeInMegaBytes() const;
@@ -84,6 +97,10 @@ class QUILT_EXPORT QuiltMediaPreview : public platform::Object {
   platform::Property<std::optional<double>> _width{*this, "width"};
   platform::Property<std::optional<double>> _height{*this, "height"};
   platform::Property<bool> _isFlattened{*this, "isFlattened"};
+  platform::Property<bool> _isRenewable{*this, "isRenewable"};
+  // What the record said. Told again in the next one, so that a save need not open every picture.
+  std::optional<double> _recordedWidth;
+  std::optional<double> _recordedHeight;
   platform::WeakProperty<QuiltMediaSource> _sourceOwner{*this, "sourceOwner"};
   Dictionary _unknownEntries;
 };

@@ -253,6 +253,7 @@ void QuiltMediaSource::invalidateCaches() {
   };
   _derivatives.walk(invalidate);
   _previews.walk(invalidate);
+  setPreviewsLeftOut({});
   if (const auto samples = audioSamples()) {
     const auto guard = samples->lock();
     samples->invalidateCaches();

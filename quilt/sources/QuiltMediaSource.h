@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <set>
+
 #include "quilt/platform/base/ChildList.h"
 #include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/Property.h"
@@ -130,8 +132,16 @@ class QUILT_EXPORT QuiltMediaSource : public platform::Object {
   void setPreviews(std::vector<std::shared_ptr<QuiltMediaPreview>> previews);
   /// How many previews the content has: chapters or a poster frame, pages, or one picture. Opens the file.
   std::size_t previewCount() const;
-  /// The preview for the index, made when it is not there yet. Null past the last, and after a warning on failure.
+  /// The preview for the index, made when it is not there yet, or was lost. Null past the last, and after a warning
+  /// when it cannot be drawn. What is made of a file in the package is written there at once.
   std::shared_ptr<QuiltMediaPreview> previewAtIndex(std::size_t index);
+  /// Has the preview of that index, if there is one, count as none, with a warning that names file, item and picture.
+  /// It is not made again before the caches are invalidated.
+  void leaveOutPreview(std::size_t index, const platform::Error& error);
+  /// The indexes of the previews that cannot be drawn, as far as it was tried.
+  std::set<std::size_t> previewsLeftOut() const;
+  /// What was found out about another source with the same content, so that it is not tried and told again.
+  void setPreviewsLeftOut(std::set<std::size_t> indexes);
   /// Makes every preview, reporting each. False, after a critical line, when the block answers false. While an office
   /// document is converted, for seconds, 0 is reported with a null preview, so that a cancel is heard.
   bool previewWithProgressionBlock(const ObjectProgressionBlock<QuiltMediaPreview>& withProgressionBlock);
@@ -209,12 +219,15 @@ class QUILT_EXPORT QuiltMediaSource : public platform::Object {
   std::shared_ptr<QuiltMediaPreview> existingPreview(std::size_t index) const;
   std::shared_ptr<QuiltMediaPreview> usablePreview(std::size_t index);
   std::shared_ptr<QuiltMediaPreview> makePreview(const PreviewContent& content, std::size_t index);
+  void renewLostPreviews(const ContinueBlock& goesOn);
+  void readPreviewsFromPackage();
   bool convertImage(const std::string& format);
   bool convertAudio(const std::string& format, const ProgressionBlock& block);
   bool convertMovie(const std::string& format, const ProgressionBlock& block,
                     const std::vector<std::string>& followedBy);
   bool adoptConverted(const Path& file, const std::string& format);
-  Path newHiddenFile(const std::string& extension) const;
+  /// A name in the folder of the derivatives that nothing has yet, for a file in the making.
+  platform::Result<Path> newHiddenFile(const std::string& extension) const;
 
   platform::Property<std::string> _uuid{*this, "uuid"};
   platform::Property<std::shared_ptr<ImageWrapper>> _thumbnailImage{*this, "thumbnailImage"};
@@ -223,6 +236,7 @@ class QUILT_EXPORT QuiltMediaSource : public platform::Object {
                                                                            &QuiltMediaDerivative::setSourceOwner};
   platform::ChildList<QuiltMediaPreview, QuiltMediaSource> _previews{*this, "previews",
                                                                      &QuiltMediaPreview::setSourceOwner};
+  std::set<std::size_t> _previewsLeftOut;  // guarded by the previews' lock
   platform::Property<std::shared_ptr<QuiltMediaAudioSamples>> _audioSamples{*this, "audioSamples"};
   platform::Property<Text> _title{*this, "title"};
   platform::Property<Text> _description{*this, "description"};

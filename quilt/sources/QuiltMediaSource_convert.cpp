@@ -1,11 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <algorithm>
 
+#include "quilt/documents/QuiltDocument.h"
 #include "quilt/media/QuiltMedia.h"
 #include "quilt/platform/base/CleanUp.h"
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/base/Paths.h"
 #include "quilt/platform/interfaces/Services.h"
+#include "quilt/sources/DocumentSave.h"
 #include "quilt/sources/Grades.h"
 #include "quilt/sources/ModelFiles.h"
 #include "quilt/sources/QuiltMediaSource.h"
@@ -56,6 +58,7 @@ std::vector<std::string> QuiltMediaSource::availableFormats() const {
 
 bool QuiltMediaSource::convertToFormat(const std::string& format, const ProgressionBlock& withProgressionBlock,
                                        const std::vector<std::string>& followedBy) {
+  const SaveDeferral deferral;  // a record names what was made under its final name
   platform::report(withProgressionBlock, 0);
   bool done = !dirty() && derivativeWithFormat(format);
   if (!done) {
@@ -104,18 +107,35 @@ bool QuiltMediaSource::convertImage(const std::string& format) {
     }
     return false;
   }
-  const Path file = newHiddenFile("png");
-  return !file.empty() && scaled->saveAsPNGAtURL(Url::fileUrl(file)) && adoptConverted(file, format);
+  constexpr const char* notWritten = "Failed to write converted image of \"%@\": \"%@\"";
+  const auto file = newHiddenFile("png");
+  if (!file) {
+    FDYLogger::logCritical(notWritten, url, file.error());
+    return false;
+  }
+  const auto saved = scaled->saveAsPNGAtURL(Url::fileUrl(*file));
+  if (saved) return adoptConverted(*file, format);
+  if (!cannotBeDrawn(saved.error())) {
+    FDYLogger::logCritical(notWritten, url, saved.error());
+    return false;
+  }
+  // There is no smaller picture of what cannot be drawn: the file itself has to do for every format.
+  leaveOutPreview(0, saved.error());
+  auto tags = main->compatibilityTags().value_or(std::vector<std::string>());
+  tags.push_back(format);
+  main->setCompatibilityTags(std::move(tags));
+  return true;
 }
 
 bool QuiltMediaSource::convertAudio(const std::string& format, const ProgressionBlock& block) {
   const auto url = previewItemURL();
-  const Path file = newHiddenFile("m4a");
-  if (!url || file.empty()) return false;
+  if (!url) return false;
+  const auto file = newHiddenFile("m4a");
   platform::CarriedException thrown;
-  const auto made = services().transcoder->transcodeToAudio(*url, Url::fileUrl(file), stopWhenCancelled(block, thrown));
+  const auto made = file ? services().transcoder->transcodeToAudio(*url, Url::fileUrl(*file), stopWhenCancelled(block, thrown))
+                         : platform::Result<void>(file.error());
   thrown.rethrow();
-  if (made) return adoptConverted(file, format);
+  if (made) return adoptConverted(*file, format);
   FDYLogger::logCritical("Failed to convert file at URL \"%@\" to audio: \"%@\"", url, made.error());
   return false;
 }
@@ -130,16 +150,23 @@ bool QuiltMediaSource::convertMovie(const std::string& format, const Progression
     return true;
   }
   const auto url = main->url();
-  const Path file = newHiddenFile("m4v");
-  if (!url || file.empty()) return false;
+  if (!url) return false;
+  // The line names HD for both sizes.
+  constexpr const char* notConverted = "Failed to convert video at URL \"%@\" to HD: \"%@\"";
+  const auto file = newHiddenFile("m4v");
+  if (!file) {
+    FDYLogger::logCritical(notConverted, url, file.error());
+    return false;
+  }
   auto& transcoder = *services().transcoder;
-  const Url destination = Url::fileUrl(file);
+  const Url destination = Url::fileUrl(*file);
 
   // Decoding a movie once for both grades takes a good deal less time than twice.
   const std::string other = format == k720p ? k480p : k720p;
   const bool isOtherNext = std::find(followedBy.begin(), followedBy.end(), other) != followedBy.end();
   Path otherFile;
-  if (isOtherNext && !derivativeWithFormat(other) && isBetter(*main, other)) otherFile = newHiddenFile("m4v");
+  if (isOtherNext && !derivativeWithFormat(other) && isBetter(*main, other))
+    if (const auto second = newHiddenFile("m4v")) otherFile = *second;
 
   platform::CarriedException thrown;
   const auto transcode = [&, stop = stopWhenCancelled(block, thrown)] {
@@ -154,11 +181,10 @@ bool QuiltMediaSource::convertMovie(const std::string& format, const Progression
   const auto made = transcode();
   thrown.rethrow();
   if (!made) {
-    // The line names HD for both sizes.
-    FDYLogger::logCritical("Failed to convert video at URL \"%@\" to HD: \"%@\"", url, made.error());
+    FDYLogger::logCritical(notConverted, url, made.error());
     return false;
   }
-  if (!adoptConverted(file, format)) return false;
+  if (!adoptConverted(*file, format)) return false;
   // Whoever asks for the other one then learns whether it is there.
   if (!otherFile.empty()) adoptConverted(otherFile, other);
   return true;
@@ -166,22 +192,30 @@ bool QuiltMediaSource::convertMovie(const std::string& format, const Progression
 
 bool QuiltMediaSource::adoptConverted(const Path& file, const std::string& format) {
   const auto derivative = QuiltMediaDerivative::initWithPath(file);
+  if (!derivative) {
+    FDYLogger::logCritical("Failed to use the converted file at path \"%@\": \"It cannot be read\"", file);
+    return false;
+  }
   if (!derivative) return false;
   const platform::Uninterrupted whole;
   auto tags = derivative->compatibilityTags().value_or(std::vector<std::string>());
   tags.push_back(format);
   derivative->setCompatibilityTags(std::move(tags));
   addDerivative(derivative);
-  return derivative->flattenCopy(/*copy=*/false, [](double) { return true; });
+  if (derivative->flattenCopy(/*copy=*/false, [](double) { return true; })) return true;
+  removeDerivative(derivative);  // no record is to name a hidden file
+  return false;
 }
 
-Path QuiltMediaSource::newHiddenFile(const std::string& extension) const {
+platform::Result<Path> QuiltMediaSource::newHiddenFile(const std::string& extension) const {
   const Path folder = derivativesFolderPath();
-  if (folder.empty() || !createDirectoryInPackage(folder, document())) return {};
+  if (folder.empty()) return platform::Error{platform::ErrorKind::NotFound, "The source is not in a document.", {}};
+  if (const auto created = createDirectoryInPackage(folder, document()); !created) return created.error();
   Path file;
   do {
     file = folder / platform::withExtension("." + platform::generateUUID(), extension);
   } while (services().files->fileExistsAtPath(file));
+  document()->willMakeItem(file);
   return file;
 }
 

@@ -49,6 +49,7 @@ bool QuiltMediaSource::flattenCopy(bool copy, const ProgressionBlock& withProgre
       FDYLogger::logDebug("Failed to flatten source because it does not have a path");
       return Outcome::Failed;
     }
+    renewLostPreviews(progress.continueBlock());
     const std::size_t total = derivativeCount() + _previews.count();
     if (!makeFolderInPackage(path(), document(), kNoSourceFolder) ||
         !makeFolderInPackage(derivativesFolderPath(), document(), kNoSourceFolder) ||
@@ -69,11 +70,16 @@ bool QuiltMediaSource::flattenCopy(bool copy, const ProgressionBlock& withProgre
     });
     if (!copied) return Outcome::Failed;
 
+    readPreviewsFromPackage();
     Outcome outcome = Outcome::Done;
     step = derivativeCount();
+    std::vector<std::pair<std::size_t, platform::Error>> leftOut;
     _previews.walk([&](const auto& preview) {
       if (preview->isFlattened()) return true;
-      if (!preview->flatten()) {
+      const auto written = preview->writePicture();
+      if (!written && cannotBeDrawn(written.error())) {
+        leftOut.emplace_back(preview->index(), written.error());
+      } else if (!written) {
         FDYLogger::logDebug("Failed to flatten source preview \"%@\" during flattening at path \"%@\"", preview->uuid(),
                             path());
         outcome = Outcome::Failed;
@@ -83,6 +89,10 @@ bool QuiltMediaSource::flattenCopy(bool copy, const ProgressionBlock& withProgre
       outcome = Outcome::Cancelled;
       return false;
     });
+    for (const auto& [index, error] : leftOut) leaveOutPreview(index, error);
+    // Made from what the package now has a copy of.
+    _thumbnailImage.store(nullptr);
+    _posterImage.store(nullptr);
     if (outcome != Outcome::Done || contentCategory() == kQuiltMediaContentCategoryDocument) return outcome;
     addAudioSamplesForMainDerivative(progress.continueBlock());
     return progress.wasCancelled() ? Outcome::Cancelled : Outcome::Done;

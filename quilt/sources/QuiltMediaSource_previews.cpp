@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "quilt/documents/QuiltDocument.h"
+#include "quilt/media/QuiltMedia.h"
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/interfaces/Services.h"
 #include "quilt/sources/DocumentSave.h"
@@ -13,22 +14,41 @@ using platform::FDYLogger;
 using platform::Movie;
 using platform::services;
 
+using platform::Error;
+using platform::ErrorKind;
+using platform::Result;
+
 namespace {
 
-std::shared_ptr<QuiltMediaPreview> previewOfArtwork(const char* name, const char* type) {
-  const auto image = services().images->imageWithData(services().resources->artwork(name, type));
-  return image ? QuiltMediaPreview::initWithImageWrapper(*image) : nullptr;
+using Preview = Result<std::shared_ptr<QuiltMediaPreview>>;
+
+Error noSuchPreview() { return {ErrorKind::NotFound, "There is no such preview.", {}}; }
+
+Preview previewOf(const Result<std::shared_ptr<ImageWrapper>>& image) {
+  if (!image) return image.error();
+  if (auto preview = QuiltMediaPreview::initWithImageWrapper(*image)) return preview;
+  return Error{ErrorKind::Damaged, "The picture cannot be scaled.", {}};
+}
+
+Preview previewOfArtwork(const char* name, const char* type) {
+  return previewOf(services().images->imageWithData(services().resources->artwork(name, type)));
 }
 
 std::string firstLine(const std::string& text) { return text.substr(0, text.find_first_of("\r\n")); }
 
-std::shared_ptr<QuiltMediaPreview> previewOfPage(const Path& file, std::size_t index) {
+Preview previewOfPage(const Path& file, std::size_t index) {
   std::optional<platform::DocumentPage> page;
-  platform::performBlockOnMainThread([&] { page = platform::FDYPreviewDocumentPageAtIndex(file, index); });
-  auto preview = page ? QuiltMediaPreview::initWithImageWrapper(page->image) : nullptr;
-  if (!preview) return nullptr;
-  preview->setTitle(firstLine(page->text));
-  preview->setContent(page->text);
+  bool isPage = true;
+  platform::performBlockOnMainThread([&] {
+    page = platform::FDYPreviewDocumentPageAtIndex(file, index);
+    if (!page) isPage = index < platform::FDYPreviewDocumentPagesCount(file);
+  });
+  if (!isPage) return noSuchPreview();
+  if (!page) return Error{ErrorKind::Damaged, "The page cannot be read.", file};
+  auto preview = previewOf(page->image);
+  if (!preview) return preview;
+  (*preview)->setTitle(firstLine(page->text));
+  (*preview)->setContent(page->text);
   return preview;
 }
 
@@ -38,11 +58,6 @@ std::unique_ptr<Movie> openMovie(const QuiltMediaDerivative& main) {
   if (movie) return *std::move(movie);
   FDYLogger::logWarning("Failed to preview movie derivative at URL \"%@\": \"%@\"", url, movie.error());
   return nullptr;
-}
-
-std::shared_ptr<QuiltMediaPreview> previewOfFrame(Movie& movie, double time) {
-  const auto frame = movie.frameAtTime(time);
-  return frame ? QuiltMediaPreview::initWithImageWrapper(*frame) : nullptr;
 }
 
 // The author's choice, else 10 seconds into a long movie and the middle of a short one; moved to a key frame.
@@ -59,19 +74,19 @@ double posterTime(Movie& movie) {
   return keyFrame && *keyFrame != 0 ? *keyFrame : time;
 }
 
-std::shared_ptr<QuiltMediaPreview> previewOfMovie(Movie& movie, std::size_t index) {
+Preview previewOfMovie(Movie& movie, std::size_t index) {
   const auto& chapters = movie.chapters();
   if (!chapters.empty()) {
-    if (index >= chapters.size()) return nullptr;
-    auto preview = previewOfFrame(movie, chapters[index].start);
-    if (!preview) return nullptr;
-    preview->setTitle(chapters[index].name);
-    preview->setTimecode(chapters[index].start);
+    if (index >= chapters.size()) return noSuchPreview();
+    auto preview = previewOf(movie.frameAtTime(chapters[index].start));
+    if (!preview) return preview;
+    (*preview)->setTitle(chapters[index].name);
+    (*preview)->setTimecode(chapters[index].start);
     return preview;
   }
-  if (index != 0) return nullptr;
-  if (const auto artwork = movie.albumArtworkMovie()) return QuiltMediaPreview::initWithImageWrapper(artwork);
-  return previewOfFrame(movie, posterTime(movie));
+  if (index != 0) return noSuchPreview();
+  if (const auto artwork = movie.albumArtworkMovie()) return previewOf(artwork);
+  return previewOf(movie.frameAtTime(posterTime(movie)));
 }
 
 std::size_t previewCountOfMovie(const Movie* movie) {
@@ -113,14 +128,18 @@ struct QuiltMediaSource::PreviewContent {
     return pages;
   }
 
-  [[nodiscard]] std::shared_ptr<QuiltMediaPreview> makePreview(std::size_t index) const {
-    if (isMovie()) return movie ? previewOfMovie(*movie, index) : nullptr;
+  /// Whether a picture that was made is read anew from the file each time its pixels are needed.
+  [[nodiscard]] bool isReadEachTime() const { return isDocument() || category == kQuiltMediaContentCategoryImage; }
+
+  /// NotFound past the last, and for a movie that does not open, which was told.
+  [[nodiscard]] Preview makePreview(std::size_t index) const {
+    if (isMovie()) return movie ? previewOfMovie(*movie, index) : noSuchPreview();
+    if (isDocument()) return previewOfPage(file(), index);
+    if (index != 0) return noSuchPreview();
     if (category == kQuiltMediaContentCategoryAudio) return previewOfArtwork("AudioPreview", "png");
     if (category == kQuiltMediaContentCategoryWeb) return previewOfArtwork("WebPreview", "icns");
-    if (category == kQuiltMediaContentCategoryImage)
-      return QuiltMediaPreview::initWithImageWrapper(ImageWrapper::imageWithPath(file()));
-    if (isDocument()) return previewOfPage(file(), index);
-    return nullptr;
+    if (category == kQuiltMediaContentCategoryImage) return previewOf(services().images->imageWithPath(file()));
+    return noSuchPreview();
   }
 };
 
@@ -133,16 +152,16 @@ std::shared_ptr<QuiltMediaPreview> QuiltMediaSource::existingPreview(std::size_t
 std::shared_ptr<QuiltMediaPreview> QuiltMediaSource::usablePreview(std::size_t index) {
   auto preview = existingPreview(index);
   if (!preview || preview->hasPicture()) return preview;
-  // Recorded, but never written: the process ended before it could be. It is made again.
+  // Recorded and never written, because the process ended before it could be; or its file is gone. It is made again.
   removePreview(preview);
   return nullptr;
 }
 
 void QuiltMediaSource::flattenPreviews() {
-  _previews.walk([](const auto& preview) {
-    preview->flatten();
-    return true;
-  });
+  for (const auto& preview : _previews.copy()) {
+    if (const auto written = preview->writePicture(); !written && cannotBeDrawn(written.error()))
+      leaveOutPreview(preview->index(), written.error());
+  }
 }
 
 std::shared_ptr<QuiltMediaPreview> QuiltMediaSource::previewAtIndex(std::size_t index) {
@@ -153,11 +172,73 @@ std::shared_ptr<QuiltMediaPreview> QuiltMediaSource::previewAtIndex(std::size_t 
 }
 
 std::shared_ptr<QuiltMediaPreview> QuiltMediaSource::makePreview(const PreviewContent& content, std::size_t index) {
-  auto preview = content.makePreview(index);
-  if (!preview) return nullptr;
+  if (_previewsLeftOut.contains(index)) return nullptr;
+  const auto made = content.makePreview(index);
+  if (!made) {
+    if (cannotBeDrawn(made.error())) leaveOutPreview(index, made.error());
+    return nullptr;
+  }
+  const auto& preview = *made;
   preview->setIndex(index);
+  preview->setIsRenewable(true);
+  // The file before the record that names it. Of a file outside, the picture is written with the copy of that file.
+  if (content.main->isFlattened() && !folder().empty()) {
+    preview->setSourceOwner(shared(this));
+    if (const auto written = preview->writePicture(); !written && cannotBeDrawn(written.error())) {
+      preview->setSourceOwner(nullptr);
+      leaveOutPreview(index, written.error());
+      return nullptr;
+    }
+  }
   addPreview(preview);
   return preview;
+}
+
+void QuiltMediaSource::leaveOutPreview(std::size_t index, const Error& error) {
+  const SaveDeferral deferral;
+  const auto guard = _previews.lock();
+  if (_previewsLeftOut.insert(index).second) {
+    const auto media = mediaOwner();
+    const Text name = media && media->title() ? media->title() : title();
+    FDYLogger::logWarning("Picture %ld of \"%@\" cannot be drawn and is left out: \"%@\" (file \"%@\")", index + 1,
+                          name, error, previewItemURL());
+  }
+  if (const auto preview = existingPreview(index)) removePreview(preview);
+}
+
+std::set<std::size_t> QuiltMediaSource::previewsLeftOut() const {
+  const auto guard = _previews.lock();
+  return _previewsLeftOut;
+}
+
+void QuiltMediaSource::setPreviewsLeftOut(std::set<std::size_t> indexes) {
+  const auto guard = _previews.lock();
+  _previewsLeftOut = std::move(indexes);
+}
+
+void QuiltMediaSource::renewLostPreviews(const ContinueBlock& goesOn) {
+  const SaveDeferral deferral;
+  const auto guard = _previews.lock();
+  std::optional<PreviewContent> content;  // opened for the first that is lost
+  for (const auto& preview : _previews.copy()) {
+    const bool isPending = preview->isRenewable() && preview->index() != kNoIndex && !preview->isFlattened();
+    if (!isPending || preview->hasPicture()) continue;
+    if (!content) content.emplace(*this, goesOn);
+    if (!usablePreview(preview->index())) makePreview(*content, preview->index());
+  }
+}
+
+void QuiltMediaSource::readPreviewsFromPackage() {
+  const auto guard = _previews.lock();
+  const auto isPending = [](const auto& preview) { return preview->isRenewable() && !preview->isFlattened(); };
+  if (!_previews.first(isPending)) return;
+  const PreviewContent content(*this);
+  if (!content.isReadEachTime()) return;
+  _previews.walk([&](const auto& preview) {
+    if (!isPending(preview)) return true;
+    if (const auto again = content.makePreview(preview->index())) preview->setImage((*again)->image());
+    return true;
+  });
 }
 
 bool QuiltMediaSource::previewWithProgressionBlock(
@@ -228,6 +309,7 @@ void QuiltMediaSource::removePreview(const std::shared_ptr<QuiltMediaPreview>& p
 
 void QuiltMediaSource::removeAllPreviews() {
   const platform::Uninterrupted whole;
+  setPreviewsLeftOut({});
   for (const auto& preview : _previews.copy()) removePreview(preview);
 }
 

@@ -7,15 +7,43 @@ import {join} from 'node:path';
 import WebSocket from 'ws';
 
 const kPreferences = {
-  'app.update.auto': false, 'app.normandy.enabled': false, 'browser.safebrowsing.malware.enabled': false, 'browser.safebrowsing.phishing.enabled': false,
-  'browser.shell.checkDefaultBrowser': false, 'datareporting.policy.dataSubmissionEnabled': false, 'extensions.update.enabled': false,
-  'network.captive-portal-service.enabled': false, 'network.connectivity-service.enabled': false, 'services.settings.server': 'data:,', 'toolkit.telemetry.enabled': false,
+  'app.update.auto': false,
+  'app.normandy.enabled': false,
+  'browser.safebrowsing.malware.enabled': false,
+  'browser.safebrowsing.phishing.enabled': false,
+  'browser.shell.checkDefaultBrowser': false,
+  'datareporting.policy.dataSubmissionEnabled': false,
+  'extensions.update.enabled': false,
+  'network.captive-portal-service.enabled': false,
+  'network.connectivity-service.enabled': false,
+  'services.settings.server': 'data:,',
+  'toolkit.telemetry.enabled': false,
 };
 
 export async function launchFirefox(program = process.env.FIREFOX || '/usr/bin/firefox-esr') {
   const profile = mkdtempSync(join(tmpdir(), 'quilt-firefox-'));
-  writeFileSync(join(profile, 'user.js'), Object.entries(kPreferences).map(([key, value]) => `user_pref(${JSON.stringify(key)}, ${JSON.stringify(value)});\n`).join(''));
-  const process_ = spawn(program, ['--headless', '--no-remote', '--profile', profile, '--remote-debugging-port', '0', '--width', '1280', '--height', '900'], {stdio: ['ignore', 'ignore', 'pipe']});
+  writeFileSync(
+    join(profile, 'user.js'),
+    Object.entries(kPreferences)
+      .map(([key, value]) => `user_pref(${JSON.stringify(key)}, ${JSON.stringify(value)});\n`)
+      .join(''),
+  );
+  const process_ = spawn(
+    program,
+    [
+      '--headless',
+      '--no-remote',
+      '--profile',
+      profile,
+      '--remote-debugging-port',
+      '0',
+      '--width',
+      '1280',
+      '--height',
+      '900',
+    ],
+    {stdio: ['ignore', 'ignore', 'pipe']},
+  );
   const address = await new Promise((resolve, reject) => {
     let said = '';
     process_.stderr.on('data', (data) => {
@@ -29,32 +57,52 @@ export async function launchFirefox(program = process.env.FIREFOX || '/usr/bin/f
   const socket = new WebSocket(address);
   await new Promise((resolve, reject) => socket.once('open', resolve).once('error', reject));
 
-  const waiting = new Map(), complaints = [], requests = [];
+  const waiting = new Map(),
+    complaints = [],
+    requests = [];
   let last = 0;
   socket.on('message', (data) => {
     const message = JSON.parse(data);
     if (message.type === 'event') {
       const {method, params} = message;
       if (method === 'log.entryAdded' && ['error', 'warn'].includes(params.level)) complaints.push(params.text);
-      if (method === 'network.beforeRequestSent' && !/^(file|data|about|blob):/.test(params.request.url)) requests.push(params.request.url);
+      if (method === 'network.beforeRequestSent' && !/^(file|data|about|blob):/.test(params.request.url))
+        requests.push(params.request.url);
       return;
     }
+    if (!waiting.has(message.id)) return; // it was given up
     const {resolve, reject} = waiting.get(message.id);
     waiting.delete(message.id);
     if (message.type === 'success') resolve(message.result);
     else reject(new Error(message.message));
   });
-  const send = (method, params = {}) => new Promise((resolve, reject) => {
-    waiting.set(++last, {resolve, reject});
-    socket.send(JSON.stringify({id: last, method, params}));
-  });
+  const send = (method, params = {}) =>
+    new Promise((resolve, reject) => {
+      const id = ++last;
+      const timer = setTimeout(() => {
+        waiting.delete(id);
+        reject(new Error(`Firefox does not answer ${method}`));
+      }, 60000);
+      const end = (settle) => (value) => {
+        clearTimeout(timer);
+        settle(value);
+      };
+      waiting.set(id, {resolve: end(resolve), reject: end(reject)});
+      socket.send(JSON.stringify({id, method, params}));
+    });
 
   await send('session.new', {capabilities: {}});
   await send('session.subscribe', {events: ['log.entryAdded', 'network.beforeRequestSent']});
-  const {contexts: [{context}]} = await send('browsingContext.getTree');
+  const {
+    contexts: [{context}],
+  } = await send('browsingContext.getTree');
   const evaluate = async (body, ...values) => {
     const expression = `(${body})(${values.map((value) => JSON.stringify(value)).join()})`;
-    const answer = await send('script.evaluate', {expression: `(async () => JSON.stringify(await ${expression}))()`, target: {context}, awaitPromise: true});
+    const answer = await send('script.evaluate', {
+      expression: `(async () => JSON.stringify(await ${expression}))()`,
+      target: {context},
+      awaitPromise: true,
+    });
     if (answer.type === 'exception') throw new Error(answer.exceptionDetails.text);
     return answer.result.type === 'string' ? JSON.parse(answer.result.value) : undefined;
   };
@@ -64,7 +112,7 @@ export async function launchFirefox(program = process.env.FIREFOX || '/usr/bin/f
     evaluate,
     goto: (url) => send('browsingContext.navigate', {context, url, wait: 'complete'}),
     async until(condition, ...values) {
-      for (const end = Date.now() + 20000; !await evaluate(condition, ...values);) {
+      for (const end = Date.now() + 20000; !(await evaluate(condition, ...values)); ) {
         if (Date.now() > end) throw new Error('never came true: ' + condition);
         await new Promise((resolve) => setTimeout(resolve, 100));
       }
@@ -74,9 +122,36 @@ export async function launchFirefox(program = process.env.FIREFOX || '/usr/bin/f
         const box = document.querySelector(text).getBoundingClientRect();
         return {x: Math.round(box.x + box.width / 2), y: Math.round(box.y + box.height / 2)};
       }, selector);
-      await send('input.performActions', {context, actions: [{type: 'pointer', id: 'mouse', actions: [{type: 'pointerMove', ...place}, {type: 'pointerDown', button: 0}, {type: 'pointerUp', button: 0}]}]});
+      await send('input.performActions', {
+        context,
+        actions: [
+          {
+            type: 'pointer',
+            id: 'mouse',
+            actions: [
+              {type: 'pointerMove', ...place},
+              {type: 'pointerDown', button: 0},
+              {type: 'pointerUp', button: 0},
+            ],
+          },
+        ],
+      });
     },
-    press: (key) => send('input.performActions', {context, actions: [{type: 'key', id: 'keys', actions: [{type: 'keyDown', value: key}, {type: 'keyUp', value: key}]}]}),
+    resize: (width, height) => send('browsingContext.setViewport', {context, viewport: {width, height}}),
+    press: (key) =>
+      send('input.performActions', {
+        context,
+        actions: [
+          {
+            type: 'key',
+            id: 'keys',
+            actions: [
+              {type: 'keyDown', value: key},
+              {type: 'keyUp', value: key},
+            ],
+          },
+        ],
+      }),
     async screenshot(path) {
       const {data} = await send('browsingContext.captureScreenshot', {context});
       writeFileSync(path, Buffer.from(data, 'base64'));

@@ -12,7 +12,8 @@ const {connect} = createRequire(import.meta.url)(join(kSource, 'quilt/resources/
 export const kProgram = process.env.QUILT_PROGRAM || join(kSource, 'build/release/cli/quilt');
 export const whyNoProgram = existsSync(kProgram) ? false : 'the program is not built';
 
-const kPaper = '%PDF-1.4\n1 0 obj<</Type/Catalog/Pages 2 0 R>>endobj\n2 0 obj<</Type/Pages/Kids[3 0 R]/Count 1>>endobj\n3 0 obj<</Type/Page/Parent 2 0 R/MediaBox[0 0 300 400]>>endobj\ntrailer<</Root 1 0 R>>\n%%EOF\n';
+const kPaper =
+  '%PDF-1.4\n1 0 obj<</Type/Catalog/Pages 2 0 R>>endobj\n2 0 obj<</Type/Pages/Kids[3 0 R]/Count 1>>endobj\n3 0 obj<</Type/Page/Parent 2 0 R/MediaBox[0 0 300 400]>>endobj\ntrailer<</Root 1 0 R>>\n%%EOF\n';
 
 /// A property list as another program reads it.
 export function readPropertyList(file) {
@@ -28,23 +29,47 @@ export class Served {
     mkdirSync(folder, {recursive: true});
     writeFileSync(join(folder, 'worksheet.pdf'), kPaper);
     writeFileSync(join(folder, 'notes.pdf'), kPaper);
-    writeFileSync(join(folder, 'manifest.json'), JSON.stringify({theme: 'org.quilt.theme.olive', ...manifest(media, join(folder, 'worksheet.pdf'), join(folder, 'notes.pdf'))}));
+    writeFileSync(
+      join(folder, 'manifest.json'),
+      JSON.stringify({
+        theme: 'org.quilt.theme.olive',
+        ...manifest(media, join(folder, 'worksheet.pdf'), join(folder, 'notes.pdf')),
+      }),
+    );
     this.environment = {...process.env, XDG_DATA_HOME: folder, QUILT_LIBRARY: join(folder, 'library')};
-    this.run('build', join(folder, 'manifest.json'), '--library', this.environment.QUILT_LIBRARY, '--output', join(folder, 'out'), '--json', '--progress=none');
+    this.run(
+      'build',
+      join(folder, 'manifest.json'),
+      '--library',
+      this.environment.QUILT_LIBRARY,
+      '--output',
+      join(folder, 'out'),
+      '--json',
+      '--progress=none',
+    );
     const [{uuid, path}] = JSON.parse(this.run('list', '--json')).result.flatMap((collection) => collection.documents);
     Object.assign(this, {uuid, package: path});
     this.clients = [];
   }
 
-  run(...words) { return execFileSync(kProgram, words, {encoding: 'utf8', env: this.environment, stdio: ['ignore', 'pipe', 'pipe']}); }
+  run(...words) {
+    return execFileSync(kProgram, words, {encoding: 'utf8', env: this.environment, stdio: ['ignore', 'pipe', 'pipe']});
+  }
 
   /// The record as Python reads it.
-  get record() { return readPropertyList(join(this.package, 'properties.plist')); }
+  get record() {
+    return readPropertyList(join(this.package, 'properties.plist'));
+  }
 
   async start(...options) {
-    this.process = spawn(kProgram, ['serve', this.uuid, ...options], {env: this.environment, stdio: ['ignore', 'pipe', 'pipe']});
+    this.process = spawn(kProgram, ['serve', this.uuid, ...options], {
+      env: this.environment,
+      stdio: ['ignore', 'pipe', 'pipe'],
+    });
     this.errors = '';
-    this.process.stderr.on('data', (data) => { this.errors += data; });
+    this.process.stderr.on('data', (data) => {
+      this.errors += data;
+    });
     this.ended = new Promise((resolve) => this.process.once('exit', resolve));
     this.address = await new Promise((resolve, reject) => {
       this.process.stdout.once('data', (line) => resolve(String(line).trim()));

@@ -13,7 +13,9 @@ export const kShots = kFolder + '/screenshots';
 /// One browser for a test file.
 export function useBrowser() {
   const shared = {};
-  before(async () => { shared.browser = await launch(); });
+  before(async () => {
+    shared.browser = await launch();
+  });
   after(() => shared.browser.close());
 
   /// Opens a package from disk, runs the body, and asks that nothing was complained about and no network was used.
@@ -45,21 +47,37 @@ export async function inRealTime(context, body) {
 }
 
 /// What the player says.
-export const playerState = (page) => page.evaluate(() => {
-  const player = window.Olive.app.stage.player;
-  return {time: player.time, isPlaying: player.isPlaying, duration: player.duration, speed: player.speed, loudness: player.loudness, isMuted: player.isMuted};
-});
+export const playerState = (page) =>
+  page.evaluate(() => {
+    const player = window.Olive.app.stage.player;
+    return {
+      time: player.time,
+      isPlaying: player.isPlaying,
+      duration: player.duration,
+      speed: player.speed,
+      loudness: player.loudness,
+      isMuted: player.isMuted,
+    };
+  });
 
 /// Waits in the page; asks again and again because the page's policy forbids what Playwright's own waiting does.
 export async function until(page, condition, argument, limit = 20000) {
   const end = Date.now() + limit;
-  while (!await page.evaluate(condition, argument)) {
+  while (!(await page.evaluate(condition, argument))) {
     if (Date.now() > end) throw new Error('never came true: ' + condition);
     await new Promise((resolve) => setTimeout(resolve, 50));
   }
 }
-export const playing = (page) => until(page, () => window.Olive.app.stage.player.isPlaying && window.Olive.app.stage.player.time > 0.1);
+export const playing = (page) =>
+  until(page, () => window.Olive.app.stage.player.isPlaying && window.Olive.app.stage.player.time > 0.1);
 export const start = async (page) => {
   await page.click('.big-play');
   await playing(page);
 };
+
+/// Chooses in the menu of the controls: a speed or quality by its words.
+export async function choose(page, words) {
+  await page.click('.transport .menu-place > button');
+  await page.click(`.menu-choice:has(span:text-is("${words}"))`);
+  await page.keyboard.press('Escape');
+}

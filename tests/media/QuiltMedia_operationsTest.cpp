@@ -502,9 +502,12 @@ TEST_F(QuiltMediaOperationsTest, FinalizingMakesThePreviewsOfEveryChild) {
   EXPECT_TRUE(item()->finalizeWithProgressionBlock({}));
   for (const std::shared_ptr<QuiltMediaSource>& child : {source, {extra}, commentary}) {
     EXPECT_TRUE(child->isPreviewed());
-    EXPECT_THAT(namesIn(child->previewsFolderPath()), IsEmpty()) << "in memory";
+    EXPECT_THAT(namesIn(child->previewsFolderPath()), ElementsAre("0.jpg")) << "written as it is made";
   }
+  source->addPreview(QuiltMediaPreview::initWithImageWrapper(picture(4, 4)));
   item()->flattenPreviews();
+  EXPECT_THAT(namesIn(source->previewsFolderPath()), ::testing::SizeIs(2)) << "also what others brought";
+  source->removePreview(source->previews().back());
   for (const std::shared_ptr<QuiltMediaSource>& child : {source, {extra}, commentary})
     EXPECT_THAT(namesIn(child->previewsFolderPath()), ElementsAre("0.jpg"));
 }
@@ -679,7 +682,9 @@ TEST_F(QuiltMediaOperationsTest, AConversionStopsAtTheFirstChildThatFails) {
     progress.values.clear();
     takeLines();
     EXPECT_FALSE(item()->convertToFormat("720p", progress.block()));
-    EXPECT_THAT(takeLines(), IsEmpty()) << "the item adds no line of its own";
+    EXPECT_EQ(takeLines(), Lines{critical("Failed to write converted image of \"" +
+                                          Url::fileUrl(large).absoluteString() + "\": \"The disk is full.\"")})
+        << "the item adds no line of its own";
     return progress.values;
   };
   // A child that fails reports 0 before and after.

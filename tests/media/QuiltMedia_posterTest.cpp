@@ -121,15 +121,17 @@ TEST_F(QuiltMediaPosterTest, AFirstSourceWithoutAPosterOfItsOwnGivesNone) {
   keepDocumentBusy();
   const auto source = addSource(pictureFile(8, 8));
   source->addPreview(QuiltMediaPreview::initWithDictionary({{"Index", 0}, {"IsFlattened", true}}, source));
+  std::filesystem::create_directories(source->previewsFolderPath());
+  writeFile(source->previewsFolderPath() / "0.jpg", "no picture");
   takeLines();
   EXPECT_EQ(item()->posterImage(), nullptr);
   EXPECT_EQ(takeLines(), (Lines{warning("Media source preview path \"" +
-                                        (source->previewsFolderPath() / "0.jpg").native() + "\" does not exist"),
+                                        (source->previewsFolderPath() / "0.jpg").native() + "\" is not a valid image"),
                                 warning("Media poster image cannot be previewed because URL \"" +
                                         source->mainDerivative()->url()->absoluteString() + "\" is invalid"),
                                 warning("Media poster image cannot be previewed")}));
   EXPECT_EQ(item()->posterImageVersion(), 2u);
-  EXPECT_FALSE(std::filesystem::exists(item()->path()));
+  EXPECT_FALSE(std::filesystem::exists(item()->posterImagePath()));
 }
 
 TEST_F(QuiltMediaPosterTest, ACompositionThatAnotherRunSavedIsShown) {

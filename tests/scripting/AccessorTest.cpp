@@ -121,6 +121,18 @@ TEST_F(DocumentAccessorTest, AMissingDescriptionIsAnsweredByAPlaceholderAndStays
   EXPECT_EQ(document()->description(), "");
 }
 
+TEST_F(DocumentAccessorTest, TellsWhetherAnAnswerStandsWhereNothingIsStored) {
+  document()->setTitle("");
+  EXPECT_TRUE(answersStandIn(*document(), "cvTitle"));
+  EXPECT_TRUE(answersStandIn(*document(), "cvDescription"));
+  EXPECT_FALSE(answersStandIn(*document(), "cvAuthor"));
+  document()->setTitle("Untitled Episode");
+  document()->setDescription("Lorem ipsum");
+  EXPECT_FALSE(answersStandIn(*document(), "cvTitle"));
+  EXPECT_FALSE(answersStandIn(*document(), "cvDescription"));
+  EXPECT_FALSE(answersStandIn(*document(), "title"));
+}
+
 TEST_F(DocumentAccessorTest, SettersTellAndSet) {
   keepDocumentBusy();
   expect(*document(), "cvSetTitle:", kNone, "Conveyor is setting document \"D\" title to \"New\"", {text("New")});

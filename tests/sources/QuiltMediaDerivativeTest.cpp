@@ -6,6 +6,7 @@
 #include <cmath>
 
 #include "quilt/platform/base/Paths.h"
+#include "tests/support/DocumentFixtures.h"
 #include "tests/support/PackageFixture.h"
 
 namespace quilt {
@@ -90,7 +91,8 @@ TEST_F(QuiltMediaDerivativeTest, PngAndJpegAreGradedBySizeAndOtherImagesAreDeskt
   EXPECT_THAT(tagsOf(pictureFile(640, 480)), ElementsAre("480p"));
   EXPECT_THAT(tagsOf(pictureFile(641, 480)), ElementsAre("720p"));
   EXPECT_THAT(tagsOf(pictureFile(1281, 720)), ElementsAre("Desktop"));
-  const Path tiff = support::runFfmpeg({"-f", "lavfi", "-i", "color=red:s=16x16", "-frames:v", "1"}, "tiff");
+  const Path tiff =
+      support::runFfmpeg({"-f", "lavfi", "-i", "color=red:s=16x16", "-frames:v", "1", "-pix_fmt", "rgb24"}, "tiff");
   EXPECT_THAT(tagsOf(tiff), ElementsAre("Desktop"));
 }
 
@@ -100,7 +102,7 @@ TEST_F(QuiltMediaDerivativeTest, APictureThatCannotBeLoadedIsRefused) {
 }
 
 TEST_F(QuiltMediaDerivativeTest, APdfSuitsEveryTarget) {
-  EXPECT_THAT(tagsOf(writeFile(folder() / "a.pdf", "%PDF-1.4\n")), ElementsAre("Desktop", "720p", "480p"));
+  EXPECT_THAT(tagsOf(writeFile(folder() / "a.pdf", support::makePages(1))), ElementsAre("Desktop", "720p", "480p"));
 }
 
 TEST_F(QuiltMediaDerivativeTest, AWebLinkSuitsEveryTargetAndIsFlattened) {
@@ -163,7 +165,7 @@ TEST_F(QuiltMediaDerivativeTest, AnUnreadableMovieGetsNoTags) {
 TEST_F(QuiltMediaDerivativeTest, EachListAcceptsItsOwn) {
   const Url movieFile = Url::fileUrl(support::makeMedia(movie(320, 240)));
   const Url sound = Url::fileUrl(support::makeMedia(support::m4aSound()));
-  const Url pdf = Url::fileUrl(writeFile(folder() / "a.pdf", "%PDF-1.4\n"));
+  const Url pdf = Url::fileUrl(writeFile(folder() / "a.pdf", support::makePages(1)));
   const Url text = Url::fileUrl(writeFile(folder() / "a.txt", "text"));
   const Url gone = Url::fileUrl(folder() / "gone");
   const Url link = *Url::parse("https://example.org/");

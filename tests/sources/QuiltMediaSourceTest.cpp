@@ -387,10 +387,12 @@ TEST_F(QuiltMediaSourceTest, APosterWhosePreviewHasNoPictureSaysWhichUrl) {
   keepDocumentBusy();
   const auto source = addSource(pictureFile(8, 8));
   source->addPreview(QuiltMediaPreview::initWithDictionary({{"Index", 0}, {"IsFlattened", true}}, source));
+  std::filesystem::create_directories(source->previewsFolderPath());
+  writeFile(source->previewsFolderPath() / "0.jpg", "no picture");
   takeLines();
   EXPECT_EQ(source->posterImage(), nullptr);
   EXPECT_EQ(takeLines(), (Lines{warning("Media source preview path \"" +
-                                        (source->previewsFolderPath() / "0.jpg").native() + "\" does not exist"),
+                                        (source->previewsFolderPath() / "0.jpg").native() + "\" is not a valid image"),
                                 warning("Media poster image cannot be previewed because URL \"" +
                                         source->mainDerivative()->url()->absoluteString() + "\" is invalid")}));
 }

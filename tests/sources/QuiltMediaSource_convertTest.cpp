@@ -4,6 +4,7 @@
 #include <algorithm>
 
 #include "quilt/sources/QuiltMediaSource.h"
+#include "tests/support/DocumentFixtures.h"
 #include "tests/support/PackageFixture.h"
 #include "tests/support/SourceServices.h"
 
@@ -110,7 +111,7 @@ TEST_F(QuiltMediaSourceConvertTest, ACleanSourceThatHasTheFormatAnswersWithTheBl
 TEST_F(QuiltMediaSourceConvertTest, DocumentsAndLinksAreNeverConverted) {
   const auto link = QuiltMediaSource::initWithURL(*Url::parse("https://example.org/"));
   item()->addSource(link);
-  const auto document = source(writeFile(folder() / "a.pdf", "%PDF-1.4\n"));
+  const auto document = source(writeFile(folder() / "a.pdf", support::makePages(1)));
   for (const auto& each : {link, document}) {
     each->mainDerivative()->setCompatibilityTags(std::vector<std::string>{"Desktop"});
     takeLines();
@@ -251,7 +252,8 @@ TEST_F(QuiltMediaSourceConvertTest, AnImageThatCannotBeWrittenFails) {
   images->failSave = support::withExtension("png");
   EXPECT_FALSE(source->convertToFormat("720p", progress.block()));
   EXPECT_THAT(progress.values, ElementsAre(0, 0));
-  EXPECT_THAT(takeLines(), IsEmpty());
+  EXPECT_EQ(takeLines(), Lines{critical("Failed to write converted image of \"" +
+                                        source->previewItemURL()->absoluteString() + "\": \"The disk is full.\"")});
   expectFailed(*source);
 }
 
@@ -476,8 +478,12 @@ TEST_F(QuiltMediaSourceConvertTest, AnOutputThatNoDerivativeAcceptsFailsAndStays
   EXPECT_THAT(progress.values, ElementsAre(0, 0));
   ASSERT_THAT(transcoder->calls, SizeIs(1));
   const Url output = transcoder->calls[0].destination;
-  EXPECT_EQ(takeLines().back(), debug("Failed to create source derivative for url \"" + output.absoluteString() +
-                                      "\": \"Not a compatible file\""));
+  const Lines lines = takeLines();
+  ASSERT_GE(lines.size(), 2u);
+  EXPECT_EQ(lines[lines.size() - 2], debug("Failed to create source derivative for url \"" + output.absoluteString() +
+                                           "\": \"Not a compatible file\""));
+  EXPECT_EQ(lines.back(), critical("Failed to use the converted file at path \"" + output.relativePath().native() +
+                                   "\": \"It cannot be read\""));
   EXPECT_TRUE(std::filesystem::exists(output.relativePath()));
   expectFailed(*source);
 }

@@ -4,6 +4,7 @@
 #include <cerrno>
 
 #include "quilt/sources/QuiltMediaSource.h"
+#include "tests/support/DocumentFixtures.h"
 #include "tests/support/PackageFixture.h"
 #include "tests/support/SourceServices.h"
 
@@ -24,6 +25,12 @@ using ::testing::IsEmpty;
 
 class QuiltMediaSourceDerivativesTest : public support::PackageFixture {
  protected:
+  /// A PDF of a length that eight divides.
+  Path documentFile() const {
+    std::string pdf = support::makePages(1);
+    pdf.resize((pdf.size() + 7) / 8 * 8, '\n');
+    return writeFile(folder() / "file.pdf", pdf);
+  }
   static Dictionary linkRecord(const std::string& tag) {
     return {{"URL", "https://example.org/" + tag}, {"ContentType", "public.url"}, {"CompatibilityTags", Array{tag}}};
   }
@@ -158,7 +165,7 @@ TEST_F(QuiltMediaSourceDerivativesTest, ChildrenAreReadWithTheirOwnerSoThatNames
 // ---- Construction
 
 TEST_F(QuiltMediaSourceDerivativesTest, ADocumentFileIsNotAskedForItsSound) {
-  const Path file = writeFile(folder() / "a.pdf", "%PDF-1.4\n");
+  const Path file = writeFile(folder() / "a.pdf", support::makePages(1));
   takeLines();
   const auto source = QuiltMediaSource::initWithPath(file);
   ASSERT_NE(source, nullptr);
@@ -249,9 +256,10 @@ TEST_F(QuiltMediaSourceDerivativesTest, EachImageIsInvalidatedByItself) {
 
 TEST_F(QuiltMediaSourceDerivativesTest, ReloadMapsTheCopyIntoTheRangeFromTwentyToAHundred) {
   const auto source = addEmptySource();
-  const Path file = writeFile(folder() / "file.pdf", "%PDF-1.4");
+  const Path file = documentFile();
+  const auto size = static_cast<std::int64_t>(std::filesystem::file_size(file));
   const Installed<ToldFiles> files(&Services::files);
-  files->reports = {0, 3, 8};
+  files->reports = {0, size * 3 / 8, size};
   source->reloadWithFileAtPath(file, progress.block());
   EXPECT_THAT(progress.values, ElementsAre(0, 10, 20, 20, 37 * 8.0 / 10.0 + 20.0, 100, 100, 100));
   EXPECT_TRUE(source->mainDerivative()->isFlattened());
@@ -260,9 +268,10 @@ TEST_F(QuiltMediaSourceDerivativesTest, ReloadMapsTheCopyIntoTheRangeFromTwentyT
 TEST_F(QuiltMediaSourceDerivativesTest, ACancelStopsTheCopyOfAReloadWhichEndsAllTheSame) {
   keepDocumentBusy();
   const auto source = addEmptySource();
-  const Path file = writeFile(folder() / "file.pdf", "%PDF-1.4");
+  const Path file = documentFile();
+  const auto size = static_cast<std::int64_t>(std::filesystem::file_size(file));
   const Installed<ToldFiles> files(&Services::files);
-  files->reports = {4, 6, 8};
+  files->reports = {size / 2, size * 3 / 4, size};
   progress.cancelAt = 60;
   takeLines();
   source->reloadWithFileAtPath(file, progress.block());
@@ -284,9 +293,9 @@ TEST_F(QuiltMediaSourceDerivativesTest, ACancelStopsTheCopyOfAReloadWhichEndsAll
 
 TEST_F(QuiltMediaSourceDerivativesTest, OnlyTheCopysAnswersMatterToAReload) {
   const auto source = addEmptySource();
-  const Path file = writeFile(folder() / "file.pdf", "%PDF-1.4");
+  const Path file = documentFile();
   const Installed<ToldFiles> files(&Services::files);
-  files->reports = {4};
+  files->reports = {static_cast<std::int64_t>(std::filesystem::file_size(file)) / 2};
   source->reloadWithFileAtPath(file, [](double percentage) { return percentage == 60; });
   EXPECT_TRUE(source->mainDerivative()->isFlattened());
 }

@@ -83,7 +83,9 @@ class BareToolkit final : public platform::MovieToolkit {
 class QuiltMediaSourcePreviewsTest : public support::PackageFixture {
  protected:
   /// A source that holds a document file with nothing in it; what its pages are the service says.
-  std::shared_ptr<QuiltMediaSource> documentSource() { return addSource(writeFile(folder() / "a.pdf", "%PDF-1.4\n")); }
+  std::shared_ptr<QuiltMediaSource> documentSource() {
+    return addSource(writeFile(folder() / "a.pdf", support::makePages(1)));
+  }
   std::shared_ptr<QuiltMediaSource> movieSource() {
     support::MediaSpec spec = support::silentMovie();
     spec.duration = 1;
@@ -273,7 +275,8 @@ TEST_F(QuiltMediaSourcePreviewsTest, APreviewThatCannotBeWrittenIsNotFlattened) 
   EXPECT_FALSE(preview->flatten());
   EXPECT_FALSE(preview->isFlattened());
   EXPECT_THAT(namesIn(source->previewsFolderPath()), IsEmpty());
-  EXPECT_THAT(takeLines(), IsEmpty());
+  EXPECT_EQ(takeLines(), Lines{critical("Failed to write media source preview at path \"" + preview->path().native() +
+                                        "\": \"The disk is full.\"")});
 }
 
 TEST_F(QuiltMediaSourcePreviewsTest, APreviewThatCannotBeSizedSaysWhy) {

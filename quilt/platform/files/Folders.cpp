@@ -4,6 +4,7 @@
 #include <dirent.h>
 #include <fcntl.h>
 #include <linux/fs.h>
+#include <sys/file.h>
 #include <sys/stat.h>
 
 #include <algorithm>
@@ -181,14 +182,16 @@ int removeTree(SystemCalls& system, int folder, const std::string& name, bool& c
   if (status.st_dev != outside.st_dev) return EXDEV;
   if ((status.st_mode & S_IRWXU) != S_IRWXU) system.changeMode(item.number(), S_IRWXU);
 
-  // On a full disk the renaming may fail; the deletion then happens in the open.
+  // On a full disk the renaming may fail; the deletion then happens in the open. What is hidden already stays so.
   const std::string hidden = hiddenNameBeside(name);
-  const bool isHidden = system.renameAt(folder, name.c_str(), folder, hidden.c_str(), RENAME_NOREPLACE) == 0;
+  const bool isHidden = hiddenNameFrom(name).kind != HiddenKind::Half &&
+                        system.renameAt(folder, name.c_str(), folder, hidden.c_str(), RENAME_NOREPLACE) == 0;
   const std::string& current = isHidden ? hidden : name;
   int error = Emptying(system, item.number(), status.st_dev, changed).run();
   if (error == 0 && system.unlinkAt(folder, current.c_str(), AT_REMOVEDIR) != 0) error = errno;
   if (error == 0) changed = true;
-  if (error != 0 && isHidden) system.renameAt(folder, hidden.c_str(), folder, name.c_str(), RENAME_NOREPLACE);
+  if (error != 0 && isHidden && !changed)
+    system.renameAt(folder, hidden.c_str(), folder, name.c_str(), RENAME_NOREPLACE);
   return error;
 }
 
@@ -200,6 +203,11 @@ int renameIfFree(SystemCalls& system, int fromFolder, const std::string& from, i
   if (::fstatat(toFolder, to.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0) return EEXIST;
   if (errno != ENOENT) return errno;
   return system.renameAt(fromFolder, from.c_str(), toFolder, to.c_str(), 0) == 0 ? 0 : errno;
+}
+
+void holdFolderOf(int folder) {
+  while (::flock(folder, LOCK_SH) != 0 && errno == EINTR) {
+  }
 }
 
 int syncFolder(SystemCalls& system, int folder) {

@@ -37,12 +37,16 @@ int openBelow(SystemCalls& system, int root, const std::string& part, int flags,
 int listFolder(int folder, std::vector<std::string>& names);
 
 /// Deletes an item with its content; links themselves, never what they point to. A folder first disappears whole,
-/// under a hidden name; what cannot be deleted comes back under its own. Never enters another file system (EXDEV).
-/// `changed` tells whether anything was deleted.
+/// under a hidden name. When it cannot be deleted it comes back under its own, unless a part of it is gone: then the
+/// rest stays hidden for a later sweep. Never enters another file system (EXDEV). `changed` tells whether anything was
+/// deleted.
 int removeTree(SystemCalls& system, int folder, const std::string& name, bool& changed);
 
 /// Renames unless something is at `to`.
 int renameIfFree(SystemCalls& system, int fromFolder, const std::string& from, int toFolder, const std::string& to);
+
+/// Keeps sweeps away from the opened folder until the descriptor is closed; waits for one that is under way.
+void holdFolderOf(int folder);
 
 /// A sync of a folder; file systems that cannot sync one need none.
 int syncFolder(SystemCalls& system, int folder);

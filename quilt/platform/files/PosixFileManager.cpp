@@ -44,9 +44,11 @@ int writeAll(SystemCalls& system, int file, std::string_view bytes) {
   return 0;
 }
 
-// Makes one folder and syncs its parent.
-int makeFolder(SystemCalls& system, const fs::path& path) {
+// Makes one folder and syncs its parent. `made` tells whether it is there.
+int makeFolder(SystemCalls& system, const fs::path& path, bool& made) {
+  made = false;
   if (system.makeFolderAt(AT_FDCWD, path.c_str(), S_IRWXU | S_IRWXG | S_IRWXO) != 0) return errno;
+  made = true;
   Place place;
   const int error = openPlace(system, path, place);
   // A parent that may be written but not read cannot be synced.
@@ -91,8 +93,9 @@ Result<void> PosixFileManager::createDirectoryAtPath(const fs::path& path) {
   std::vector<fs::path> made;
   while (!pending.empty()) {
     const fs::path folder = pending.back();
-    const int error = makeFolder(*_system, folder);
-    if (error == 0) made.push_back(folder);
+    bool isMade = false;
+    const int error = makeFolder(*_system, folder, isMade);
+    if (isMade) made.push_back(folder);
     if (error == 0 || (error == EEXIST && kindOfItemAtPath(folder) == FileKind::Folder)) {
       pending.pop_back();
     } else if (error == ENOENT && folder.has_parent_path() && folder.parent_path() != folder) {
@@ -191,8 +194,7 @@ Result<void> PosixFileManager::writeAtomically(const fs::path& path, std::string
   if (replaces && _system->changeMode(file.number(), old.st_mode & permissions) != 0) return posixError(errno, path);
   if (_system->sync(file.number()) != 0) return posixError(errno, path);
   if (_system->close(file.release()) != 0) return posixError(errno, path);
-  if (const int error = temporary.replace()) return posixError(error, path);
-  return resultOf(syncFolder(*_system, folder), path);
+  return resultOf(temporary.replaceSafely(), path);
 }
 
 }  // namespace quilt::platform

@@ -14,6 +14,9 @@ namespace quilt::platform {
 ///   negative number is that of the operating system's error; Quit gives -ECANCELED.
 /// - Synced before they return: writeAtomically, createDirectoryAtPath and moveItem; a move across file systems syncs
 ///   the copy before it deletes. Copies are not: their source is still there, and syncItem is at hand.
+/// - Whoever makes an item under a hidden name holds a shared flock of its folder meanwhile, and a sweep needs the
+/// whole
+///   flock: what it finds then belongs to nobody. The kernel gives the flock up with the process.
 /// - A lock file is deleted when its lock is given up.
 class PosixFileManager final : public FileManager {
  public:
@@ -32,6 +35,12 @@ class PosixFileManager final : public FileManager {
                void* context) override;
   int syncItem(const std::filesystem::path& path) override;
   Result<std::size_t> removeTemporariesIn(const std::filesystem::path& folder) override;
+  Result<std::filesystem::path> setAside(const std::filesystem::path& path, const std::filesystem::path& within,
+                                         bool forGood) override;
+  Result<std::filesystem::path> markUnfinished(const std::filesystem::path& path) override;
+  Result<void> removeMark(const std::filesystem::path& mark) override;
+  std::unique_ptr<FolderHold> holdFolder(const std::filesystem::path& folder) override;
+  std::size_t sweepFolder(const std::filesystem::path& folder, SweepDepth depth, const IsRecorded& isRecorded) override;
   [[nodiscard]] Result<std::string> readFile(const std::filesystem::path& path, std::uint64_t maximum) const override;
   [[nodiscard]] Result<std::string> readStart(const std::filesystem::path& path, std::size_t length) const override;
   Result<void> writeAtomically(const std::filesystem::path& path, std::string_view bytes) override;

@@ -57,9 +57,13 @@ Result<void> PosixFileManager::moveItem(const fs::path& source, const fs::path& 
   if (error == EXDEV) return moveAcrossDisks(source, destination);
   if (error != 0) return posixError(error, error == ENOENT ? source : destination);
   // The new name first: at no time are both forgotten.
-  if (const int failed = syncFolder(*_system, to.folder.number())) return posixError(failed, destination);
-  if (const int failed = syncFolder(*_system, from.folder.number())) return posixError(failed, source);
-  return {};
+  int failed = syncFolder(*_system, to.folder.number());
+  const fs::path& where = failed != 0 ? destination : source;
+  if (failed == 0) failed = syncFolder(*_system, from.folder.number());
+  if (failed == 0) return {};
+  // Who is told of a failure finds the item where it was.
+  (void)renameIfFree(*_system, to.folder.number(), to.name, from.folder.number(), from.name);
+  return posixError(failed, where);
 }
 
 Result<void> PosixFileManager::moveAcrossDisks(const fs::path& source, const fs::path& destination) {

@@ -33,13 +33,15 @@ int removeTemporaries(SystemCalls& system, int folder, int depth, std::size_t& r
   std::vector<std::string> names;
   if (const int error = listFolder(folder, names)) return error;
   for (const std::string& name : names) {
-    if (isHiddenTemporaryName(name)) {
+    const HiddenKind kind = hiddenNameFrom(name).kind;
+    if (kind == HiddenKind::Half) {
       bool changed = false;
       const int error = removeTree(system, folder, name, changed);
       if (error != 0 && error != ENOENT) return error;
       removed += error == 0;
       continue;
     }
+    if (kind != HiddenKind::None) continue;
     const Descriptor child(system.openAt(folder, name.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW, 0));
     if (!child || depth == kDeepestFolder) continue;  // a file, a link, or nothing that this library made
     if (const int error = removeTemporaries(system, child.number(), depth + 1, removed)) return error;

@@ -9,7 +9,7 @@
 namespace quilt::platform {
 
 /// An item in the making, under a hidden name beside the final one. Removed by the destructor unless it was put in
-/// place. The folder stays open while this lives. Operations answer 0 or an error number.
+/// place. The folder stays open, and is held against sweeps, while this lives. Operations answer 0 or an error number.
 class TemporaryItem {
  public:
   TemporaryItem(SystemCalls& system, int folder, std::string finalName);
@@ -24,9 +24,15 @@ class TemporaryItem {
   int replace();
   int putIfFree();
 
+  /// Renames a file over what is there and syncs the folder. After an error the old file is in its place, or nothing is
+  /// when nothing was.
+  int replaceSafely();
+
   [[nodiscard]] const std::string& name() const { return _name; }
 
  private:
+  bool exchange();
+
   SystemCalls& _system;
   const int _folder;
   const std::string _finalName;

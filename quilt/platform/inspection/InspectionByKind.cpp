@@ -24,8 +24,12 @@ bool isOneOf(const std::string& identifier, const Kinds& kinds) {
 
 InspectionByKind::InspectionByKind(std::shared_ptr<const MediaInspector> movies,
                                    std::shared_ptr<const MediaInspector> images,
-                                   std::shared_ptr<const MediaInspector> documents)
-    : _movies(std::move(movies)), _images(std::move(images)), _documents(std::move(documents)) {}
+                                   std::shared_ptr<const MediaInspector> documents,
+                                   std::shared_ptr<const MediaInspector> office)
+    : _movies(std::move(movies)),
+      _images(std::move(images)),
+      _documents(std::move(documents)),
+      _office(std::move(office)) {}
 
 Result<MediaFacts> InspectionByKind::inspect(const std::filesystem::path& path) const {
   const std::optional<std::string> identifier = FDYTypePreferredIdentifier(path);
@@ -36,12 +40,7 @@ Result<MediaFacts> InspectionByKind::inspect(const std::filesystem::path& path) 
   if (isOneOf(*identifier, kMovieKinds)) return _movies->inspect(path);
   if (isOneOf(*identifier, kImageKinds)) return _images->inspect(path);
   if (isOneOf(*identifier, types::kPagedDocuments)) return _documents->inspect(path);
-  if (isOneOf(*identifier, types::kOfficeDocuments)) {
-    if (!services().files->fileExistsAtPath(path)) return Error{ErrorKind::NotFound, "There is no such file.", path};
-    MediaFacts facts;
-    facts.mimeType = services().types->mimeType(*identifier);
-    return facts;
-  }
+  if (isOneOf(*identifier, types::kOfficeDocuments)) return _office->inspect(path);
   return Error{ErrorKind::Unsupported, "Files of the type \"" + *identifier + "\" are no media.", path};
 }
 

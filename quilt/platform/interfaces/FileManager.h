@@ -3,7 +3,9 @@
 
 #include <cstdint>
 #include <filesystem>
+#include <functional>
 #include <memory>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -63,6 +65,19 @@ class QUILT_EXPORT FileLock {
   [[nodiscard]] virtual bool wasAbandoned() const = 0;
 };
 
+/// Keeps a folder from being swept while someone makes items there under hidden names. Given up by the destructor or
+/// the end of the process.
+class QUILT_EXPORT FolderHold {
+ public:
+  virtual ~FolderHold() = default;
+};
+
+/// How far down a sweep looks.
+enum class SweepDepth { Level, Tree };
+
+/// Whether the record that counts names the item at the path; none when that cannot be told, and nothing is done then.
+using IsRecorded = std::function<std::optional<bool>(const std::filesystem::path& item)>;
+
 /// The file system. Paths are absolute. Every operation may be called on any thread; none leaves a partial result
 /// under a final name. Errors carry the file and a sentence for people.
 class QUILT_EXPORT FileManager {
@@ -113,8 +128,41 @@ class QUILT_EXPORT FileManager {
   virtual int syncItem(const std::filesystem::path& path) = 0;
 
   /// Deletes what killed processes left half made anywhere below a folder: items with hidden temporary names
-  /// (base/TemporaryNames.h), links not followed. The caller keeps other writers away. Answers how many it deleted.
+  /// (base/TemporaryNames.h) that are Half, links not followed. The caller keeps other writers away. Answers how many
+  /// it deleted.
   virtual Result<std::size_t> removeTemporariesIn(const std::filesystem::path& folder) = 0;
+
+  /// @{
+  /// The steps by which a change of several files stays one change: docs/record-format.md, "The order of writing". The
+  /// names are those of base/TemporaryNames.h. A file manager that lacks a step answers Unsupported, or null, and its
+  /// caller does without.
+  ///
+  /// setAside takes an item out of its place within its folder and answers where it is now: with `forGood` as Half,
+  /// else as Aside. Refuses what removeItem refuses.
+  virtual Result<std::filesystem::path> setAside(const std::filesystem::path& path,
+                                                 const std::filesystem::path& /*within*/, bool /*forGood*/) {
+    return Error{ErrorKind::Unsupported, "Items cannot be set aside", path};
+  }
+  /// markUnfinished puts an empty mark beside the place of an item that is going to be made, and answers the mark's
+  /// path.
+  virtual Result<std::filesystem::path> markUnfinished(const std::filesystem::path& path) {
+    return Error{ErrorKind::Unsupported, "Items cannot be marked", path};
+  }
+  /// removeMark deletes such a mark, and returns when the deletion is on the disk.
+  virtual Result<void> removeMark(const std::filesystem::path& mark) {
+    return Error{ErrorKind::Unsupported, "Items cannot be marked", mark};
+  }
+  /// holdFolder keeps sweeps of other objects and processes away from the folder.
+  virtual std::unique_ptr<FolderHold> holdFolder(const std::filesystem::path& /*folder*/) { return nullptr; }
+  /// sweepFolder clears away what killed processes left: deletes what is Half, and, when `isRecorded` is given, brings
+  /// what is Aside back to its place or deletes it, and deletes what is Unfinished unless it is recorded. Passes over
+  /// folders that are held or written to at this moment, links, and, where other machines may write, what is less than
+  /// a day old. Answers how many items it cleared away; what cannot be deleted stays for the next time.
+  virtual std::size_t sweepFolder(const std::filesystem::path& /*folder*/, SweepDepth /*depth*/,
+                                  const IsRecorded& /*isRecorded*/) {
+    return 0;
+  }
+  /// @}
 
   /// The whole file. Fails as Damaged when it is longer than `maximum` bytes.
   [[nodiscard]] virtual Result<std::string> readFile(const std::filesystem::path& path,

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "quilt/platform/testing/FaultySystemCalls.h"
 
+#include <linux/fs.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -109,7 +110,7 @@ int FaultySystemCalls::makeLinkAt(const char* target, int folder, const char* na
 }
 
 int FaultySystemCalls::renameAt(int fromFolder, const char* from, int toFolder, const char* to, unsigned flags) {
-  const Call call = flags == 0 ? Call::Rename : Call::RenameIfFree;
+  const Call call = (flags & RENAME_NOREPLACE) == 0 ? Call::Rename : Call::RenameIfFree;
   return admit(call) ? SystemCalls::renameAt(fromFolder, from, toFolder, to, flags) : -1;
 }
 

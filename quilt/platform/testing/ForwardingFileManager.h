@@ -46,6 +46,21 @@ class ForwardingFileManager : public FileManager {
   Result<std::size_t> removeTemporariesIn(const std::filesystem::path& folder) override {
     return _target->removeTemporariesIn(folder);
   }
+  Result<std::filesystem::path> setAside(const std::filesystem::path& path, const std::filesystem::path& within,
+                                         bool forGood) override {
+    return _target->setAside(path, within, forGood);
+  }
+  Result<std::filesystem::path> markUnfinished(const std::filesystem::path& path) override {
+    return _target->markUnfinished(path);
+  }
+  Result<void> removeMark(const std::filesystem::path& mark) override { return _target->removeMark(mark); }
+  std::unique_ptr<FolderHold> holdFolder(const std::filesystem::path& folder) override {
+    return _target->holdFolder(folder);
+  }
+  std::size_t sweepFolder(const std::filesystem::path& folder, SweepDepth depth,
+                          const IsRecorded& isRecorded) override {
+    return _target->sweepFolder(folder, depth, isRecorded);
+  }
   [[nodiscard]] Result<std::string> readFile(const std::filesystem::path& path, std::uint64_t maximum) const override {
     return _target->readFile(path, maximum);
   }

@@ -51,6 +51,21 @@ declare global {
   var conveyor: Conveyor | undefined;
 }
 
+/** What every object has beside its accessors. */
+export interface Stored {
+  /**
+   * What the object stores where this accessor of it, one without an argument, answers: null also where the accessor
+   * answers something that stands in, as the title and the description of a document without them.
+   */
+  stored(accessor: string): Promise<string | number | string[] | ConveyorObject | null>;
+}
+export interface QuiltCollection extends Stored {}
+export interface QuiltDocument extends Stored {}
+export interface QuiltMedia extends Stored {}
+export interface QuiltMediaSource extends Stored {}
+export interface QuiltMediaDerivative extends Stored {}
+export interface QuiltMediaPreview extends Stored {}
+
 export type ConveyorObject =
   | QuiltCollection
   | QuiltDocument

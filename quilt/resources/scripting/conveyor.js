@@ -8,7 +8,7 @@
 //   conveyor.addEventListener('change', ({ object, accessors }) => { … });
 //
 // conveyor.d.ts declares what is here, docs/bridge.md describes what travels.
-(function () {
+(() => {
   'use strict';
 
   /** Why a call was not done; `code` is for programs ("no-object", "wrong-arguments", "busy", …). */
@@ -20,21 +20,28 @@
     }
   }
 
-  /** One object of the model. Its class's accessors are its methods; two answers for one object are the same. */
+  /**
+   * One object of the model. Its class's accessors are its methods; two answers for one object are the same. Beside
+   * them, stored(accessor) answers what the object stores: null where the accessor answers something that stands in.
+   */
   class ConveyorObject {
     #call;
     constructor(className, call) {
       this.#call = call;
       this.className = className;
     }
+    async stored(accessor) {
+      const {value, standsIn} = await this.#call(accessor, []);
+      return standsIn ? null : value;
+    }
     static define(name, accessors) {
       const Class = class extends ConveyorObject {};
       for (const accessor of accessors) {
-        Class.prototype[accessor.replace(':', '')] = function (...given) {
-          return this.#call(accessor, given);
+        Class.prototype[accessor.replace(':', '')] = async function (...given) {
+          return (await this.#call(accessor, given)).value;
         };
       }
-      Object.defineProperty(Class, 'name', { value: name });
+      Object.defineProperty(Class, 'name', {value: name});
       return Class;
     }
   }
@@ -54,7 +61,7 @@
     constructor(base, token, onLost) {
       this.#base = base;
       this.#onLost = onLost;
-      this.#headers = { 'Content-Type': 'application/json', 'X-Conveyor-Token': token };
+      this.#headers = {'Content-Type': 'application/json', 'X-Conveyor-Token': token};
     }
 
     async open() {
@@ -96,16 +103,16 @@
 
     // `keepalive`: also when the page is on its way out.
     async close() {
-      await this.#post('close', { session: this.#identity }, { keepalive: true }).catch(() => {});
+      await this.#post('close', {session: this.#identity}, {keepalive: true}).catch(() => {});
       if (this.#stream) this.#stream.abort();
     }
 
     #tell(event, onChange) {
       const match = /^event: change\ndata: (.*)$/.exec(event);
       if (!match) return;
-      const { object, accessors } = JSON.parse(match[1]);
+      const {object, accessors} = JSON.parse(match[1]);
       const changed = this.#objects.get(object);
-      if (changed) onChange({ type: 'change', object: changed, accessors });
+      if (changed) onChange({type: 'change', object: changed, accessors});
     }
 
     async #post(name, body, options = {}) {
@@ -129,8 +136,9 @@
       if (!object) {
         const Class = this.#classes.get(value.class);
         object = new Class(value.class, async (method, given) => {
-          const call = { session: this.#identity, object: handle, method, arguments: given };
-          return this.#valueOf((await this.#post('call', call)).value);
+          const call = {session: this.#identity, object: handle, method, arguments: given};
+          const answer = await this.#post('call', call);
+          return {value: this.#valueOf(answer.value), standsIn: answer.standsIn === true};
         });
         this.#objects.set(handle, object);
       }
@@ -141,7 +149,7 @@
   async function failureOf(response) {
     const text = await response.text();
     try {
-      const { code, message } = JSON.parse(text).error;
+      const {code, message} = JSON.parse(text).error;
       return new ConveyorError(code, message);
     } catch {
       return new ConveyorError('refused', text.trim() || `The bridge answers ${response.status}`);
@@ -151,7 +159,7 @@
   class Conveyor {
     #open;
     #session = null;
-    #listeners = { change: new Set(), close: new Set() };
+    #listeners = {change: new Set(), close: new Set()};
 
     constructor(address) {
       const found = /^(https?:\/\/[^/]+\/([^/]+)\/)package\//.exec(address);
@@ -176,7 +184,7 @@
      */
     addEventListener(type, listener) {
       this.#listeners[type].add(listener);
-      this.#current().catch((error) => this.#tell({ type: 'close', error }));
+      this.#current().catch((error) => this.#tell({type: 'close', error}));
     }
 
     removeEventListener(type, listener) {
@@ -187,7 +195,11 @@
     async close() {
       const session = this.#session;
       this.#session = null;
-      if (session) await session.then((opened) => opened.close(), () => {});
+      if (session)
+        await session.then(
+          (opened) => opened.close(),
+          () => {},
+        );
     }
 
     #current() {
@@ -204,15 +216,17 @@
       const session = this.#session;
       if (session.isListening || this.#listeners.change.size + this.#listeners.close.size === 0) return;
       session.isListening = true;
-      session.then((opened) =>
-        opened.listen(
-          (event) => this.#tell(event),
-          (error) => {
-            this.#forget(session);
-            this.#tell({ type: 'close', error });
-          }
+      session
+        .then((opened) =>
+          opened.listen(
+            (event) => this.#tell(event),
+            (error) => {
+              this.#forget(session);
+              this.#tell({type: 'close', error});
+            },
+          ),
         )
-      ).catch(() => {});
+        .catch(() => {});
     }
 
     #forget(session) {
@@ -227,11 +241,11 @@
   const connect = (address) => new Conveyor(address);
 
   if (typeof module === 'object' && module.exports) {
-    module.exports = { connect, Conveyor, ConveyorError };
+    module.exports = {connect, Conveyor, ConveyorError};
   } else {
     const conveyor = connect(location.href);
-    Object.assign(globalThis, { Conveyor, ConveyorError, conveyor });
+    Object.assign(globalThis, {Conveyor, ConveyorError, conveyor});
     // A page that may come back keeps its objects.
-    addEventListener('pagehide', ({ persisted }) => persisted || conveyor.close());
+    addEventListener('pagehide', ({persisted}) => persisted || conveyor.close());
   }
 })();

@@ -169,6 +169,7 @@ http::Response Calls::call(const std::string& body) {
   struct Outcome {
     std::optional<platform::Result<Value>> result;
     bool isSaved = true;
+    bool standsIn = false;
   };
   const auto done = std::make_shared<Outcome>();
   const auto outcome = _mainThread.perform(
@@ -176,6 +177,7 @@ http::Response Calls::call(const std::string& body) {
         try {
           const auto act = [&] {
             done->result = perform(*object, method, arguments);
+            done->standsIn = answersStandIn(*object, method);
             return done->result->hasValue();
           };
           if (isEdit(*object, method))
@@ -207,7 +209,9 @@ http::Response Calls::call(const std::string& body) {
                    "The change is made, but the document cannot be saved: its record cannot be written");
   auto value = jsonFrom(*session, *answer);
   if (!value) return tooManyObjects();
-  return answering(200, {{"value", *std::move(value)}});
+  Json result = {{"value", *std::move(value)}};
+  if (done->standsIn) result["standsIn"] = true;
+  return answering(200, result);
 }
 
 http::Response Calls::close(const std::string& body) {

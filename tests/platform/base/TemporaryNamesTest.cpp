@@ -26,5 +26,31 @@ TEST(TemporaryNamesTest, OnlySuchNamesAreTakenForTemporaries) {
     EXPECT_FALSE(isHiddenTemporaryName(name)) << name;
 }
 
+TEST(TemporaryNamesTest, EachKindSaysWhatItGoesWith) {
+  const std::string half = hiddenNameBeside("a.qpk");
+  const std::string aside = asideNameBeside("a.qpk");
+  const std::string mark = unfinishedNameBeside("a.qpk");
+  EXPECT_EQ(HiddenKind::Half, hiddenNameFrom(half).kind);
+  EXPECT_EQ(HiddenKind::Aside, hiddenNameFrom(aside).kind);
+  EXPECT_EQ(HiddenKind::Unfinished, hiddenNameFrom(mark).kind);
+  for (const std::string* name : {&half, &aside, &mark}) EXPECT_EQ("a.qpk", hiddenNameFrom(*name).of);
+}
+
+TEST(TemporaryNamesTest, ConversionsExportsAndArchivesUnderWayAreOfTheFamily) {
+  const std::string uuid = "0F4B2C1A-0000-4000-8000-00000000000a";
+  for (const std::string& name :
+       {"." + uuid + ".m4v", "." + uuid + ".png", "." + uuid + ".qpk", "." + uuid + ".qpk.zip", ".Talk.qpk.zip." + uuid,
+        "." + uuid + ".qpk.zip." + uuid, "." + uuid + ".qpk.zip." + uuid + ".aB3dE6"})
+    EXPECT_EQ(HiddenKind::Half, hiddenNameFrom(name).kind) << name;
+  for (const std::string& name : {uuid + ".m4v", "." + uuid, "." + uuid + ".", "." + uuid + ".a b",
+                                  "." + uuid + "x.m4v", std::string(".0F4B2C1A.m4v"), ".Talk" + uuid})
+    EXPECT_EQ(HiddenKind::None, hiddenNameFrom(name).kind) << name;
+}
+
+TEST(TemporaryNamesTest, WhatAMarkIsBesideIsNotFinished) {
+  EXPECT_EQ((std::vector<std::string>{"b.qpk"}),
+            finishedNames({"a.qpk", "b.qpk", ".hidden", unfinishedNameBeside("a.qpk"), hiddenNameBeside("b.qpk")}));
+}
+
 }  // namespace
 }  // namespace quilt::platform

@@ -1,19 +1,19 @@
 // SPDX-License-Identifier: Apache-2.0
 // conveyor.js in Node, against the real "quilt serve". Run by ctest, which names the program in QUILT_PROGRAM.
 import assert from 'node:assert/strict';
-import { execFileSync, spawn } from 'node:child_process';
-import { mkdtempSync, readFileSync, rmSync, writeFileSync } from 'node:fs';
-import { createRequire } from 'node:module';
-import { tmpdir } from 'node:os';
-import { join } from 'node:path';
-import { fileURLToPath } from 'node:url';
-import { after, before, test } from 'node:test';
+import {execFileSync, spawn} from 'node:child_process';
+import {mkdtempSync, readFileSync, rmSync, writeFileSync} from 'node:fs';
+import {createRequire} from 'node:module';
+import {tmpdir} from 'node:os';
+import {join} from 'node:path';
+import {fileURLToPath} from 'node:url';
+import {after, before, test} from 'node:test';
 
 const source = fileURLToPath(new URL('../../..', import.meta.url));
-const { connect, ConveyorError } = createRequire(import.meta.url)(join(source, 'quilt/resources/scripting/conveyor.js'));
+const {connect, ConveyorError} = createRequire(import.meta.url)(join(source, 'quilt/resources/scripting/conveyor.js'));
 const folder = mkdtempSync(join(tmpdir(), 'quilt-conveyor-'));
-const environment = { PATH: '/usr/bin:/bin', HOME: '/nonexistent', QUILT_LIBRARY: join(folder, 'library') };
-const quilt = (...words) => execFileSync(process.env.QUILT_PROGRAM, words, { env: environment, encoding: 'utf8' });
+const environment = {PATH: '/usr/bin:/bin', HOME: '/nonexistent', QUILT_LIBRARY: join(folder, 'library')};
+const quilt = (...words) => execFileSync(process.env.QUILT_PROGRAM, words, {env: environment, encoding: 'utf8'});
 const json = (...words) => JSON.parse(quilt(...words, '--json')).result;
 
 let server;
@@ -22,7 +22,7 @@ let record;
 
 function serve() {
   return new Promise((resolve, reject) => {
-    server = spawn(process.env.QUILT_PROGRAM, ['serve', 'Talk'], { env: environment });
+    server = spawn(process.env.QUILT_PROGRAM, ['serve', 'Talk'], {env: environment});
     server.stdout.once('data', (line) => resolve(String(line).trim()));
     server.once('exit', (code) => reject(new Error(`quilt serve ended with ${code}`)));
   });
@@ -43,7 +43,7 @@ before(async () => {
 
 after(() => {
   server.kill('SIGKILL');
-  rmSync(folder, { recursive: true });
+  rmSync(folder, {recursive: true});
 });
 
 test('reads and edits, and what is edited is saved', async () => {
@@ -67,7 +67,7 @@ test('offers exactly the accessors that are declared', async () => {
   const declarations = readFileSync(join(source, 'quilt/resources/scripting/conveyor.d.ts'), 'utf8');
   const declared = new Map();
   for (const [, name, body] of declarations.matchAll(/export interface (Quilt\w+) \{\n([^}]*)\}/g)) {
-    declared.set(name, [...body.matchAll(/^  (cv\w+)\(/gm)].map((match) => match[1]).sort());
+    declared.set(name, [...body.matchAll(/^ {2}(cv\w+)\(/gm)].map((match) => match[1]).sort());
   }
   assert.equal(declared.size, 6);
   const conveyor = connect(address);
@@ -85,6 +85,24 @@ test('offers exactly the accessors that are declared', async () => {
   await conveyor.close();
 });
 
+test('tells what is stored from what stands in for it', async () => {
+  const conveyor = connect(address);
+  const document = await conveyor.document();
+  assert.equal(await document.stored('cvTitle'), 'Talk');
+  assert.equal(await document.stored('cvDescription'), null);
+  const standIn = await document.cvDescription();
+  assert.match(standIn, /^Lorem ipsum/);
+  await document.cvSetDescription(standIn);
+  assert.equal(
+    await document.stored('cvDescription'),
+    standIn,
+    'the same words are a description when they are stored',
+  );
+  await document.cvSetDescription(null);
+  assert.equal(await (await document.cvMediaAtIndex(0)).stored('cvDescription'), null);
+  await conveyor.close();
+});
+
 test('refuses wrong arguments by a code', async () => {
   const conveyor = connect(address);
   const document = await conveyor.document();
@@ -98,7 +116,7 @@ test('refuses wrong arguments by a code', async () => {
   await conveyor.close();
 });
 
-test('hears the edits of another client', { timeout: 30000 }, async () => {
+test('hears the edits of another client', {timeout: 30000}, async () => {
   const conveyor = connect(address);
   const other = connect(address);
   const document = await conveyor.document();
@@ -118,18 +136,18 @@ test('objects end with their session, and the next is another', async () => {
   const conveyor = connect(address);
   const document = await conveyor.document();
   await conveyor.close();
-  await assert.rejects(document.cvTitle(), { code: 'no-session' });
+  await assert.rejects(document.cvTitle(), {code: 'no-session'});
   assert.equal(await (await conveyor.document()).cvTitle(), 'Talk');
   await conveyor.close();
 });
 
 test('knows addresses from other texts, and a wrong token', async () => {
-  assert.throws(() => connect('http://127.0.0.1:80/'), { code: 'bad-address' });
+  assert.throws(() => connect('http://127.0.0.1:80/'), {code: 'bad-address'});
   const wrong = address.replace(/\/[0-9a-f]{32}\//, `/${'0'.repeat(32)}/`);
-  await assert.rejects(connect(wrong).document(), { code: 'refused' });
+  await assert.rejects(connect(wrong).document(), {code: 'refused'});
 });
 
-test('hears the end of the program, which ends at once', { timeout: 30000 }, async () => {
+test('hears the end of the program, which ends at once', {timeout: 30000}, async () => {
   const conveyor = connect(address);
   await conveyor.document();
   const closed = new Promise((resolve) => conveyor.addEventListener('close', resolve));

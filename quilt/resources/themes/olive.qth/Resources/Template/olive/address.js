@@ -2,11 +2,12 @@
 // Deep links: "#item=…&t=…&page=…&view=…". Only the hash may change on a local page.
 'use strict';
 
-(function (Olive) {
+((Olive) => {
   const kKeys = ['item', 't', 'page', 'view'];
 
   function toHash(place) {
-    const parts = kKeys.filter((key) => place[key] !== undefined && place[key] !== '')
+    const parts = kKeys
+      .filter((key) => place[key] !== undefined && place[key] !== '')
       .map((key) => key + '=' + encodeURIComponent(place[key]));
     return '#' + parts.join('&');
   }
@@ -16,7 +17,7 @@
     read() {
       const values = new URLSearchParams(location.hash.slice(1));
       const value = (key) => {
-        const amount = values.has(key) ? Number(values.get(key)) : NaN;
+        const amount = values.has(key) ? Number(values.get(key)) : Number.NaN;
         return Number.isFinite(amount) && amount >= 0 ? amount : null;
       };
       return {item: values.get('item') || '', t: value('t'), page: value('page'), view: values.get('view') || ''};
@@ -28,7 +29,7 @@
       if (hash === location.hash) return;
       try {
         history.replaceState(null, '', hash);
-      } catch (error) {
+      } catch {
         // browsers limit how often; the next note comes soon
       }
     },

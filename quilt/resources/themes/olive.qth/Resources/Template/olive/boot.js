@@ -2,20 +2,25 @@
 // The first script: the namespace, and what the page says when a file of the package is missing or cannot be read.
 'use strict';
 
-(function () {
+(() => {
   const missing = [];
   let broken = '';
-  const Olive = (window.Olive = {});
-  document.documentElement.classList.add('scripted');  // hides the notice that index.html carries
+  const Olive = /** @type {Window['Olive']} */ ({}); // every script adds what it offers
+  window.Olive = Olive;
+  document.documentElement.classList.add('scripted'); // hides the notice that index.html carries
 
-  window.addEventListener('error', (event) => {
-    const node = event.target;
-    if (node instanceof HTMLScriptElement || node instanceof HTMLLinkElement) {
-      missing.push(node.getAttribute('src') || node.getAttribute('href'));
-    } else if (/controllers\/data\.js/.test(event.filename || '')) {
-      broken = 'controllers/data.js';
-    }
-  }, true);
+  window.addEventListener(
+    'error',
+    (event) => {
+      const node = event.target;
+      if (node instanceof HTMLScriptElement || node instanceof HTMLLinkElement) {
+        missing.push(node.getAttribute('src') || node.getAttribute('href'));
+      } else if (/controllers\/data\.js/.test(event.filename || '')) {
+        broken = 'controllers/data.js';
+      }
+    },
+    true,
+  );
 
   function cause() {
     if (/\.zip([/\\%]|$)|[/\\]Temp\d*_/i.test(decodeURI(location.pathname))) {
@@ -37,12 +42,12 @@
       complain(cause());
       return;
     }
-    try {
-      Olive.start(data);
-    } catch (error) {
-      complain('The package cannot be shown: ' + error.message);
-      throw error;
-    }
-    document.getElementById('notice').remove();
+    Olive.start(data).then(
+      () => document.getElementById('notice')?.remove(),
+      (error) => {
+        complain('The package cannot be shown: ' + error.message);
+        throw error;
+      },
+    );
   });
 })();

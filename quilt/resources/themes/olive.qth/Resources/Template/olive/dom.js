@@ -2,10 +2,10 @@
 // Making elements. Text of the package is only ever set as text.
 'use strict';
 
-(function (Olive) {
+((Olive) => {
   // make('a', {class, href, text, onclick, 'aria-label', …}, child, …): null and false properties and children are left
   // out, true is an attribute without value (but aria-… says "true" or "false"), functions are listeners.
-  Olive.make = function (tag, properties, ...children) {
+  Olive.make = (tag, properties, ...children) => {
     const node = document.createElement(tag);
     for (const [name, value] of Object.entries(properties || {})) {
       if (value === null || value === undefined) continue;
@@ -19,7 +19,7 @@
     return node;
   };
 
-  Olive.icon = function (name) {
+  Olive.icon = (name) => {
     const space = 'http://www.w3.org/2000/svg';
     const svg = document.createElementNS(space, 'svg');
     svg.setAttribute('viewBox', '0 0 24 24');
@@ -35,33 +35,44 @@
 
   // A button that shows an icon; its label is its accessible name and its tool tip.
   Olive.iconButton = (icon, label, onclick, properties) =>
-    Olive.make('button', {type: 'button', class: 'icon-button', 'aria-label': label, title: label, onclick, ...properties},
-               Olive.icon(icon));
+    Olive.make(
+      'button',
+      {type: 'button', class: 'icon-button', 'aria-label': label, title: label, onclick, ...properties},
+      Olive.icon(icon),
+    );
 
-  Olive.relabel = function (button, label) {
+  Olive.relabel = (button, label) => {
     button.setAttribute('aria-label', label);
     button.title = label;
   };
 
-  Olive.show = (node, shown) => { node.hidden = !shown; };
-
-  // Plain text with its web and mail addresses as links, paragraph by paragraph.
-  Olive.paragraphs = function (text) {
-    return text.split(/\n\s*\n/).filter((part) => part.trim()).map((part) => {
-      const pieces = part.split(/((?:https?:\/\/|mailto:)[^\s<>"]*[^\s<>".,;:!?)\]}'’”])/i);
-      return Olive.make('p', {dir: 'auto'}, pieces.map((piece, i) => {
-        const address = i % 2 ? Olive.safeAddress(piece) : null;
-        return address ? Olive.outsideLink(address, piece) : piece;
-      }));
-    });
+  Olive.show = (node, shown) => {
+    node.hidden = !shown;
   };
 
+  // Plain text with its web and mail addresses as links, paragraph by paragraph.
+  Olive.paragraphs = (text) =>
+    text
+      .split(/\n\s*\n/)
+      .filter((part) => part.trim())
+      .map((part) => {
+        const pieces = part.split(/((?:https?:\/\/|mailto:)[^\s<>"]*[^\s<>".,;:!?)\]}'’”])/i);
+        return Olive.make(
+          'p',
+          {dir: 'auto'},
+          pieces.map((piece, i) => {
+            const address = i % 2 ? Olive.safeAddress(piece) : null;
+            return address ? Olive.outsideLink(address, piece) : piece;
+          }),
+        );
+      });
+
   // The address if a click on it may leave the package, else null.
-  Olive.safeAddress = function (text) {
+  Olive.safeAddress = (text) => {
     try {
       const address = new URL(text);
       return ['http:', 'https:', 'mailto:'].includes(address.protocol) ? address.href : null;
-    } catch (error) {
+    } catch {
       return null;
     }
   };
@@ -70,24 +81,36 @@
     Olive.make('a', {href: address, target: '_blank', rel: 'noopener noreferrer'}, content);
 
   // A local picture that gives way to its stand-in when it cannot be shown.
-  Olive.picture = function (path, properties, standIn) {
-    const image = Olive.make('img', {alt: '', decoding: 'async', loading: 'lazy', draggable: 'false', ...properties, src: path});
+  Olive.picture = (path, properties, standIn) => {
+    const image = Olive.make('img', {
+      alt: '',
+      decoding: 'async',
+      loading: 'lazy',
+      draggable: 'false',
+      ...properties,
+      src: path,
+    });
     image.addEventListener('error', () => (standIn ? image.replaceWith(standIn()) : image.remove()), {once: true});
     return image;
   };
 
   let live;
   // Tells those who listen what a key or a control changed.
-  Olive.announce = function (text) {
-    if (!live) document.body.append((live = Olive.make('div', {class: 'unseen', role: 'status', id: 'announcements'})));
-    live.textContent = text;
+  Olive.announce = (text) => {
+    if (!live) {
+      live = Olive.make('div', {class: 'unseen', role: 'status', id: 'announcements'});
+      document.body.append(live);
+    }
+    // The same words again are told again, because something about them differs.
+    live.textContent = live.textContent === text ? text + '\u00a0' : text;
   };
 
   const pad = (number) => String(number).padStart(2, '0');
   // "4:05", "1:04:05"
-  Olive.clock = function (seconds) {
+  Olive.clock = (seconds) => {
     const whole = Number.isFinite(seconds) ? Math.max(0, Math.floor(seconds)) : 0;
-    const hours = Math.floor(whole / 3600), minutes = Math.floor(whole / 60) % 60;
+    const hours = Math.floor(whole / 3600),
+      minutes = Math.floor(whole / 60) % 60;
     return hours ? `${hours}:${pad(minutes)}:${pad(whole % 60)}` : `${minutes}:${pad(whole % 60)}`;
   };
 

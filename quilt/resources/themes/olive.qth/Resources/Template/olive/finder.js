@@ -2,8 +2,7 @@
 // Search in titles, descriptions, chapters and page texts; blind to case and accents.
 'use strict';
 
-(function (Olive) {
-  const kMostHits = 60;
+((Olive) => {
   const kSnippet = 90;
   const fold = (text) => text.normalize('NFD').replace(/\p{M}/gu, '').toLowerCase();
 
@@ -34,13 +33,16 @@
       }
     }
     found.sort((a, b) => a.from - b.from || b.to - a.to);
-    return found.filter((range, i) => i === 0 || range.from >= Math.max(...found.slice(0, i).map((before) => before.to)));
+    return found.filter(
+      (range, i) => i === 0 || range.from >= Math.max(...found.slice(0, i).map((before) => before.to)),
+    );
   }
 
   // The text as nodes, its terms marked; a long text is cut around the first of them.
-  Olive.highlighted = function (text, terms, whole) {
+  Olive.highlighted = (text, terms, whole) => {
     let marks = ranges(text, terms);
-    let start = 0, end = text.length;
+    let start = 0,
+      end = text.length;
     if (!whole && text.length > 2 * kSnippet) {
       const first = marks.length ? marks[0].from : 0;
       start = Math.max(0, first - kSnippet / 2);
@@ -60,7 +62,7 @@
   Olive.termsOf = (query) => fold(query).split(/\s+/).filter(Boolean);
 
   // Returns find(query): hits {item, kind, text, t, page} in the order of the package, those in titles first.
-  Olive.makeFinder = function (items) {
+  Olive.makeFinder = (items) => {
     let entries = null;
 
     function index() {
@@ -70,7 +72,8 @@
       };
       for (const item of items) {
         add(item, 'title', item.title, {}, 0);
-        for (const chapter of item.chapters) add(item, 'chapter', chapter.title, chapter.start === null ? {} : {t: chapter.start}, 1);
+        for (const chapter of item.chapters)
+          add(item, 'chapter', chapter.title, chapter.start === null ? {} : {t: chapter.start}, 1);
         item.pages.forEach((page, i) => add(item, 'page', page.text || page.title, {page: i + 1}, 2));
         for (const extra of item.extras) add(item, 'extra', extra.title, {}, 2);
         add(item, 'description', item.description, {}, 2);
@@ -83,7 +86,7 @@
       if (!terms.length) return {hits: [], terms, total: 0};
       entries = entries || index();
       const found = entries.filter((entry) => terms.every((term) => entry.folded.includes(term)));
-      return {hits: found.slice(0, kMostHits), terms, total: found.length};
+      return {hits: found, terms, total: found.length};
     };
   };
 })(window.Olive);

@@ -1,127 +1,116 @@
 // SPDX-License-Identifier: Apache-2.0
-// Two sources shown together: side by side, one in the corner of the other, or one alone.
+// Two sources shown together, such as a speaker and slides. One of them may be a voice alone: then there is one picture.
 'use strict';
 
-(function (Olive) {
-  const {make, say, clamp} = Olive;
+((Olive) => {
+  const {make} = Olive;
+  const kSilentShare = 67; // percent of the width for the picture that says nothing: slides
 
-  const kViews = ['side', 'corner', 'first', 'second'];
+  const isTimed = (source) => source.category === 'Movie' || source.category === 'Audio';
+  const isSeen = (source) => source.category !== 'Audio';
 
-  Olive.stages.DualSource = function (item, context) {
-    const [first, second] = item.sources;
-    if (!second) return Olive.stages.Movie(item, context);
-    const timed = (source) => source.category === 'Movie' || source.category === 'Audio';
-    const kind = (source) => (source.category === 'Audio' ? 'audio' : 'video');
-    const sources = [first, second].filter(timed);
-    if (!sources.length) return Olive.stages.Image(item, context);
-    const leader = sources.find((source) => source.hasSound) || sources[0];
-    const parts = sources.map((source) => ({source, kind: kind(source), offset: source.start || 0, leads: source === leader}));
-    let panes, player, view;
-
-    function still(source) {
-      const pictures = source.previews;
-      const image = make('img', {alt: '', draggable: 'false', src: pictures[0] ? pictures[0].picture : undefined});
-      return {image, follow(time) {
-        const current = pictures.filter((preview) => preview.start !== null && preview.start <= time).pop() || pictures[0];
+  // A source that stands still: its pages or pictures, by their time codes.
+  function makeStills(source) {
+    const pictures = source.previews;
+    const image = make('img', {alt: '', draggable: 'false', src: pictures[0]?.picture});
+    return {
+      element: image,
+      follow(time) {
+        const begun = pictures.filter((preview) => preview.start !== null && preview.start <= time);
+        const current = begun.pop() || pictures[0];
         if (current && image.getAttribute('src') !== current.picture) image.src = current.picture;
-      }};
-    }
+      },
+    };
+  }
+
+  // The stage of a lecture of which only one source can be seen.
+  function oneSeen(item, context, parts, seen) {
+    return Olive.timedStage(item, context, parts, {
+      content(elements, player) {
+        if (isTimed(seen)) return elements;
+        const stills = makeStills(seen);
+        player.addEventListener('time', () => stills.follow(player.time));
+        return [make('div', {class: 'pane whole'}, stills.element), elements];
+      },
+      chapters: item.chapters,
+      cover: false,
+      ratio: Olive.ratioOf(seen),
+      keepsShape: true,
+    });
+  }
+
+  function bothSeen(item, context, parts, leader) {
+    const [first, second] = item.sources;
+    const panes = [],
+      shown = [];
+    /** @type {InstanceType<typeof Olive.Arrangement>} */
+    let arrangement;
+    let player;
 
     function content(elements, made) {
       player = made;
-      const stills = [];
-      panes = [first, second].map((source, i) => {
-        const at = sources.indexOf(source);
-        if (at < 0) stills.push(still(source));
-        return make('div', {class: 'pane', 'data-source': i + 1}, at < 0 ? stills[stills.length - 1].image : elements[at]);
+      [first, second].forEach((source, i) => {
+        const at = parts.findIndex((part) => part.source === source);
+        const stills = at < 0 ? makeStills(source) : null;
+        if (stills) player.addEventListener('time', () => stills.follow(player.time));
+        shown.push(stills ? stills.element : elements[at]);
+        panes.push(make('div', {class: 'pane', 'data-source': i + 1}, shown[i]));
       });
-      player.addEventListener('time', () => stills.forEach((each) => each.follow(player.time)));
-      const divider = makeDivider();
-      const box = make('div', {class: 'dual'}, panes[0], divider, panes[1]);
-      view = makeView(box);
-      for (const pane of panes) {
-        pane.addEventListener('click', (event) => {
-          if (!pane.classList.contains('small')) return;
-          event.stopPropagation();
-          view.swap();
-        });
+      arrangement = new Olive.Arrangement({
+        panes,
+        ratioOf: (i) => Olive.shownRatio(shown[i], Olive.ratioOf(i ? second : first)),
+        share: leader === first ? 100 - kSilentShare : kSilentShare,
+        memory: context.memory,
+        onHide(i, isHidden) {
+          const stream = player.streams.find((each) => panes[i].contains(each.element));
+          if (stream) player.enable(stream, !isHidden);
+        },
+        onChange: context.note,
+      });
+      for (const node of shown) {
+        for (const event of ['loadedmetadata', 'load']) node.addEventListener(event, arrangement.fit);
       }
-      return box;
-    }
-
-    function makeDivider() {
-      const divider = make('div', {class: 'divider', role: 'separator', tabindex: 0, 'aria-orientation': 'vertical', 'aria-label': say('divider'), 'aria-valuemin': 20, 'aria-valuemax': 80});
-      const set = (percent) => {
-        const value = Math.round(clamp(percent, 20, 80));
-        divider.setAttribute('aria-valuenow', value);
-        divider.parentNode && divider.parentNode.style.setProperty('--split', value + '%');
-        context.memory.choose('split', value);
-        divider.value = value;
-      };
-      queueMicrotask(() => set(context.memory.choice('split', 50)));
-      divider.addEventListener('keydown', (event) => {
-        const step = {ArrowLeft: -5, ArrowRight: 5, ArrowUp: -5, ArrowDown: 5}[event.key];
-        if (step) set(divider.value + step);
-        else if (event.key === 'Home') set(20);
-        else if (event.key === 'End') set(80);
-        else return;
-        event.preventDefault();
-        event.stopPropagation();
-      });
-      divider.addEventListener('pointerdown', (event) => {
-        event.preventDefault();
-        divider.setPointerCapture(event.pointerId);
-        const box = divider.parentNode.getBoundingClientRect();
-        const move = (moved) => set((moved.clientX - box.left) / box.width * 100);
-        divider.addEventListener('pointermove', move);
-        divider.addEventListener('lostpointercapture', () => divider.removeEventListener('pointermove', move), {once: true});
-      });
-      divider.addEventListener('dblclick', () => set(50));
-      return divider;
-    }
-
-    function makeView(box) {
-      let name = 'side', isSwapped = false;
-      const made = {
-        get value() { return name + (isSwapped ? '.swapped' : ''); },
-        set(value) {
-          const [base, swapped] = String(value).split('.');
-          name = kViews.includes(base) ? base : 'side';
-          isSwapped = swapped === 'swapped';
-          box.dataset.view = name;
-          box.dataset.swapped = isSwapped;
-          const small = name === 'corner' ? panes[isSwapped ? 0 : 1] : null;
-          for (const pane of panes) pane.classList.toggle('small', pane === small);
-          const hidden = {first: panes[isSwapped ? 0 : 1], second: panes[isSwapped ? 1 : 0]}[name];
-          for (const pane of panes) {
-            pane.hidden = pane === hidden;
-            const stream = player.streams.find((each) => pane.contains(each.element));
-            if (stream) player.enable(stream, pane !== hidden);
-          }
-          box.querySelector('.divider').hidden = name !== 'side';
-          made.buttons && made.buttons.forEach((button) => button.setAttribute('aria-pressed', button.dataset.view === name));
-          context.memory.choose('view', made.value);
-          context.note();
-        },
-        swap() {
-          made.set(name + (isSwapped ? '' : '.swapped'));
-          Olive.announce(say('swapped'));
-        },
-      };
-      return made;
+      return arrangement.element;
     }
 
     const stage = Olive.timedStage(item, context, parts, {
       content,
       chapters: item.chapters,
-      extras: () => {
-        view.buttons = kViews.map((name) => Olive.iconButton(name, say('view-' + name), () => view.set(name + (view.value.endsWith('.swapped') ? '.swapped' : '')), {'data-view': name, 'aria-pressed': 'false'}));
-        return [make('div', {class: 'views', role: 'group', 'aria-label': say('views')}, view.buttons,
-                     Olive.iconButton('swap', say('swap'), () => view.swap()))];
-      },
+      cover: false,
+      extras: () => [arrangement.controls],
+      choosers: () => [arrangement.chooser.element],
+      ratio: Math.max(Olive.ratioOf(first), Olive.ratioOf(second)),
+      keepsShape: true,
     });
-    stage.view = view;
-    view.set(context.start.view || context.memory.choice('view', 'side'));
+    const close = stage.close;
+    stage.view = arrangement;
+    stage.close = () => {
+      arrangement.close();
+      for (const node of shown) {
+        for (const event of ['loadedmetadata', 'load']) node.removeEventListener(event, arrangement.fit);
+      }
+      close();
+    };
+    arrangement.set(context.start.view || context.memory.choice('view', 'side'));
     return stage;
+  }
+
+  Olive.stages.DualSource = (item, context) => {
+    if (item.sources.length < 2)
+      return Olive.stages[item.sources[0].category === 'Audio' ? 'Audio' : 'Movie'](item, context);
+    const sources = item.sources.slice(0, 2);
+    const timed = sources.filter(isTimed),
+      seen = sources.filter(isSeen);
+    if (!timed.length) return Olive.stages.Image(item, context);
+    const leader = timed.find((source) => source.hasSound) || timed[0];
+    const parts = timed.map((source) => ({
+      source,
+      kind: isSeen(source) ? 'video' : 'audio',
+      offset: source.start || 0,
+      leads: source === leader,
+      poster: source.previews[0]?.picture,
+    }));
+    if (!seen.length) return Olive.stages.Audio(item, context);
+    return seen.length === 1 ? oneSeen(item, context, parts, seen[0]) : bothSeen(item, context, parts, leader);
   };
 })(window.Olive);

@@ -3,15 +3,15 @@
 // pages. Without a store (or a full one) everything works but is forgotten.
 'use strict';
 
-(function (Olive) {
-  Olive.openMemory = function (packageId) {
+((Olive) => {
+  Olive.openMemory = (packageId) => {
     const prefix = 'quilt.olive.' + packageId + '.';
 
     function read(name) {
       try {
         const value = JSON.parse(localStorage.getItem(prefix + name));
         return value && typeof value === 'object' ? value : {};
-      } catch (error) {
+      } catch {
         return {};
       }
     }
@@ -22,7 +22,7 @@
     function write(name, value) {
       try {
         localStorage.setItem(prefix + name, JSON.stringify(value));
-      } catch (error) {
+      } catch {
         // forgotten when the page closes
       }
     }
@@ -33,10 +33,10 @@
         choices[name] = value;
         write('choices', choices);
       },
-      // {time, share, page, done} of an item: seconds, part seen from 0 to 1, page index, whether it was seen to its end.
+      // {time, share, page, done, at} of an item: seconds, part seen from 0 to 1, page index, whether it was seen to its end, when.
       place: (item) => places[item.id] || {},
       keep(item, place) {
-        places[item.id] = {...places[item.id], ...place};
+        places[item.id] = {...places[item.id], ...place, at: Date.now()};
         write('places', places);
       },
       forget() {

@@ -4,48 +4,52 @@
 // are far off.
 'use strict';
 
-(function (Olive) {
-  const kTolerance = 0.04;      // seconds that nobody notices
-  const kSettled = 0.02;        // correction ends here
-  const kFar = 0.4;             // beyond, speed would take too long
-  const kStrongest = 0.1;       // of the speed
-  const kSeekPause = 2000;      // ms between two corrections by seeking
-  const kBeat = 100;            // ms between two looks
-  const kFreshFrame = 250;      // ms for which a frame's time tells more than the element's clock
+((Olive) => {
+  const kTolerance = 0.04; // seconds that nobody notices
+  const kSettled = 0.02; // correction ends here
+  const kFar = 0.4; // beyond, speed would take too long
+  const kStrongest = 0.1; // of the speed
+  const kSeekPause = 2000; // ms between two corrections by seeking
+  const kBeat = 100; // ms between two looks
+  const kFreshFrame = 250; // ms for which a frame's time tells more than the element's clock
 
   // One media element on the common time line.
   class Stream {
     constructor(element, grades, offset) {
       this.element = element;
       this.grades = grades;
-      this.offset = offset;        // where its beginning lies
-      this.isEnabled = true;       // a follower that nobody sees rests
+      this.offset = offset; // where its beginning lies
+      this.isEnabled = true; // a follower that nobody sees rests
       this.hasFailed = false;
       this.isCorrecting = false;
       this.isClosed = false;
-      this.lastSeek = -Infinity;
-      this.pending = null;         // seconds to go to once the file is known
+      this.lastSeek = Number.NEGATIVE_INFINITY;
+      this.pending = null; // seconds to go to once the file is known
       this.frame = null;
       if (element.requestVideoFrameCallback) this.watchFrames();
     }
 
     watchFrames() {
-      this.element.requestVideoFrameCallback((now, data) => {
+      this.element.requestVideoFrameCallback((_now, data) => {
         this.frame = {media: data.mediaTime, at: data.expectedDisplayTime};
         if (!this.isClosed) this.watchFrames();
       });
     }
 
-    get duration() { return Number.isFinite(this.element.duration) ? this.element.duration : (this.grades.current || {}).duration || 0; }
-    get end() { return this.offset + this.duration; }
+    get duration() {
+      return Number.isFinite(this.element.duration) ? this.element.duration : this.grades.current?.duration || 0;
+    }
+    get end() {
+      return this.offset + this.duration;
+    }
 
     // Seconds of the stream itself, as seen on the screen.
     get position() {
       if (this.pending !== null) return this.pending;
       const element = this.element;
-      const age = this.frame ? performance.now() - this.frame.at : Infinity;
+      const age = this.frame ? performance.now() - this.frame.at : Number.POSITIVE_INFINITY;
       if (element.paused || element.seeking || element.ended || age > kFreshFrame) return element.currentTime;
-      return this.frame.media + age / 1000 * element.playbackRate;
+      return this.frame.media + (age / 1000) * element.playbackRate;
     }
 
     load(file, at) {
@@ -75,31 +79,53 @@
   // Events: "time", "state" (playing, waiting or rate changed), "duration", "ended", "blocked" (the browser wants a
   // gesture first), "failed" (no file of a stream is left; detail is the stream), "file" (another file is shown).
   class Player extends EventTarget {
-    // parts: [{element, grades, offset, leads}]; duration: seconds as the package tells, until the files tell better.
-    constructor(parts, duration) {
+    // parts: [{element, grades, offset, leads, speaksAgain}]: speaksAgain is heard when what leads is over. duration:
+    // seconds as the package tells, until the files tell better. runsAlone: a clock goes on when every stream has failed.
+    constructor(parts, duration, runsAlone = false) {
       super();
       this.streams = parts.map((part) => new Stream(part.element, part.grades, part.offset || 0));
       const first = Math.min(...this.streams.map((stream) => stream.offset));
       for (const stream of this.streams) stream.offset -= first;
-      this.leader = this.streams[Math.max(0, parts.findIndex((part) => part.leads))] || null;
+      this.leader =
+        this.streams[
+          Math.max(
+            0,
+            parts.findIndex((part) => part.leads),
+          )
+        ] || null;
       this.told = duration;
+      this.runsAlone = runsAlone;
+      this.spare = this.streams[parts.findIndex((part) => part.speaksAgain)] || null;
       this.wanted = false;
       this.speed = 1;
       this.loudness = 1;
       this.isMuted = false;
       this.stalled = new Set();
-      this.virtual = 0;            // seconds, the clock without streams
+      this.virtual = 0; // seconds, the clock without streams
       this.hasEnded = false;
       this.removals = [];
       for (const stream of this.streams) this.listen(stream);
       this.applySound();
     }
 
-    emit(name, detail) { this.dispatchEvent(new CustomEvent(name, {detail})); }
+    emit(name, detail) {
+      this.dispatchEvent(new CustomEvent(name, {detail}));
+    }
 
-    get isPlaying() { return this.wanted; }
-    get isWaiting() { return this.wanted && this.stalled.size > 0; }
-    get live() { return this.streams.filter((stream) => !stream.hasFailed && stream.isEnabled); }
+    // Whether time runs by the clock, without any stream.
+    get isFree() {
+      return !this.streams.length || (this.runsAlone && this.streams.every((stream) => stream.hasFailed));
+    }
+
+    get isPlaying() {
+      return this.wanted;
+    }
+    get isWaiting() {
+      return this.wanted && this.stalled.size > 0;
+    }
+    get live() {
+      return this.streams.filter((stream) => !stream.hasFailed && stream.isEnabled);
+    }
 
     get duration() {
       const end = Math.max(0, ...this.streams.filter((stream) => !stream.hasFailed).map((stream) => stream.end));
@@ -108,14 +134,15 @@
 
     // The stream whose clock counts now: the leader while it runs, then whichever goes on.
     get clock() {
-      const runs = (stream) => stream && !stream.hasFailed && !(stream.element.ended && stream.end < this.duration - 0.05);
+      const runs = (stream) =>
+        stream && !stream.hasFailed && !(stream.element.ended && stream.end < this.duration - 0.05);
       if (runs(this.leader)) return this.leader;
       return this.live.find((stream) => runs(stream)) || this.leader;
     }
 
     get time() {
       const clock = this.clock;
-      if (!clock) return this.virtual;
+      if (!clock || this.isFree) return this.virtual;
       const seconds = clock.pending === null ? clock.element.currentTime : clock.pending;
       return Olive.clamp(seconds + clock.offset, 0, this.duration);
     }
@@ -141,7 +168,15 @@
       for (const name of ['playing', 'canplay', 'canplaythrough']) on(name, () => this.release(stream));
       on('pause', () => {
         // Unplugged headphones, a media key, another window: whoever pauses the leader pauses all of it.
-        if (this.wanted && stream === this.leader && !element.ended && !element.seeking && !this.stalled.size && stream.pending === null) this.pause();
+        if (
+          this.wanted &&
+          stream === this.leader &&
+          !element.ended &&
+          !element.seeking &&
+          !this.stalled.size &&
+          stream.pending === null
+        )
+          this.pause();
       });
       on('ended', () => this.finish());
       on('error', () => this.tryNext(stream));
@@ -175,9 +210,11 @@
       stream.hasFailed = true;
       this.stalled.delete(stream);
       if (stream === this.leader) {
+        const isPlaying = this.wanted;
         this.pause();
         this.leader = this.live[0] || stream;
         this.applySound();
+        if (isPlaying && this.isFree) this.play();
       }
       this.emit('failed', stream);
     }
@@ -192,7 +229,7 @@
     }
 
     play() {
-      if (this.streams.length && !this.live.length) return;
+      if (!this.isFree && !this.live.length) return;
       if (this.hasEnded || (this.duration && this.time >= this.duration - 0.05)) this.seek(0);
       this.wanted = true;
       this.started = performance.now();
@@ -214,7 +251,9 @@
       this.emit('time');
     }
 
-    toggle() { this.wanted ? this.pause() : this.play(); }
+    toggle() {
+      this.wanted ? this.pause() : this.play();
+    }
 
     seek(seconds) {
       const target = Olive.clamp(seconds, 0, this.duration);
@@ -237,7 +276,7 @@
     }
 
     run(stream) {
-      if (!stream.element.paused || stream.element.ended) return;  // what has ended would begin again
+      if (!stream.element.paused || stream.element.ended) return; // what has ended would begin again
       const promise = stream.element.play();
       if (!promise) return;
       promise.catch((error) => {
@@ -265,8 +304,9 @@
 
     // The regular look while playing.
     look() {
-      if (!this.streams.length) this.advance();
+      if (this.isFree) this.advance();
       if (this.stalled.size) return;
+      this.applySound();
       const clock = this.clock;
       if (clock && clock.element.readyState > 0) {
         this.run(clock);
@@ -280,7 +320,7 @@
 
     advance() {
       const now = performance.now();
-      this.virtual += (now - this.started) / 1000 * this.speed;
+      this.virtual += ((now - this.started) / 1000) * this.speed;
       this.started = now;
       if (this.virtual >= this.duration) this.finish();
     }
@@ -289,7 +329,8 @@
       const element = stream.element;
       if (element.readyState === 0) return;
       const target = now - stream.offset;
-      if (target < 0 || target >= stream.duration - kTolerance) {  // not begun, or over: its first or last picture stays
+      if (target < 0 || target >= stream.duration - kTolerance) {
+        // not begun, or over: its first or last picture stays
         if (!element.paused) element.pause();
         return;
       }
@@ -315,7 +356,7 @@
 
     finish() {
       const clock = this.clock;
-      if (clock && !clock.element.ended && this.time < this.duration - 0.25) return;  // another one goes on
+      if (clock && !this.isFree && !clock.element.ended && this.time < this.duration - 0.25) return; // another one goes on
       this.hasEnded = true;
       this.virtual = this.duration;
       this.pause();
@@ -339,10 +380,19 @@
       this.emit('state');
     }
 
+    // Who is heard: what leads, or after its end the one that speaks again.
+    get speaker() {
+      const {leader, spare} = this;
+      const isOver = leader && spare && leader !== spare && (leader.hasFailed || this.time >= leader.end - kTolerance);
+      return isOver && !spare.hasFailed ? spare : leader;
+    }
+
     applySound() {
+      const heard = this.speaker;
       for (const stream of this.streams) {
-        stream.element.volume = this.loudness;
-        stream.element.muted = this.isMuted || stream !== this.leader;
+        if (stream.element.volume !== this.loudness) stream.element.volume = this.loudness;
+        const isMuted = this.isMuted || stream !== heard;
+        if (stream.element.muted !== isMuted) stream.element.muted = isMuted;
       }
     }
 

@@ -1,87 +1,18 @@
 // SPDX-License-Identifier: Apache-2.0
-// The controls of a player: seek bar with chapter marks, play, skip, sound, speed, grade. Runs from left to right in
-// every language, as the time line does.
+// The controls of a player: seek bar, then one row of play, skip, sound and what belongs to the item, and a menu of what
+// is needed more seldom. Runs from left to right in every language, as the time line does.
 'use strict';
 
-(function (Olive) {
+((Olive) => {
   const {make, say, clock, clamp} = Olive;
   const kSpeeds = [0.5, 0.75, 1, 1.25, 1.5, 1.75, 2];
   const kSkip = 10;
 
   const speedLabel = (speed) => Olive.number(speed, 2) + '×';
 
-  function seekBar(player, chapters) {
-    const range = make('input', {type: 'range', class: 'seek', min: 0, max: 1, step: 'any', value: 0, 'aria-label': say('seek')});
-    const marks = make('div', {class: 'marks', 'aria-hidden': 'true'});
-    const bubble = make('div', {class: 'bubble', hidden: true, 'aria-hidden': 'true'});
-    const bar = make('div', {class: 'seek-bar'}, range, marks, bubble);
-    let isDragged = false;
-
-    const chapterAt = (seconds) => chapters.filter((chapter) => chapter.start !== null && chapter.start <= seconds + 0.05).pop();
-    const share = (seconds) => (player.duration ? clamp(seconds / player.duration, 0, 1) : 0);
-
-    function drawMarks() {
-      marks.replaceChildren(...chapters.filter((chapter) => chapter.start > 0 && chapter.start < player.duration).map((chapter) => {
-        const mark = make('i');
-        mark.style.insetInlineStart = share(chapter.start) * 100 + '%';
-        return mark;
-      }));
-    }
-
-    function update() {
-      const duration = player.duration;
-      if (Number(range.max) !== duration) {
-        range.max = duration || 1;
-        drawMarks();
-      }
-      if (!isDragged) range.value = player.time;
-      const shown = Number(range.value);
-      bar.style.setProperty('--done', share(shown) * 100 + '%');
-      const chapter = chapterAt(shown);
-      range.setAttribute('aria-valuetext', say('timeOf', {time: Olive.spokenTime(shown), total: Olive.spokenTime(duration)}) + (chapter ? ', ' + chapter.title : ''));
-    }
-
-    function point(event) {
-      const box = range.getBoundingClientRect();
-      const part = clamp((event.clientX - box.left) / box.width, 0, 1);
-      const seconds = part * player.duration;
-      const chapter = chapterAt(seconds);
-      bubble.replaceChildren(
-        ...(chapter && chapter.picture ? [Olive.picture(chapter.picture, {loading: 'eager'})] : []),
-        ...(chapter ? [make('span', {class: 'bubble-title', dir: 'auto', text: chapter.title})] : []),
-        make('span', {text: clock(seconds)}));
-      bubble.hidden = !player.duration;
-      const half = bubble.offsetWidth / 2;
-      bubble.style.left = clamp(part * box.width, half, box.width - half) + 'px';
-    }
-
-    range.addEventListener('input', () => {
-      isDragged = true;
-      player.seek(Number(range.value));
-      update();
-    });
-    range.addEventListener('change', () => { isDragged = false; });
-    bar.addEventListener('pointermove', point);
-    bar.addEventListener('pointerleave', () => { bubble.hidden = true; });
-    return {bar, range, update};
-  }
-
-  // options: {chapters, choices (of grades), grade, onGrade, extras (more controls), memory}
-  Olive.makeTransport = function (player, options) {
-    const {memory, chapters} = options;
-    const seek = seekBar(player, chapters);
-    const shown = make('span', {class: 'time', 'aria-hidden': 'true'});
-    const playButton = Olive.iconButton('play', say('play'), () => player.toggle(), {class: 'icon-button play'});
-    const muteButton = Olive.iconButton('loud', say('mute'), () => actions.mute());
-    const volume = make('input', {type: 'range', class: 'volume', min: 0, max: 1, step: 0.05, 'aria-label': say('volume'),
-                                  oninput: () => actions.setVolume(Number(volume.value))});
-    const speed = make('select', {class: 'choice', 'aria-label': say('speed'), title: say('speed'), onchange: () => actions.setSpeed(Number(speed.value))},
-                       kSpeeds.map((value) => make('option', {value, text: speedLabel(value)})));
-    const grade = options.choices.length > 1 && make('select', {class: 'choice', 'aria-label': say('grade'), title: say('grade'), onchange: () => options.onGrade(grade.value)},
-      make('option', {value: '', text: say('automatic')}),
-      options.choices.map((choice) => make('option', {value: choice.grade, text: Olive.gradeLabel(choice)})));
-    const hasSound = player.streams.length > 0;
-
+  // What the controls, the keys and the gestures do with a player.
+  function makeActions(player, memory, chapters) {
+    const starts = chapters.map((chapter) => chapter.start).filter((start) => start !== null);
     const actions = {
       setVolume(value) {
         const loudness = clamp(value, 0, 1);
@@ -106,46 +37,111 @@
         actions.setSpeed(kSpeeds[clamp(at + step, 0, kSpeeds.length - 1)]);
       },
       skip: (seconds) => player.seek(player.time + seconds),
+      // To the next chapter or the one before; false when there is none.
       chapter(step) {
-        const starts = chapters.map((chapter) => chapter.start).filter((start) => start !== null);
         if (!starts.length) return false;
         const now = player.time;
-        const target = step > 0 ? starts.find((start) => start > now + 0.1) : starts.filter((start) => start < now - 2).pop();
-        if (target === undefined && step > 0) return false;
-        player.seek(target === undefined ? starts[0] : target);
+        const later = starts.find((start) => start > now + 0.1),
+          earlier = starts.filter((start) => start < now - 2).pop();
+        if (step > 0 && later === undefined) return false;
+        player.seek(step > 0 ? later : (earlier ?? starts[0]));
         return true;
       },
     };
+    return actions;
+  }
 
-    const element = make('div', {class: 'transport', dir: 'ltr', role: 'group', 'aria-label': say('controls')},
+  function makeSound(player, actions) {
+    const mute = Olive.iconButton('loud', say('mute'), () => actions.mute());
+    const volume = make('input', {
+      type: 'range',
+      class: 'volume',
+      min: 0,
+      max: 1,
+      step: 0.05,
+      'aria-label': say('volume'),
+      oninput: () => actions.setVolume(Number(volume.value)),
+    });
+    const update = () => {
+      const isSilent = player.isMuted || player.loudness === 0;
+      Olive.setIcon(mute, isSilent ? 'mute' : 'loud');
+      Olive.relabel(mute, say(isSilent ? 'unmute' : 'mute'));
+      volume.value = isSilent ? 0 : player.loudness;
+      volume.style.setProperty('--done', Number(volume.value) * 100 + '%');
+      volume.setAttribute('aria-valuetext', Olive.number(Number(volume.value) * 100) + ' %');
+    };
+    return {element: make('div', {class: 'sound'}, mute, volume), update};
+  }
+
+  // Speed, quality and what else the item offers; options as for makeTransport.
+  function makePlaybackMenu(player, actions, options) {
+    const speeds = kSpeeds.map((value) => [value, speedLabel(value)]);
+    const speed = Olive.menuChoice(say('speed'), speeds, player.speed, actions.setSpeed);
+    const grades = options.choices.map((choice) => [choice.grade, Olive.gradeLabel(choice)]);
+    const grade =
+      grades.length > 1 &&
+      Olive.menuChoice(say('grade'), [['', say('automatic')], ...grades], options.grade, options.onGrade).element;
+    const menu = Olive.makeMenu('gear', say('playback'), [
+      speed.element,
+      grade,
+      ...options.choosers,
+      make('div', {class: 'menu-actions'}, options.more.map(Olive.menuAction)),
+    ]);
+    const badge = make('span', {class: 'menu-badge', 'aria-hidden': 'true'});
+    menu.button.append(badge);
+    const update = () => {
+      speed.set(player.speed);
+      badge.textContent = player.speed === 1 ? '' : speedLabel(player.speed);
+    };
+    return {element: menu.element, update};
+  }
+
+  // options: {chapters, choices (of grades), grade, onGrade, extras (more controls), choosers (more choices of the menu),
+  // more (actions of the menu), last (controls at the end of the row), memory}. Returns {element, actions, playButton,
+  // disable()}.
+  Olive.makeTransport = (player, options) => {
+    const actions = makeActions(player, options.memory, options.chapters);
+    player.setSpeed(options.memory.choice('speed', 1));
+    player.setSound(options.memory.choice('volume', 1), options.memory.choice('muted', false));
+    const seek = new Olive.SeekBar(player, options.chapters);
+    const sound = makeSound(player, actions);
+    const menu = makePlaybackMenu(player, actions, options);
+    const now = make('span', {class: 'now'}),
+      whole = make('span', {class: 'whole'});
+    const playButton = Olive.iconButton('play', say('play'), () => player.toggle(), {class: 'icon-button play'});
+    const skip = (icon, step) =>
+      Olive.iconButton(icon, say(icon, {n: kSkip}), () => actions.skip(step), {class: 'icon-button skips'});
+    const element = make(
+      'div',
+      {class: 'transport', dir: 'ltr', role: 'group', 'aria-label': say('controls')},
       seek.bar,
-      make('div', {class: 'buttons'},
+      make(
+        'div',
+        {class: 'buttons'},
         playButton,
-        Olive.iconButton('back', say('back', {n: kSkip}), () => actions.skip(-kSkip)),
-        Olive.iconButton('forward', say('forward', {n: kSkip}), () => actions.skip(kSkip)),
-        hasSound && make('div', {class: 'sound'}, muteButton, volume),
-        shown,
+        skip('back', -kSkip),
+        skip('forward', kSkip),
+        player.streams.length > 0 && sound.element,
+        make('span', {class: 'time', 'aria-hidden': 'true'}, now, whole),
         make('span', {class: 'gap'}),
         options.extras,
-        speed,
-        grade));
+        menu.element,
+        options.last,
+      ),
+    );
 
     function update() {
       seek.update();
-      shown.textContent = `${clock(player.time)} / ${clock(player.duration)}`;
+      now.textContent = clock(player.time);
+      whole.textContent = ' / ' + clock(player.duration);
     }
 
     function updateState() {
-      const [icon, label] = player.isPlaying ? ['pause', 'pause'] : player.hasEnded ? ['replay', 'playAgain'] : ['play', 'play'];
-      Olive.setIcon(playButton, icon);
-      Olive.relabel(playButton, say(label));
-      const isSilent = player.isMuted || player.loudness === 0;
-      Olive.setIcon(muteButton, isSilent ? 'mute' : 'loud');
-      Olive.relabel(muteButton, say(isSilent ? 'unmute' : 'mute'));
-      volume.value = isSilent ? 0 : player.loudness;
-      volume.style.setProperty('--done', volume.value * 100 + '%');
-      volume.setAttribute('aria-valuetext', Olive.number(volume.value * 100) + ' %');
-      speed.value = player.speed;
+      const next = player.isPlaying ? 'pause' : player.hasEnded ? 'playAgain' : 'play';
+      Olive.setIcon(playButton, next === 'playAgain' ? 'replay' : next);
+      Olive.relabel(playButton, say(next));
+      sound.update();
+      menu.update();
       update();
     }
 
@@ -153,10 +149,18 @@
     player.addEventListener('duration', update);
     player.addEventListener('state', updateState);
     player.addEventListener('ended', updateState);
-    player.setSpeed(memory.choice('speed', 1));
-    player.setSound(memory.choice('volume', 1), memory.choice('muted', false));
-    if (grade) grade.value = options.grade;
     updateState();
-    return {element, actions, playButton};
+    return {
+      element,
+      actions,
+      playButton,
+      // Nothing can be played: only what is not about playing stays.
+      disable() {
+        element.classList.add('off');
+        for (const control of element.querySelectorAll('button, input')) {
+          if (!control.closest('.last')) control.disabled = true;
+        }
+      },
+    };
   };
 })(window.Olive);
