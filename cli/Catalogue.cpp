@@ -25,7 +25,6 @@ using platform::FileKind;
 using platform::Result;
 using platform::services;
 
-constexpr const char* kCollectionsFolder = "Collections";
 constexpr const char* kCollectionFilename = "collection.plist";
 constexpr const char* kFormatVersion = "1.0";
 
@@ -56,7 +55,9 @@ ItemEntry itemEntry(const Dictionary& record) {
           record.string("ContentCategory").value_or("")};
 }
 
-CollectionEntry collectionEntry(const Path& folder) {
+}  // namespace
+
+CollectionEntry readCollectionEntry(const Path& folder) {
   CollectionEntry entry;
   entry.path = folder;
   entry.uuid = folder.filename().native();
@@ -81,8 +82,6 @@ CollectionEntry collectionEntry(const Path& folder) {
   });
   return entry;
 }
-
-}  // namespace
 
 Path absolutePath(const std::string& typed) {
   if (typed.empty()) throw Failure(ExitCode::NotFound, "An empty name stands for no file");
@@ -152,7 +151,7 @@ Catalogue readCatalogue(const Path& library) {
   const Path folder = library / kCollectionsFolder;
   if (!services().files->fileExistsAtPath(folder)) return catalogue;
   for (const std::string& name : visibleNames(folder))
-    if (isFolder(folder / name)) catalogue.collections.push_back(collectionEntry(folder / name));
+    if (isFolder(folder / name)) catalogue.collections.push_back(readCollectionEntry(folder / name));
   std::stable_sort(catalogue.collections.begin(), catalogue.collections.end(), [](const auto& a, const auto& b) {
     return std::tie(a.title, a.created, a.uuid) < std::tie(b.title, b.created, b.uuid);
   });

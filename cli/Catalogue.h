@@ -13,6 +13,9 @@ namespace quilt::cli {
 
 using Path = std::filesystem::path;
 
+/// The folder of a library that holds its collections.
+inline constexpr const char* kCollectionsFolder = "Collections";
+
 /// A library as it lies on disk, read without opening it in the model: opening tidies up, and a command that only reads
 /// must change nothing. What cannot be read is listed with the reason.
 
@@ -51,6 +54,9 @@ Path libraryPath(const std::optional<std::string>& given);
 
 /// A library that is not there yet is empty. Throws a Failure when the folder cannot be read.
 Catalogue readCatalogue(const Path& library);
+
+/// One collection with its documents. Throws a Failure when the folder cannot be read.
+CollectionEntry readCollectionEntry(const Path& folder);
 
 /// One package, wherever it lies.
 DocumentEntry readDocumentEntry(const Path& package);

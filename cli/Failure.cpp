@@ -71,6 +71,8 @@ ExitCode exitCodeFor(platform::ErrorKind kind) {
       return Interrupt::exitCode();
     case ErrorKind::Locked:
       return ExitCode::Locked;
+    case ErrorKind::Changed:
+      return ExitCode::Failed;
     case ErrorKind::Unsafe:
       return ExitCode::Invalid;
   }

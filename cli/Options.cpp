@@ -396,7 +396,10 @@ const CommandDescription* findCommand(std::string_view name) {
 
 std::vector<Option> optionsOf(const CommandDescription& command) {
   std::vector<Option> options = command.options;
-  if (command.writes) options.push_back({"--dry-run", "", "", "print what would be done, and change nothing"});
+  if (command.writes) {
+    options.push_back({"--wait", "", "SECONDS", "wait so long for what another process is changing (else not at all)"});
+    options.push_back({"--dry-run", "", "", "print what would be done, and change nothing"});
+  }
   return options;
 }
 

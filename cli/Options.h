@@ -48,7 +48,7 @@ struct CommandDescription {
   std::string_view details;  ///< paragraphs of help, lines as they are to be printed
   std::vector<Positional> positionals;
   std::vector<Option> options;
-  bool writes = false;  ///< changes the library or the disk, and so has --dry-run
+  bool writes = false;  ///< changes the library or the disk, and so has --wait and --dry-run
   /// Makes the request; throws a Failure for what the table cannot express.
   Command (*request)(const Arguments& arguments) = nullptr;
 };
@@ -56,7 +56,7 @@ struct CommandDescription {
 const std::vector<Option>& commonOptions();
 const std::vector<CommandDescription>& commands();
 const CommandDescription* findCommand(std::string_view name);
-/// The command's own options, with --dry-run when it writes.
+/// The command's own options, with --wait and --dry-run when it writes.
 std::vector<Option> optionsOf(const CommandDescription& command);
 
 /// "--collection C", as usage lines show it.

@@ -5,6 +5,8 @@
 
 #include <CLI/CLI.hpp>
 #include <algorithm>
+#include <charconv>
+#include <cmath>
 
 #include "cli/Failure.h"
 #include "cli/Options.h"
@@ -156,6 +158,16 @@ Arguments argumentsOf(const CommandDescription& command, Words words) {
   return found;
 }
 
+// A day is as good as for ever, and still a number of milliseconds.
+std::chrono::milliseconds readWait(const std::string& value) {
+  constexpr double kLongest = 24.0 * 60 * 60;
+  double seconds = 0;
+  const auto [end, error] = std::from_chars(value.data(), value.data() + value.size(), seconds);
+  if (error != std::errc() || end != value.data() + value.size() || !(seconds >= 0))
+    throw Failure(ExitCode::Usage, "--wait is a number of seconds, not " + inQuotes(value));
+  return std::chrono::milliseconds(std::llround(std::min(seconds, kLongest) * 1000));
+}
+
 Settings settingsFrom(const Arguments& arguments) {
   Settings settings;
   settings.library = arguments.first("--library");
@@ -164,6 +176,7 @@ Settings settingsFrom(const Arguments& arguments) {
   settings.verbose = arguments.has("--verbose");
   settings.noColor = arguments.has("--no-color");
   settings.dryRun = arguments.has("--dry-run");
+  if (const auto wait = arguments.first("--wait")) settings.wait = readWait(*wait);
   const std::string progress = arguments.first("--progress").value_or("auto");
   settings.progress = progress == "json"   ? ProgressStyle::Json
                       : progress == "none" ? ProgressStyle::None

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <chrono>
 #include <cstdint>
 #include <optional>
 #include <string>
@@ -157,6 +158,7 @@ struct Settings {
   bool noColor = false;
   bool dryRun = false;
   ProgressStyle progress = ProgressStyle::Automatic;
+  std::chrono::milliseconds wait{0};  ///< for what another process is changing
   bool operator==(const Settings&) const = default;
 };
 

@@ -168,9 +168,10 @@ void addCompanions(const AdditionPlan& plan, Kind kind, QuiltDocument& document,
 
 void ActingDelegate::perform(const AddRequest& request) {
   _context.output.beginList();
-  (void)findTarget(readCatalogue(library()), request);
+  LibrarySession session(library(), _context);
+  (void)findTarget(session.catalogue(), request);
   AdditionPlan plan = look(request);
-  LibrarySession session(library());
+  session.lock(findTarget(session.catalogue(), request).document);
   const Target target = findTarget(session.catalogue(), request);
   const auto document = session.open(target.document);
   const auto item = target.item ? document->mediaWithUUID(target.item->uuid) : nullptr;

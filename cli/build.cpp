@@ -103,14 +103,16 @@ class TemporaryFolder {
 /// A document in a library that goes again, with the collection that was made for it, unless it is kept.
 class NewDocument {
  public:
-  NewDocument(LibrarySession& session, const Manifest& manifest, const LogCollector& log) : _session(session) {
+  NewDocument(LibrarySession& session, const Manifest& manifest, const LogCollector& log) {
     const std::string title = manifest.collection ? manifest.collection->title : kDefaultCollectionTitle;
-    for (const CollectionEntry& entry : session.catalogue().collections)
-      if (!_collection && entry.title == title && !entry.damage) _collection = session.open(entry);
-    if (!_collection) makeCollection(title, manifest);
+    _collection = session.collectionTitled(title);
+    if (session.hasMadeCollection()) describe(title, manifest);
+    const LibraryLock moment = session.lockForAMoment(_collection->path());
     _document = _collection->newDocumentWithType(kQuiltDocumentTypeInteractive);
-    if (_document) return;
-    giveUp();
+    if (_document) {
+      _lock.emplace(session.lockNew(_document->path(), moment));
+      return;
+    }
     throw explain("The package " + nameOf(manifest) + " cannot be made", log, _collection->path(), _collection->path());
   }
   NewDocument(const NewDocument&) = delete;
@@ -123,9 +125,7 @@ class NewDocument {
   void keep() { _isKept = true; }
 
  private:
-  void makeCollection(const std::string& title, const Manifest& manifest) {
-    _collection = _session.makeCollection(title);
-    _hasMadeCollection = true;
+  void describe(const std::string& title, const Manifest& manifest) {
     if (!manifest.collection) return;
     const ManifestCollection& described = *manifest.collection;
     const bool saved = changeAndSave(*_collection, [&] {
@@ -133,22 +133,19 @@ class NewDocument {
       if (described.description) _collection->setDescription(described.description);
     });
     if (saved) return;
-    giveUp();
     throw Failure(ExitCode::InputOutput, "The collection " + inQuotes(title) + " cannot be saved", _collection->path());
   }
 
   void giveUp() {
-    if (_hasMadeCollection) {
-      _session.removeMadeCollection(_collection);
-    } else if (_document) {
-      _collection->removeDocument(_document, true);
-    }
+    if (!_document) return;
+    // Also when somebody else holds the collection: nobody else knows the document.
+    const auto moment = LibraryLock::ofCollection(_collection->path(), {std::chrono::seconds(5)});
+    _collection->removeDocument(_document, true);
   }
 
-  LibrarySession& _session;
   std::shared_ptr<QuiltCollection> _collection;
   std::shared_ptr<QuiltDocument> _document;
-  bool _hasMadeCollection = false;
+  std::optional<LibraryLock> _lock;
   bool _isKept = false;
 };
 
@@ -237,7 +234,7 @@ void ActingDelegate::perform(const BuildRequest& request) {
   // Beside the package, where there is as much space, and moving costs nothing.
   std::optional<TemporaryFolder> temporary;
   if (!_context.settings.library) temporary.emplace(plan.target.folder);
-  LibrarySession session(temporary ? temporary->path() : library());
+  LibrarySession session(temporary ? temporary->path() : library(), _context);
   NewDocument made(session, plan.manifest, _context.log);
   QuiltDocument& document = *made;
   if (temporary && !plan.manifest.collection) document.setCollectionOwner(nullptr);  // the author named none

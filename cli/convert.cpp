@@ -63,8 +63,8 @@ void printNew(const QuiltDocument& document, Identities& known, Output& output) 
 
 void ActingDelegate::perform(const ConvertRequest& request) {
   _context.output.beginList();
-  (void)findDocument(readCatalogue(library()), request.document);
-  LibrarySession session(library());
+  LibrarySession session(library(), _context);
+  session.lock(findDocument(session.catalogue(), request.document));
   const FoundDocument found = findDocument(session.catalogue(), request.document);
   const auto document = session.open(found);
   Identities known = derivativesOf(*document);

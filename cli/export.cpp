@@ -36,8 +36,8 @@ ExportPlan check(const ExportRequest& request, const Catalogue& catalogue) {
 }  // namespace
 
 void ActingDelegate::perform(const ExportRequest& request) {
-  (void)check(request, readCatalogue(library()));
-  LibrarySession session(library());
+  LibrarySession session(library(), _context);
+  session.lock(check(request, session.catalogue()).found);
   const ExportPlan plan = check(request, session.catalogue());
   const std::string cannot =
       "The document " + inQuotes(plan.found.document->title, plan.found.document->uuid) + " cannot be exported";

@@ -22,8 +22,8 @@ FoundDocument check(const FinalizeRequest& request, const Catalogue& catalogue) 
 }  // namespace
 
 void ActingDelegate::perform(const FinalizeRequest& request) {
-  (void)check(request, readCatalogue(library()));
-  LibrarySession session(library());
+  LibrarySession session(library(), _context);
+  session.lock(check(request, session.catalogue()));
   const FoundDocument found = check(request, session.catalogue());
   const auto document = session.open(found);
   _context.log.beginOperation();

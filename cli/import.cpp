@@ -99,8 +99,9 @@ std::vector<ImportedFile> checkAll(const std::vector<std::string>& files, std::v
 /// Imports files into one collection, one after the other.
 class Import {
  public:
-  Import(const Context& context, QuiltCollection& collection, std::vector<ImportedFile> candidates)
-      : _context(context), _collection(collection), _candidates(std::move(candidates)) {
+  Import(const Context& context, const LibrarySession& session, QuiltCollection& collection,
+         std::vector<ImportedFile> candidates)
+      : _context(context), _session(session), _collection(collection), _candidates(std::move(candidates)) {
     for (const ImportedFile& candidate : _candidates) _total += weight(candidate);
   }
 
@@ -109,10 +110,14 @@ class Import {
     for (const ImportedFile& candidate : _candidates) {
       if (Interrupt::isRequested()) return;
       _context.log.beginOperation();
-      if (const auto document = importOne(candidate)) {
-        ++_done;
-        if (!_context.settings.quiet) _context.log.showWarnings();
-        print(candidate, *document);
+      try {
+        if (const auto document = importOne(candidate)) {
+          ++_done;
+          if (!_context.settings.quiet) _context.log.showWarnings();
+          print(candidate, *document);
+        }
+      } catch (const Failure& failure) {  // of a lock
+        if (!Interrupt::isRequested()) failures.push_back(failure);
       }
       _before += weight(candidate);
     }
@@ -135,8 +140,10 @@ class Import {
       return !Interrupt::isRequested();
     };
     block(0);
-    // Under an identity of our own, so that what a failure leaves can be found.
+    // Under an identity of our own, so that it can be locked from the first, and what a failure leaves can be found.
     const std::string uuid = platform::generateUUID();
+    const LibraryLock lock =
+        _session.lockNew(_collection.path() / platform::withExtension(uuid, kQuiltDocumentExtension));
     const auto document = _collection.importDocumentFromPath(candidate.path, uuid, block);
     if (!document) {
       removePackage(uuid);
@@ -169,6 +176,7 @@ class Import {
   }
 
   Context _context;
+  const LibrarySession& _session;
   QuiltCollection& _collection;
   const std::vector<ImportedFile> _candidates;
   double _total = 0;
@@ -184,12 +192,10 @@ void ActingDelegate::perform(const ImportRequest& request) {
   const std::vector<ImportedFile> candidates = checkAll(allFiles(request), failures);
   if (candidates.empty()) throwIfAny(failures, 0, kNotImported);
 
-  LibrarySession session(library());
-  const CollectionEntry* entry = collectionFor(session.catalogue(), request.collection);
-  const auto collection = entry ? session.open(*entry) : session.makeCollection(kDefaultCollectionTitle);
-  Import import(_context, *collection, candidates);
+  LibrarySession session(library(), _context);
+  const auto collection = session.collectionForNew(request.collection);
+  Import import(_context, session, *collection, candidates);
   platform::runOnWorker([&] { import.run(); });
-  if (!entry && import.done() == 0) session.removeMadeCollection(collection);
 
   if (!import.isComplete())
     throw Interrupt::failure(

@@ -46,8 +46,8 @@ Plan check(const MoveRequest& request, const Catalogue& catalogue) {
 }  // namespace
 
 void ActingDelegate::perform(const MoveRequest& request) {
-  (void)check(request, readCatalogue(library()));
-  LibrarySession session(library());
+  LibrarySession session(library(), _context);
+  session.lock(check(request, session.catalogue()).document);
   const Plan plan = check(request, session.catalogue());
   const auto document = session.open(plan.document);
   const std::string cannot = "The items of " + inQuotes(document->title().value_or("")) + " cannot be moved";

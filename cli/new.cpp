@@ -27,24 +27,19 @@ std::shared_ptr<QuiltDocument> makeDocument(const NewDocumentRequest& request, Q
 }  // namespace
 
 void ActingDelegate::perform(const NewCollectionRequest& request) {
-  LibrarySession session(library());
+  LibrarySession session(library(), _context);
   const auto collection = session.makeCollection(request.title);
   _context.output.object(json(collection->uuid(), request.title, "Collection", collection->path()), collection->uuid());
 }
 
 void ActingDelegate::perform(const NewDocumentRequest& request) {
-  LibrarySession session(library());
-  const CollectionEntry* entry = collectionFor(session.catalogue(), request.collection);
-  const auto collection = entry ? session.open(*entry) : session.makeCollection(kDefaultCollectionTitle);
-  try {
-    const auto document = makeDocument(request, *collection, _context.log);
-    Json made = json(document->uuid(), request.title, request.type, document->path());
-    made["collection"] = collection->uuid();
-    _context.output.object(std::move(made), document->uuid());
-  } catch (const Failure&) {
-    if (!entry) session.removeMadeCollection(collection);
-    throw;
-  }
+  LibrarySession session(library(), _context);
+  const auto collection = session.collectionForNew(request.collection);
+  const LibraryLock lock = session.lockForAMoment(collection->path());
+  const auto document = makeDocument(request, *collection, _context.log);
+  Json made = json(document->uuid(), request.title, request.type, document->path());
+  made["collection"] = collection->uuid();
+  _context.output.object(std::move(made), document->uuid());
 }
 
 void PreviewDelegate::perform(const NewCollectionRequest& request) {

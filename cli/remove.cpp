@@ -98,13 +98,21 @@ void removeCollection(const CollectionEntry& entry, LibrarySession& session, con
 
 void removeDocument(const FoundDocument& found, LibrarySession& session, const LogCollector& log) {
   const Path& path = found.document->path;
+  const LibraryLock moment = session.lockForAMoment(found.collection->path);
   if (found.document->damage || found.collection->damage) return deleteFolder(path, found.collection->path);
   const auto document = session.open(found);
   document->collectionOwner()->removeDocument(document, true);
   checkGone(path, log);
 }
 
-void removeItems(const RemovalTarget& target, LibrarySession& session, const LogCollector& log) {
+std::string emptied(const QuiltDocument& document) {
+  return "The document " + inQuotes(document.title().value_or(""), document.uuid()) +
+         " holds no media now; a program that opens the whole library deletes an empty " +
+         escaped(document.type().value_or("")) +
+         " document that has neither description nor poster. \"quilt add\" gives it media again";
+}
+
+void removeItems(const RemovalTarget& target, LibrarySession& session, const LogCollector& log, Messages& messages) {
   const auto document = session.open(std::get<FoundDocument>(target.found));
   std::vector<Path> folders;
   const bool saved = changeAndSave(*document, [&] {
@@ -116,20 +124,29 @@ void removeItems(const RemovalTarget& target, LibrarySession& session, const Log
   });
   if (!saved) throw explain("Cannot remove " + describe(target), log, document->path(), document->path());
   for (const Path& folder : folders) checkGone(folder, log);
+  if (document->isClassic() && document->mediaCount() == 0) messages.warning(emptied(*document));
 }
 
 }  // namespace
 
 void ActingDelegate::perform(const RemoveRequest& request) {
-  confirm(request, findTarget(readCatalogue(library()), request), _context.messages);
-  LibrarySession session(library());
+  LibrarySession session(library(), _context);
+  {
+    const RemovalTarget before = findTarget(session.catalogue(), request);
+    confirm(request, before, _context.messages);
+    if (const auto* collection = std::get_if<FoundCollection>(&before.found)) {
+      session.lockWhole(*collection);
+    } else {
+      session.lock(std::get<FoundDocument>(before.found));
+    }
+  }
   const RemovalTarget target = findTarget(session.catalogue(), request);
   if (const auto* collection = std::get_if<FoundCollection>(&target.found)) {
     removeCollection(*collection->collection, session, _context.log);
   } else if (target.items.empty()) {
     removeDocument(std::get<FoundDocument>(target.found), session, _context.log);
   } else {
-    removeItems(target, session, _context.log);
+    removeItems(target, session, _context.log, _context.messages);
   }
   _context.output.object(json(target), "");
 }

@@ -77,8 +77,8 @@ void waitForInterrupt() {
 }  // namespace
 
 void ActingDelegate::perform(const ServeRequest& request) {
-  (void)check(request, readCatalogue(library()));
-  LibrarySession session(library());
+  LibrarySession session(library(), _context);
+  session.lock(check(request, session.catalogue()));
   const FoundDocument found = check(request, session.catalogue());
   const auto document = session.open(found);
   if (isStale(*document)) finalize(*document, *found.document, _context);

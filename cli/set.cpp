@@ -174,12 +174,22 @@ Json apply(const Changes& changes, const Found& found, LibrarySession& session, 
   return apply(changes, *session.open(FoundDocument{item.collection, item.document}), item.item->uuid, log);
 }
 
+void lock(const Found& found, LibrarySession& session) {
+  if (const auto* collection = std::get_if<FoundCollection>(&found)) return session.lock(*collection);
+  if (const auto* document = std::get_if<FoundDocument>(&found)) return session.lock(*document);
+  const auto& item = std::get<FoundItem>(found);
+  session.lock(FoundDocument{item.collection, item.document});
+}
+
 }  // namespace
 
 void ActingDelegate::perform(const SetRequest& request) {
-  // Looked at before the lock is taken, so that a library which is not there is not made for nothing.
-  (void)check(request, findObject(readCatalogue(library()), request.object));
-  LibrarySession session(library());
+  LibrarySession session(library(), _context);
+  {
+    const Found before = findObject(session.catalogue(), request.object);
+    (void)check(request, before);
+    lock(before, session);
+  }
   const Found found = findObject(session.catalogue(), request.object);
   _context.output.object(apply(check(request, found), found, session, _context.log), "");
 }

@@ -14,7 +14,7 @@ foreach(folder platform/base platform/interfaces sources media themes documents 
 endforeach()
 list(REMOVE_ITEM quilt_public_headers_model
      quilt/platform/base/ByteTable.h quilt/platform/base/MonitorWait.h quilt/documents/DataScript.h
-     quilt/sources/DocumentSave.h quilt/sources/Grades.h quilt/sources/ModelFiles.h quilt/sources/RecordNames.h quilt/sources/RepeatedReport.h)
+     quilt/sources/DocumentSave.h quilt/sources/Grades.h quilt/sources/ModelFiles.h quilt/sources/RecordNames.h quilt/sources/RepeatedReport.h quilt/sources/SavedRecord.h)
 set(quilt_public_headers_platform quilt/platform/install.h)
 set(quilt_public_headers_bridge quilt/scripting/bridge/Bridge.h quilt/scripting/bridge/http/Limits.h)
 

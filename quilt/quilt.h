@@ -4,6 +4,7 @@
 /// The whole library but the bridge: the model from the collections down, the accessors for scripts, and the installed
 /// platform. Includes nothing but standard headers besides.
 
+#include "quilt/collections/LibraryLock.h"
 #include "quilt/collections/QuiltCollectionsController.h"
 #include "quilt/platform/base/Worker.h"
 #include "quilt/platform/install.h"

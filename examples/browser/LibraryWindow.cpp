@@ -20,6 +20,7 @@
 #include "examples/browser/ProgressDialog.h"
 #include "examples/browser/PropertyPanel.h"
 #include "examples/browser/Text.h"
+#include "quilt/collections/LibraryLock.h"
 #include "quilt/platform/interfaces/Services.h"
 #include "quilt/themes/QuiltThemesController.h"
 
@@ -198,16 +199,21 @@ void LibraryWindow::connectViews() {
 
 void LibraryWindow::load(const quilt::Path& folder) {
   bool isLoaded = false;
+  std::string inUse;
   const LogLines log;
   const bool wentOn = runWithProgress(this, tr("Opening the library…"), [&](const ProgressionBlock& block) {
     (void)quilt::platform::services().files->createDirectoryAtPath(folder / "Collections");
     (void)quilt::QuiltThemesController::defaultController()->loadWithProgressionBlock({});
+    // Loading cleans up: nobody else may be at work in the library. Who is so now is waited for a little.
+    const auto lock = quilt::LibraryLock::ofLibrary(
+        folder, {std::chrono::seconds(10), [&block](const auto&) { return quilt::platform::report(block, 0); }});
+    if (!lock) return inUse = lock.error().text, void();
     isLoaded =
         _library->loadLibraryPath(folder, [&block](const auto&, double percentage) { return block(percentage); });
   });
   if (!isLoaded && wentOn)
     tell(tr("The library was not opened"),
-         {{tr("“%1” cannot be opened: %2").arg(toQt(folder), toQt(log.cause())),
+         {{tr("“%1” cannot be opened: %2").arg(toQt(folder), toQt(inUse.empty() ? log.cause() : inUse)),
            tr("Check that the folder is there and that you may read it, or start with another one.")}});
   if (isLoaded && _library->collectionsCount() == 0) makeCollection();
 }

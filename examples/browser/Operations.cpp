@@ -6,6 +6,8 @@
 
 #include "examples/browser/LogLines.h"
 #include "examples/browser/Text.h"
+#include "quilt/collections/LibraryLock.h"
+#include "quilt/platform/base/Paths.h"
 #include "quilt/platform/interfaces/Services.h"
 #include "quilt/themes/QuiltThemesController.h"
 
@@ -32,6 +34,11 @@ QString nameOf(const QuiltDocument& document) {
 Problem problem(const QString& what, const LogLines& log, const QString& advice) {
   const QString cause = toQt(log.cause());
   return {cause.isEmpty() ? what + "." : what + ": " + sentence(cause), advice};
+}
+
+/// What somebody else has locked.
+Problem inUse(const QString& what, const quilt::platform::Error& refusal) {
+  return {what + ": " + sentence(toQt(refusal.text)), tr("Wait until the other program has ended, and try again.")};
 }
 
 enum class Kind { Document, Item, Neither };
@@ -112,6 +119,12 @@ Problems moveDocuments(const quilt::QuiltCollectionsController& library, const s
       }
       const Path package = document->path();
       const Path target = to->path() / package.filename();
+      const auto lock = quilt::LibraryLock::ofDocument(package);
+      const auto targetLock = quilt::LibraryLock::ofDocument(target);
+      if (!lock || !targetLock) {
+        problems.push_back(inUse(what, (lock ? targetLock : lock).error()));
+        continue;
+      }
       if (const auto moved = services().files->moveItem(package, target); !moved) {
         problems.push_back(
             {what + ": " + sentence(toQt(moved.error().text)), tr("Check the disk that the library is on.")});
@@ -149,7 +162,14 @@ Problems importFiles(const std::shared_ptr<QuiltCollection>& collection, const s
       continue;
     }
     const LogLines log;
-    const auto document = collection->importDocumentFromPath(file, part);
+    const std::string uuid = quilt::platform::generateUUID();
+    const auto lock = quilt::LibraryLock::ofDocument(
+        collection->path() / quilt::platform::withExtension(uuid, quilt::kQuiltDocumentExtension));
+    if (!lock) {
+      problems.push_back(inUse(tr("“%1” was not imported").arg(nameOf(file)), lock.error()));
+      continue;
+    }
+    const auto document = collection->importDocumentFromPath(file, uuid, part);
     if (!part(100)) return problems;
     if (!document) {
       problems.push_back(problem(tr("“%1” was not imported").arg(nameOf(file)), log,
@@ -182,6 +202,8 @@ Problems importFiles(const std::shared_ptr<QuiltCollection>& collection, const s
 
 Problems addFiles(const std::shared_ptr<QuiltDocument>& document, const std::vector<Path>& files,
                   const ProgressionBlock& block) {
+  const auto lock = quilt::LibraryLock::ofDocument(document->path());
+  if (!lock) return {inUse(tr("Nothing was added to “%1”").arg(nameOf(*document)), lock.error())};
   Problems problems;
   std::size_t done = 0;
   for (const Path& file : files) {
@@ -203,6 +225,8 @@ Problems addFiles(const std::shared_ptr<QuiltDocument>& document, const std::vec
 
 Exported exportDocument(const std::shared_ptr<QuiltDocument>& document, const Path& folder, const std::string& format,
                         const ProgressionBlock& block) {
+  const auto lock = quilt::LibraryLock::ofDocument(document->path());
+  if (!lock) return {{}, {inUse(tr("“%1” was not exported").arg(nameOf(*document)), lock.error())}};
   const LogLines log;
   bool isCancelled = false;
   const auto untilCancelled = [&](double percentage) {

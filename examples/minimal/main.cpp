@@ -21,6 +21,10 @@ int main(int count, char** arguments) {
     const quilt::Path file = absolute(paths[1]);
     if (!quilt::QuiltDocument::canImportFromPath(file))
       return void(std::cerr << file.native() << " is not there, or is no movie, sound, PDF or EPUB\n");
+    create_directories(absolute(paths[0]));
+    // Nobody else changes the library meanwhile; who does so now is waited for.
+    const auto lock = quilt::LibraryLock::ofLibrary(absolute(paths[0]), {std::chrono::seconds(10)});
+    if (!lock) return void(std::cerr << paths[0].native() << ": " << lock.error().text << '\n');
     const auto library = quilt::QuiltCollectionsController::defaultController();
     if (!library->loadLibraryPath(absolute(paths[0]), {})) return;
     auto collection = library->collectionAtIndex(0);

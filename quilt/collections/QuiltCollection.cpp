@@ -9,6 +9,7 @@
 #include "quilt/collections/QuiltCollectionsController.h"
 #include "quilt/platform/base/FDYLogger.h"
 #include "quilt/platform/interfaces/Services.h"
+#include "quilt/sources/SavedRecord.h"
 
 namespace quilt {
 
@@ -40,7 +41,7 @@ std::string fullDescription(const platform::Error& error) {
 
 }  // namespace
 
-QuiltCollection::QuiltCollection() = default;
+QuiltCollection::QuiltCollection() : _saved(std::make_shared<SavedRecord>()) {}
 
 // Construction
 
@@ -62,6 +63,7 @@ std::shared_ptr<QuiltCollection> QuiltCollection::initWithPath(const Path& path)
     collection->removeAllBrokenDocuments();
     return collection;
   }
+  collection->_saved->noteNothing();
   if (const Result<void> made = files.createDirectoryAtPath(path); !made) {
     FDYLogger::logCritical("Failed to create collection at path \"%@\": \"%@\"", path, made.error());
     return nullptr;
@@ -73,10 +75,16 @@ std::shared_ptr<QuiltCollection> QuiltCollection::initWithPath(const Path& path)
   return collection;
 }
 
+std::shared_ptr<QuiltCollection> QuiltCollection::initWithPathAlone(const Path& path) {
+  auto collection = init();
+  collection->setPath(path);
+  return collection->loadDictionary() ? collection : nullptr;
+}
+
 void QuiltCollection::saveWhenChanged() {
   for (const std::string_view key : kSavedProperties)
     _observations.push_back(observe(key, [this](const platform::ChangeNotice&) {
-      if (!isLoading()) update();
+      if (!isLoading() && _takingOver != platform::currentThreadIdentity()) update();
     }));
 }
 
@@ -127,13 +135,21 @@ void QuiltCollection::resetModifiedDate() {
 // Loading and saving
 
 bool QuiltCollection::loadDictionary() {
+  const platform::FileIdentity identity = SavedRecord::identityOf(_collectionFilepath());
   const Result<Dictionary> read = services().propertyLists->readDictionary(_collectionFilepath());
   if (!read) {
     FDYLogger::logWarning("Failed to load collection at path \"%@\": \"Collection dictionary is invalid\"", path());
     return false;
   }
-  const Dictionary& record = *read;
   setIsLoading(true);
+  apply(*read);
+  _unknownEntries.store(platform::entriesBeyond(kRecordKeys, *read));
+  _saved->note(*read, identity);
+  setIsLoading(false);
+  return true;
+}
+
+void QuiltCollection::apply(const Dictionary& record) {
   if (const Text uuid = record.string("UUID")) setUuid(*uuid);
   if (const auto date = record.date("CreationDate")) setCreationDate(date);
   if (const auto date = record.date("ModifiedDate")) setModifiedDate(date);
@@ -147,9 +163,6 @@ bool QuiltCollection::loadDictionary() {
   if (const Text themePath = record.string("PreferredThemePath"))
     if (auto theme = QuiltTheme::initWithPath(*themePath)) setPreferredTheme(std::move(theme));
   if (const Text text = record.string("LastPublishURL")) setLastPublishURL(text);
-  _unknownEntries.store(platform::entriesBeyond(kRecordKeys, record));
-  setIsLoading(false);
-  return true;
 }
 
 bool QuiltCollection::_loadDocuments() {
@@ -195,30 +208,104 @@ Dictionary QuiltCollection::dictionary() const {
   return record;
 }
 
-bool QuiltCollection::update() {
+bool QuiltCollection::update(ConflictChoice inConflict) {
   if (isLoading()) return true;
   setModifiedDate(services().clock->now());
 
   const Path file = _collectionFilepath();
-  Dictionary record;
-  std::uint64_t turn = 0;
-  try {
-    const platform::MonitorLock lock = _documents.lock();
-    turn = ++_recordsBuilt;
-    record = dictionary();
-  } catch (const std::bad_alloc&) {
-    FDYLogger::logCritical("Failed to update collection at path \"%@\".", file);
-    return false;
-  }
-
-  // Threads that save at once may arrive here in any order; the newest record must be the one that stays.
-  const std::lock_guard guard(_saving);
-  if (turn < _newestSaved) return true;
-  if (file.empty() || !services().propertyLists->writeDictionary(record, file)) {
+  const auto fail = [&file] {
     FDYLogger::logCritical("Failed to update collection at path \"%@\"", file);
     return false;
+  };
+  constexpr int kAttempts = 20;  // each is one more hand that was faster
+  for (int attempt = 0; attempt < kAttempts; ++attempt) {
+    Dictionary record;
+    std::uint64_t turn = 0;
+    try {
+      const platform::MonitorLock lock = _documents.lock();
+      turn = ++_recordsBuilt;
+      record = dictionary();
+    } catch (const std::bad_alloc&) {
+      FDYLogger::logCritical("Failed to update collection at path \"%@\".", file);
+      return false;
+    }
+    {
+      // Threads that save at once may arrive here in any order; the newest record must be the one that stays.
+      const std::lock_guard guard(_saving);
+      if (turn < _newestSaved) return true;
+      const Result<void> written = write(record, file);
+      if (written) {
+        _newestSaved = turn;
+        return true;
+      }
+      if (written.error().kind != platform::ErrorKind::Changed) return fail();
+    }
+    if (!takeOverChanges(record, inConflict)) return fail();
   }
-  _newestSaved = turn;
+  return fail();
+}
+
+Result<void> QuiltCollection::write(const Dictionary& record, const Path& file) {
+  if (file.empty()) return platform::Error{platform::ErrorKind::NotFound, "The collection has no folder", file};
+  if (_saved->isKnown()) {
+    const auto written = services().propertyLists->replaceDictionary(record, file, _saved->identity());
+    if (!written) return written.error();
+    _saved->note(record, *written);
+    return {};
+  }
+  const Result<void> written = services().propertyLists->writeDictionary(record, file);
+  if (written) _saved->note(record, SavedRecord::identityOf(file));
+  return written;
+}
+
+bool QuiltCollection::takeOverChanges(const Dictionary& mine, ConflictChoice inConflict) {
+  const Path file = _collectionFilepath();
+  const auto refuse = [&file](const std::string& what) {
+    FDYLogger::logCritical(
+        "Failed to update collection at path \"%@\": \"Another program has changed %@ since it was read; nothing is "
+        "overwritten\"",
+        file, what);
+    return false;
+  };
+  const platform::FileIdentity identity = SavedRecord::identityOf(file);
+  if (identity == platform::FileIdentity{}) {  // taken away: there is nothing to overwrite
+    _saved->noteNothing();
+    return true;
+  }
+  const Result<Dictionary> theirs = services().propertyLists->readDictionary(file);
+  if (!theirs) {
+    if (inConflict != ConflictChoice::KeepMine) return refuse("the whole record");
+    _saved->note({}, identity);
+    return true;
+  }
+  const RecordMerge merge = _saved->merge(mine, *theirs, inConflict);
+  if (!merge.conflicts.empty()) {
+    std::string all;
+    for (const std::string& conflict : merge.conflicts) all += (all.empty() ? "" : ", ") + conflict;
+    return refuse(all);
+  }
+  if (merge.takesOver())
+    FDYLogger::logWarning("Another program has changed the collection at path \"%@\": its changes are kept", path());
+  const platform::ThreadIdentity before = _takingOver.exchange(platform::currentThreadIdentity());
+  apply(merge.theirs);
+  Dictionary unknown = _unknownEntries.get();
+  for (const auto& [key, value] : platform::entriesBeyond(kRecordKeys, merge.theirs)) unknown.set(key, value);
+  for (const std::string& key : merge.removed) {
+    if (key == "CreationDate") setCreationDate(std::nullopt);
+    if (key == "Title") setTitle(std::nullopt);
+    if (key == "Description") setDescription(std::nullopt);
+    if (key == "Author") setAuthor(std::nullopt);
+    if (key == "Copyright") setCopyright(std::nullopt);
+    if (key == "Keywords") setKeywords(std::nullopt);
+    if (key == "Category") setCategory(std::nullopt);
+    if (key == "AdvisoryLabel") setAdvisoryLabel(std::nullopt);
+    if (key == "PreferredThemePath") setPreferredTheme(nullptr);
+    if (key == "LastPublishURL") setLastPublishURL(std::nullopt);
+    unknown.remove(key);
+  }
+  _unknownEntries.store(std::move(unknown));
+  _takingOver = before;
+  _saved->note(*theirs, identity);
   return true;
 }
 

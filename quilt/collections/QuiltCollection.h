@@ -1,16 +1,19 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <atomic>
 #include <cstdint>
 #include <mutex>
 #include <set>
 
 #include "quilt/documents/QuiltDocument.h"
 #include "quilt/platform/base/Export.h"
+#include "quilt/sources/ConflictChoice.h"
 
 namespace quilt {
 
 class QuiltCollectionsController;
+class SavedRecord;
 
 /// A folder of documents under one title and one set of default metadata. Owned by the controller, or free-standing.
 /// Any thread may call it; the document list has a recursive lock.
@@ -23,8 +26,13 @@ class QUILT_EXPORT QuiltCollection : public platform::Object {
   /// A detached collection: fresh identity, made now, no folder.
   static std::shared_ptr<QuiltCollection> init();
   /// Opens the folder with its documents, or makes it when nothing is there. Null when that fails; the reason is
-  /// logged.
+  /// logged. Broken documents are removed, as removeAllBrokenDocuments() does: this is for a host that loads a library,
+  /// and holds its lock (LibraryLock) meanwhile.
   static std::shared_ptr<QuiltCollection> initWithPath(const Path& path);
+  /// Opens the folder and leaves its documents alone: reads the collection file, and opens, makes and removes nothing
+  /// else. openDocument() opens the documents that are wanted. Null when there is no collection file to read; the
+  /// reason is logged.
+  static std::shared_ptr<QuiltCollection> initWithPathAlone(const Path& path);
 
   // Properties
   /// Names the folder in its library.
@@ -98,8 +106,16 @@ class QUILT_EXPORT QuiltCollection : public platform::Object {
   bool _loadDocuments();
   /// The record as it is written, with the entries that a newer version left in it.
   Dictionary dictionary() const;
+  /// @{
   /// Stamps and saves; true without saving while loading. False after a critical line.
-  bool update();
+  ///
+  /// A collection file that another hand has written since this collection last read or wrote it is not overwritten:
+  /// what only one of the two changed is kept, the other's being taken over into this collection, with a warning; what
+  /// both changed is decided by the choice, and refused with a critical line that names it when the choice, or an
+  /// automatic save, is to refuse.
+  bool update() { return update(ConflictChoice::Refuse); }
+  bool update(ConflictChoice inConflict);
+  /// @}
   /// Whether modifiedDate and creationDate are a second or more apart.
   bool hasBeenModified() const;
   /// Makes the collection count as never modified, as far as its documents do, and saves.
@@ -124,6 +140,9 @@ class QUILT_EXPORT QuiltCollection : public platform::Object {
   bool performBlockOnDocuments(const std::function<bool(const std::shared_ptr<QuiltDocument>&)>& block) const;
   /// At most `count`, newest first.
   std::vector<std::shared_ptr<QuiltDocument>> lastCreatedDocuments(std::size_t count) const;
+  /// The document of that package in the folder: the one in the list, else opened now and added. Null when it is not
+  /// there or does not open, the reason being logged. Makes and removes nothing.
+  std::shared_ptr<QuiltDocument> openDocument(const Path& package);
   /// Attaches and appends it. Its package is not moved. Null is ignored.
   void addDocument(const std::shared_ptr<QuiltDocument>& document);
   /// Takes the document out of the list; with `andDelete` also deletes its package. A package that cannot be deleted,
@@ -131,8 +150,9 @@ class QUILT_EXPORT QuiltCollection : public platform::Object {
   void removeDocument(const std::shared_ptr<QuiltDocument>& document, bool andDelete);
   /// removeDocument() for each that is there now.
   void removeAllDocumentsAndDelete(bool andDelete);
-  /// Takes out the classic documents that hold no media and deletes their packages. A package whose record names media
-  /// that did not load is damaged, not empty: it stays on disk.
+  /// Takes out the classic documents that hold no media and deletes their packages, each with a warning that names it.
+  /// One with files below "media", a poster or a description is damaged or unfinished, not empty: it stays, in the list
+  /// and on disk, with a warning; and one whose record names media that did not load stays on disk.
   void removeAllBrokenDocuments();
   /// Makes and saves an empty document with the collection's author and theme. Null after a critical line.
   std::shared_ptr<QuiltDocument> newDocumentWithType(const Text& type);
@@ -152,6 +172,12 @@ class QUILT_EXPORT QuiltCollection : public platform::Object {
 
  private:
   void saveWhenChanged();
+  void apply(const Dictionary& record);
+  /// Changed when another hand was faster.
+  platform::Result<void> write(const Dictionary& record, const Path& file);
+  /// Takes over what another hand wrote into the collection file, so that `mine`, the record made anew, replaces it.
+  /// False, after a critical line, when nothing may be written.
+  bool takeOverChanges(const Dictionary& mine, ConflictChoice inConflict);
   /// A place in the folder; empty without one.
   Path inFolder(const std::string& name) const;
   /// Where the package of that identity belongs; empty without a folder or for an identity that is no plain name.
@@ -182,10 +208,12 @@ class QUILT_EXPORT QuiltCollection : public platform::Object {
   platform::WeakProperty<QuiltCollectionsController> _collectionControllerOwner{*this, "collectionControllerOwner"};
   platform::Property<bool> _isLoading{*this, "isLoading"};
   platform::Property<Dictionary> _unknownEntries{*this, "unknownEntries"};
-  std::uint64_t _recordsBuilt = 0;                   // guarded by the document list's lock
-  std::mutex _saving;                                // nothing else is locked under it
-  std::uint64_t _newestSaved = 0;                    // the turn of the record on disk; guarded by _saving
-  std::vector<platform::Observation> _observations;  // last: ends before the properties do
+  std::uint64_t _recordsBuilt = 0;  // guarded by the document list's lock
+  std::mutex _saving;               // nothing else is locked under it
+  std::uint64_t _newestSaved = 0;   // the turn of the record on disk; guarded by _saving
+  const std::shared_ptr<SavedRecord> _saved;
+  std::atomic<platform::ThreadIdentity> _takingOver{nullptr};  // while what another hand wrote is set
+  std::vector<platform::Observation> _observations;            // last: ends before the properties do
 };
 
 }  // namespace quilt

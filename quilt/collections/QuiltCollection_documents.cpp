@@ -62,6 +62,32 @@ bool recordNamesMedia(const QuiltDocument& document) {
   return media ? !media->empty() : record->contains("Media");
 }
 
+bool holdsFile(const Path& folder) {
+  const platform::FileManager& files = *services().files;
+  std::vector<Path> pending{folder};
+  while (!pending.empty()) {
+    const Path item = std::move(pending.back());
+    pending.pop_back();
+    const platform::FileKind kind = files.kindOfItemAtPath(item);
+    if (kind == platform::FileKind::Missing) continue;  // a link that leads nowhere
+    if (kind != platform::FileKind::Folder) return true;
+    // What cannot be looked into may hold something.
+    const auto names = files.contentsOfDirectoryAtPath(item);
+    if (!names) return true;
+    if (!files.isConfined(item, folder.parent_path())) continue;  // what a link leads to is somebody else's
+    for (const std::string& name : *names) pending.push_back(item / name);
+  }
+  return false;
+}
+
+/// Whether somebody put work into a document without media: then it is damaged or unfinished, not empty.
+bool holdsWork(const QuiltDocument& document) {
+  if (document.path().empty()) return false;
+  const Text description = document.description();
+  return (description && !description->empty()) || services().files->fileExistsAtPath(document.posterImagePath()) ||
+         (services().files->fileExistsAtPath(document.mediaFolderPath()) && holdsFile(document.mediaFolderPath()));
+}
+
 }  // namespace
 
 // Reading the list
@@ -95,6 +121,22 @@ std::vector<std::shared_ptr<QuiltDocument>> QuiltCollection::lastCreatedDocument
 
 // Changing the list
 
+std::shared_ptr<QuiltDocument> QuiltCollection::openDocument(const Path& package) {
+  const Path place = platform::standardizedPath(package);
+  const platform::MonitorLock lock = _documents.lock();
+  const auto held = _documents.first([&place](const auto& document) { return document->path() == place; });
+  if (held) return held;
+  const bool isHere = place.parent_path() == platform::standardizedPath(path());
+  if (!isHere || services().files->kindOfItemAtPath(place) != platform::FileKind::Folder) {
+    FDYLogger::logWarning("Failed to open document at path \"%@\": \"There is no such package in the collection\"",
+                          place);
+    return nullptr;
+  }
+  const auto document = QuiltDocument::initWithPath(place);
+  addDocument(document);
+  return document;
+}
+
 void QuiltCollection::addDocument(const std::shared_ptr<QuiltDocument>& document) { _documents.append(document); }
 
 void QuiltCollection::removeDocument(const std::shared_ptr<QuiltDocument>& document, bool andDelete) {
@@ -118,8 +160,20 @@ void QuiltCollection::removeAllDocumentsAndDelete(bool andDelete) {
 
 void QuiltCollection::removeAllBrokenDocuments() {
   const platform::MonitorLock lock = _documents.lock();
-  for (const auto& document : documents())
-    if (document->isClassic() && document->mediaCount() == 0) removeDocument(document, !recordNamesMedia(*document));
+  for (const auto& document : documents()) {
+    if (!document->isClassic() || document->mediaCount() != 0) continue;
+    if (recordNamesMedia(*document)) {
+      FDYLogger::logWarning("Left the damaged document at path \"%@\" out: none of its media can be read",
+                            document->path());
+      removeDocument(document, false);
+    } else if (holdsWork(*document)) {
+      FDYLogger::logWarning("Kept the document at path \"%@\" without media: it has a description, a poster or files",
+                            document->path());
+    } else {
+      FDYLogger::logWarning("Removed the empty document at path \"%@\"", document->path());
+      removeDocument(document, true);
+    }
+  }
 }
 
 // Making documents

@@ -9,6 +9,7 @@
 #include "quilt/platform/base/Paths.h"
 #include "quilt/platform/interfaces/Services.h"
 #include "quilt/sources/ModelFiles.h"
+#include "quilt/sources/SavedRecord.h"
 
 namespace quilt {
 
@@ -46,7 +47,7 @@ platform::Result<Dictionary> readPropertiesOf(const Path& package, const Path& f
 
 // ---- Construction
 
-QuiltDocument::QuiltDocument() {
+QuiltDocument::QuiltDocument() : _saved(std::make_shared<SavedRecord>()) {
   _uuid.store(platform::generateUUID());
   for (const char* key : kObservedKeys) {
     _observations.push_back(observe(key, [this](const platform::ChangeNotice& notice) {
@@ -71,6 +72,7 @@ std::shared_ptr<QuiltDocument> QuiltDocument::initWithPath(const Path& path) {
     return nullptr;
   }
   const Date now = services().clock->now();
+  document->_saved->noteNothing();
   // Stored, not set: a setter would save, and an empty package has no properties file until it is first changed.
   document->_creationDate.store(now);
   document->_modifiedDate.store(now);
@@ -160,6 +162,7 @@ bool QuiltDocument::readProperties(const Path& file) {
     FDYLogger::logWarning("Failed to open document at path \"%@\": \"Properties file cannot be found\"", path());
     return false;
   }
+  const platform::FileIdentity identity = SavedRecord::identityOf(file);
   auto record = readPropertiesOf(path(), file);
   // Media of a wrong kind is damage, not an empty list: opening it as empty would lose the items at the next save.
   const auto isUsable = [](const Dictionary& dictionary) {
@@ -170,6 +173,7 @@ bool QuiltDocument::readProperties(const Path& file) {
     return false;
   }
   if (record->string("Version") != kFormatVersion) return false;
+  if (file == platform::standardizedPath(propertiesPath())) _saved->note(*record, identity);
   apply(*std::move(record));
   return true;
 }
@@ -244,11 +248,27 @@ Dictionary QuiltDocument::dictionary() {
   return record;
 }
 
-bool QuiltDocument::writeProperties() {
-  // First, and also without a file to write to: the record gives an untitled document its title.
-  const Dictionary record = dictionary();
-  const Path file = propertiesPath();
-  return !file.empty() && services().propertyLists->writeDictionary(record, file);
+bool QuiltDocument::writeProperties(ConflictChoice inConflict) {
+  constexpr int kAttempts = 20;  // each is one more hand that was faster
+  for (int attempt = 0; attempt < kAttempts; ++attempt) {
+    // First, and also without a file to write to: the record gives an untitled document its title.
+    Dictionary record = dictionary();
+    const Path file = propertiesPath();
+    if (file.empty()) return false;
+    if (!_saved->isKnown()) {
+      if (!services().propertyLists->writeDictionary(record, file)) return false;
+      _saved->note(record, SavedRecord::identityOf(file));
+      return true;
+    }
+    const auto written = services().propertyLists->replaceDictionary(record, file, _saved->identity());
+    if (written) {
+      _saved->note(record, *written);
+      return true;
+    }
+    if (written.error().kind != platform::ErrorKind::Changed) return false;
+    if (!takeOverChanges(std::move(record), inConflict)) return false;
+  }
+  return false;
 }
 
 bool QuiltDocument::isBusy() const {
@@ -269,17 +289,17 @@ std::optional<platform::MonitorLock> QuiltDocument::beginProcessing() {
   return lock;
 }
 
-bool QuiltDocument::update() {
-  const std::optional<bool> saved = saveUnlessBusy();
+bool QuiltDocument::update(ConflictChoice inConflict) {
+  const std::optional<bool> saved = saveUnlessBusy(inConflict);
   if (!saved)
     FDYLogger::logCritical("Failed to update document at path \"%@\": \"Document is already being processed\"",
                            propertiesPath());
   return saved.value_or(false);
 }
 
-void QuiltDocument::saveChange() { saveUnlessBusy(); }
+void QuiltDocument::saveChange() { saveUnlessBusy(ConflictChoice::Refuse); }
 
-std::optional<bool> QuiltDocument::saveUnlessBusy() {
+std::optional<bool> QuiltDocument::saveUnlessBusy(ConflictChoice inConflict) {
   if (isBusy()) return std::nullopt;
   const auto lock = _media.lock();
   // Known before the document is processing, so that no thread takes this save for a long operation.
@@ -288,7 +308,7 @@ std::optional<bool> QuiltDocument::saveUnlessBusy() {
   bool written = false;
   if (isFree) {
     setModifiedDate(services().clock->now());
-    written = writeProperties();
+    written = writeProperties(inConflict);
     if (!written)
       FDYLogger::logCritical("Failed to update document at path \"%@\": \"Properties cannot be written\"",
                              propertiesPath());

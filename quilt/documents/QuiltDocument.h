@@ -8,6 +8,7 @@
 #include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/MainThread.h"
 #include "quilt/platform/base/Property.h"
+#include "quilt/sources/ConflictChoice.h"
 #include "quilt/sources/ModelTypes.h"
 #include "quilt/sources/Representations.h"
 #include "quilt/themes/QuiltTheme.h"
@@ -15,6 +16,8 @@
 namespace quilt {
 
 class QuiltCollection;
+class SavedRecord;
+struct RecordMerge;
 
 /// @{
 /// Document types, compared by string equality: a package built from a theme; one movie; one sound; one PDF; one EPUB;
@@ -142,9 +145,18 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
   bool loadDictionaryAtPath(const Path& path);
   /// The properties record. Gives the document its fall-back title when it has none.
   Dictionary dictionary();
+  /// @{
   /// Stamps modifiedDate and saves. False, after a critical line, while processing or when the file cannot be written.
   /// Waits for a save that another thread has begun.
-  bool update();
+  ///
+  /// A record that another hand has written since this document last read or wrote it is not overwritten: what only one
+  /// of the two changed is kept, the other's being taken over into this document, with a warning; what both changed is
+  /// decided by the choice, and refused with a critical line that names it when the choice is to refuse. Fields are
+  /// told apart by their keys, items by their UUIDs; an item that the other hand changed is a new object here. So it is
+  /// with every save, automatic ones and those of long operations included, which refuse.
+  bool update() { return update(ConflictChoice::Refuse); }
+  bool update(ConflictChoice inConflict);
+  /// @}
   /// The automatic save after a change: update() without its refusal, because a long operation may begin at any moment
   /// between the change and its save.
   void saveChange();
@@ -284,9 +296,13 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
   std::string displayTitle() const;
   bool readProperties(const Path& file);
   void apply(Dictionary record);
-  bool writeProperties();
+  bool writeProperties(ConflictChoice inConflict = ConflictChoice::Refuse);
+  /// Takes over what another hand wrote into the properties file, so that `mine`, the record made anew, replaces it.
+  /// False, after a critical line, when nothing may be written.
+  bool takeOverChanges(Dictionary mine, ConflictChoice inConflict);
+  void takeOver(const RecordMerge& merge, const std::vector<std::shared_ptr<QuiltMedia>>& media);
   /// What update() does; none, and nothing logged, while busy.
-  std::optional<bool> saveUnlessBusy();
+  std::optional<bool> saveUnlessBusy(ConflictChoice inConflict);
   /// Sets isProcessing and answers the media lock, or none while busy. Waits for another thread's save.
   std::optional<platform::MonitorLock> beginProcessing();
   enum class Outcome { Done, Failed, Cancelled };
@@ -320,6 +336,7 @@ class QUILT_EXPORT QuiltDocument : public platform::Object, public ImageBrowserI
   platform::WeakProperty<QuiltCollection> _collectionOwner{*this, "collectionOwner"};
   std::atomic<platform::ThreadIdentity> _savingThread{nullptr};  // while update() runs
   Dictionary _unknownEntries;
+  const std::shared_ptr<SavedRecord> _saved;
   std::vector<platform::Observation> _observations;  // last: ends before the properties do
 };
 

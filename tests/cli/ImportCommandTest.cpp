@@ -5,7 +5,6 @@
 #include <fstream>
 #include <set>
 
-#include "quilt/platform/base/TemporaryNames.h"
 #include "tests/support/MediaFixtures.h"
 #include "tests/support/QuiltProgram.h"
 
@@ -248,6 +247,14 @@ class StoppedImportTest : public ImportCommandTest {
     return files;
   }
 
+  /// Everything hidden in the library.
+  std::vector<std::string> hiddenFiles() const {
+    std::vector<std::string> files;
+    for (const auto& item : std::filesystem::recursive_directory_iterator(library()))
+      if (item.path().filename().native().starts_with('.')) files.push_back(item.path());
+    return files;
+  }
+
   void expectNothingLeft() const { EXPECT_FALSE(std::filesystem::exists(library())) << copiedFiles().size(); }
 };
 
@@ -279,22 +286,37 @@ TEST_F(StoppedImportTest, ALibraryThatWasThereIsAsItWas) {
   EXPECT_EQ(130, program->wait().exit);
   EXPECT_EQ(before, listed());
   EXPECT_EQ(packages, namesOfPackages());
-  EXPECT_FALSE(std::filesystem::exists(library() / ".quilt-lock"));
+  EXPECT_THAT(hiddenFiles(), IsEmpty());
 }
 
-TEST_F(StoppedImportTest, AnotherWriterIsRefusedAndReadersAreNot) {
+TEST_F(StoppedImportTest, ItsCollectionCannotBeRemovedMeanwhileAndAllElseGoesOn) {
   const auto program = startBigImport();
   program->signal(SIGSTOP);
-  const Ended refused = quilt({"new", "collection", "Talks"});
+  const Ended refused = quilt({"remove", "Imports", "--force"});
   EXPECT_EQ(6, refused.exit);
   EXPECT_THAT(refused.err, HasSubstr("is in use by process "));
-  EXPECT_EQ("locked", quiltJson({"import", movie()}, 6)["error"]["code"]);
+  EXPECT_EQ("locked", quiltJson({"remove", "Imports", "--force"}, 6)["error"]["code"]);
   EXPECT_EQ(0, quilt({"list"}).exit);
-  EXPECT_EQ(0, quilt({"new", "collection", "Talks", "--dry-run"}).exit);
+  EXPECT_EQ(0, quilt({"import", movie()}).exit);
+  EXPECT_EQ(0, quilt({"set", "Imports", "author=Ada"}).exit);
+  EXPECT_EQ(0, quilt({"new", "collection", "Plans", "--dry-run"}).exit);
   program->signal(SIGCONT);
   program->signal(SIGINT);
   EXPECT_EQ(130, program->wait().exit);
   EXPECT_EQ(0, quilt({"new", "collection", "Talks"}).exit);
+}
+
+TEST_F(StoppedImportTest, WhatOthersPutIntoTheLibraryThatItMadeStays) {
+  const auto program = startBigImport();
+  program->signal(SIGSTOP);
+  ASSERT_EQ(0, quilt({"new", "document", "Talk"}).exit);  // in the collection that the import has made
+  write(library() / "notes.txt", "mine");
+  program->signal(SIGCONT);
+  program->signal(SIGINT);
+  EXPECT_EQ(130, program->wait().exit);
+  EXPECT_EQ("mine", read(library() / "notes.txt"));
+  EXPECT_EQ(0, quilt({"show", "Talk"}).exit);
+  EXPECT_EQ(1U, namesOfPackages().size());
 }
 
 TEST_F(StoppedImportTest, TheLockOfAKilledWriterIsTakenOverAndItsTemporariesGo) {
@@ -302,8 +324,7 @@ TEST_F(StoppedImportTest, TheLockOfAKilledWriterIsTakenOverAndItsTemporariesGo) 
   program->signal(SIGKILL);
   EXPECT_EQ(-SIGKILL, program->wait().exit);
   EXPECT_EQ(0, quilt({"new", "collection", "Talks"}).exit);
-  for (const auto& item : std::filesystem::recursive_directory_iterator(library()))
-    EXPECT_FALSE(platform::isHiddenTemporaryName(item.path().filename().native())) << item.path();
+  EXPECT_THAT(hiddenFiles(), IsEmpty());
 }
 
 }  // namespace

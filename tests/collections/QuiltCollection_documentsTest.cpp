@@ -36,6 +36,7 @@ using ::testing::Ge;
 using ::testing::IsEmpty;
 using ::testing::Le;
 using ::testing::SizeIs;
+using ::testing::UnorderedElementsAre;
 
 class FailingDocumentFiles final : public platform::ForwardingFileManager {
  public:
@@ -354,7 +355,10 @@ TEST_F(QuiltCollectionDocumentsTest, AClassicPackageWithoutMediaIsLostFromDiskWh
   ASSERT_TRUE(loaded);
   EXPECT_EQ(loaded->documentsCount(), 2u);
   EXPECT_THAT(packages(), ElementsAre("paper.qpk", "plain.qpk"));
-  EXPECT_THAT(takeProblems(), IsEmpty());
+  EXPECT_THAT(
+      takeProblems(),
+      UnorderedElementsAre(warning("Removed the empty document at path \"" + packageOf("movie").native() + "\""),
+                           warning("Removed the empty document at path \"" + packageOf("audio").native() + "\"")));
 }
 
 TEST_F(QuiltCollectionDocumentsTest, APackageWithADamagedMediaListDoesNotLoadAndStaysOnDisk) {

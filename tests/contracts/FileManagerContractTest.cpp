@@ -407,11 +407,21 @@ TEST_P(FileManagerContract, ALockShutsOutTheNextUntilItEnds) {
   ASSERT_FALSE(second);
   EXPECT_EQ(ErrorKind::Locked, second.error().kind);
   EXPECT_THAT(second.error().text, HasSubstr("pid 123 on host"));
-  EXPECT_EQ("pid 123 on host", readPlainly(scratch / "lock"));
+  EXPECT_THAT(readPlainly(scratch / "lock"), HasSubstr("pid 123 on host"));
   lock->reset();
   const auto third = files->lockFile(scratch / "lock", "me");
   ASSERT_TRUE(third);
-  EXPECT_EQ("me", readPlainly(scratch / "lock"));
+  EXPECT_THAT(readPlainly(scratch / "lock"), HasSubstr("me"));
+}
+
+TEST_P(FileManagerContract, ASharedLockShutsOutWhoWantsItAloneUntilTheLastEnds) {
+  auto one = files->shareLockFile(scratch / "lock", nullptr);
+  auto other = files->shareLockFile(scratch / "lock", nullptr);
+  ASSERT_TRUE(one && other);
+  one->reset();
+  EXPECT_EQ(ErrorKind::Locked, files->lockFile(scratch / "lock", "me").error().kind);
+  other->reset();
+  EXPECT_TRUE(files->lockFile(scratch / "lock", "me"));
 }
 
 TEST_P(FileManagerContract, OddNamesAreOnlyNames) {

@@ -84,4 +84,9 @@ Result<std::unique_ptr<platform::FileLock>> SimpleFiles::lockFile(const std::fil
   return refused(path);
 }
 
+Result<std::unique_ptr<platform::FileLock>> SimpleFiles::shareLockFile(const std::filesystem::path& path,
+                                                                       const std::function<void()>&) {
+  return refused(path);
+}
+
 }  // namespace quilt::support

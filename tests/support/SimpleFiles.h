@@ -37,6 +37,8 @@ class SimpleFiles final : public platform::FileManager {
   platform::Result<void> writeAtomically(const std::filesystem::path& path, std::string_view bytes) override;
   platform::Result<std::unique_ptr<platform::FileLock>> lockFile(const std::filesystem::path& path,
                                                                  std::string_view owner) override;
+  platform::Result<std::unique_ptr<platform::FileLock>> shareLockFile(
+      const std::filesystem::path& path, const std::function<void()>& afterKilled) override;
 };
 
 }  // namespace quilt::support

@@ -17,6 +17,7 @@ enum class ErrorKind {
   Unsupported,       ///< well-formed, but nothing here handles it
   Cancelled,         ///< the caller asked to stop
   Locked,            ///< another process holds it
+  Changed,           ///< another hand was faster: it is no longer as the caller knew it
   Unsafe,            ///< refused because it would reach outside the folder that owns it
 };
 

@@ -2,10 +2,13 @@
 #include "quilt/platform/files/PosixFileManager.h"
 
 #include <fcntl.h>
+#include <sys/file.h>
 #include <sys/stat.h>
 
 #include <algorithm>
 #include <cerrno>
+#include <chrono>
+#include <thread>
 #include <utility>
 
 #include "quilt/platform/files/Folders.h"
@@ -54,6 +57,52 @@ int makeFolder(SystemCalls& system, const fs::path& path) {
   return syncFolder(system, place.folder.number());
 }
 
+FileIdentity identityOf(const struct stat& status) {
+  return {status.st_dev, status.st_ino, static_cast<std::uint64_t>(status.st_size), nanoseconds(status.st_ctim)};
+}
+
+// Of what is there now, links followed. Opening it asks a network file system's server, where a mere look may be
+// answered from what was known half a minute ago.
+FileIdentity identityAt(SystemCalls& system, const Place& place) {
+  struct stat status {};
+  const Descriptor file(system.openAt(place.folder.number(), place.name.c_str(), O_RDONLY | O_NONBLOCK, 0));
+  const bool isKnown = file ? ::fstat(file.number(), &status) == 0
+                            : ::fstatat(place.folder.number(), place.name.c_str(), &status, 0) == 0;
+  // What is no file is no state of one: it stands in the way, and writing says so.
+  return isKnown && S_ISREG(status.st_mode) ? identityOf(status) : FileIdentity{};
+}
+
+// Whoever holds it is about to write one file. One that hangs, or a folder that cannot be locked, keeps nobody.
+void lockForAMoment(SystemCalls& system, int folder) {
+  const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(2);
+  while (system.setWholeLock(folder, LOCK_EX | LOCK_NB) != 0 && errno == EWOULDBLOCK &&
+         std::chrono::steady_clock::now() < end)
+    std::this_thread::sleep_for(std::chrono::milliseconds(1));
+}
+
+int writeAtPlace(SystemCalls& system, const Place& place, std::string_view bytes) {
+  const int folder = place.folder.number();
+  struct stat old {};
+  const bool replaces = ::fstatat(folder, place.name.c_str(), &old, AT_SYMLINK_NOFOLLOW) == 0 && S_ISREG(old.st_mode);
+  constexpr mode_t everyone = S_IRUSR | S_IWUSR | S_IRGRP | S_IWGRP | S_IROTH | S_IWOTH;
+  constexpr mode_t permissions = S_IRWXU | S_IRWXG | S_IRWXO;
+
+  TemporaryItem temporary(system, folder, place.name);
+  Descriptor file;
+  const int created = temporary.create([&](const std::string& name) {
+    file = Descriptor(
+        system.openAt(folder, name.c_str(), O_WRONLY | O_CREAT | O_EXCL, replaces ? S_IRUSR | S_IWUSR : everyone));
+    return file ? 0 : errno;
+  });
+  if (created != 0) return created;
+  if (const int error = writeAll(system, file.number(), bytes)) return error;
+  if (replaces && system.changeMode(file.number(), old.st_mode & permissions) != 0) return errno;
+  if (system.sync(file.number()) != 0) return errno;
+  if (system.close(file.release()) != 0) return errno;
+  if (const int error = temporary.replace()) return error;
+  return syncFolder(system, folder);
+}
+
 }  // namespace
 
 PosixFileManager::PosixFileManager(std::shared_ptr<SystemCalls> system) : _system(std::move(system)) {}
@@ -81,7 +130,7 @@ Result<FileAttributes> PosixFileManager::attributesOfItemAtPath(const fs::path& 
   attributes.size = static_cast<std::uint64_t>(status.st_size);
   attributes.modified =
       Date(std::chrono::duration_cast<Date::duration>(std::chrono::nanoseconds(nanoseconds(status.st_mtim))));
-  attributes.identity = {status.st_dev, status.st_ino, attributes.size, nanoseconds(status.st_ctim)};
+  attributes.identity = identityOf(status);
   return attributes;
 }
 
@@ -173,26 +222,17 @@ Result<std::string> PosixFileManager::readStart(const fs::path& path, std::size_
 Result<void> PosixFileManager::writeAtomically(const fs::path& path, std::string_view bytes) {
   Place place;
   if (const int error = openPlace(*_system, path, place)) return posixError(error, path);
-  const int folder = place.folder.number();
-  struct stat old {};
-  const bool replaces = ::fstatat(folder, place.name.c_str(), &old, AT_SYMLINK_NOFOLLOW) == 0 && S_ISREG(old.st_mode);
-  constexpr mode_t everyone = S_IRUSR | S_IWUSR | S_IRGRP | S_IWGRP | S_IROTH | S_IWOTH;
-  constexpr mode_t permissions = S_IRWXU | S_IRWXG | S_IRWXO;
+  return resultOf(writeAtPlace(*_system, place, bytes), path);
+}
 
-  TemporaryItem temporary(*_system, folder, place.name);
-  Descriptor file;
-  const int created = temporary.create([&](const std::string& name) {
-    file = Descriptor(
-        _system->openAt(folder, name.c_str(), O_WRONLY | O_CREAT | O_EXCL, replaces ? S_IRUSR | S_IWUSR : everyone));
-    return file ? 0 : errno;
-  });
-  if (created != 0) return posixError(created, path);
-  if (const int error = writeAll(*_system, file.number(), bytes)) return posixError(error, path);
-  if (replaces && _system->changeMode(file.number(), old.st_mode & permissions) != 0) return posixError(errno, path);
-  if (_system->sync(file.number()) != 0) return posixError(errno, path);
-  if (_system->close(file.release()) != 0) return posixError(errno, path);
-  if (const int error = temporary.replace()) return posixError(error, path);
-  return resultOf(syncFolder(*_system, folder), path);
+Result<FileIdentity> PosixFileManager::replaceAtomically(const fs::path& path, std::string_view bytes,
+                                                         const FileIdentity& replaced) {
+  Place place;
+  if (const int error = openPlace(*_system, path, place)) return posixError(error, path);
+  lockForAMoment(*_system, place.folder.number());  // given up with the descriptor
+  if (identityAt(*_system, place) != replaced) return changedMeanwhile(path);
+  if (const int error = writeAtPlace(*_system, place, bytes)) return posixError(error, path);
+  return identityAt(*_system, place);
 }
 
 }  // namespace quilt::platform

@@ -14,6 +14,8 @@ namespace quilt::platform {
 ///   negative number is that of the operating system's error; Quit gives -ECANCELED.
 /// - Synced before they return: writeAtomically, createDirectoryAtPath and moveItem; a move across file systems syncs
 ///   the copy before it deletes. Copies are not: their source is still there, and syncItem is at hand.
+/// - replaceAtomically has its folder to itself from the look to the end, among those that call it; where a folder
+///   cannot be locked, it only looks.
 /// - A lock file is deleted when its lock is given up.
 class PosixFileManager final : public FileManager {
  public:
@@ -35,7 +37,12 @@ class PosixFileManager final : public FileManager {
   [[nodiscard]] Result<std::string> readFile(const std::filesystem::path& path, std::uint64_t maximum) const override;
   [[nodiscard]] Result<std::string> readStart(const std::filesystem::path& path, std::size_t length) const override;
   Result<void> writeAtomically(const std::filesystem::path& path, std::string_view bytes) override;
+  Result<FileIdentity> replaceAtomically(const std::filesystem::path& path, std::string_view bytes,
+                                         const FileIdentity& replaced) override;
+  [[nodiscard]] std::string thisProcess() const override;
   Result<std::unique_ptr<FileLock>> lockFile(const std::filesystem::path& path, std::string_view owner) override;
+  Result<std::unique_ptr<FileLock>> shareLockFile(const std::filesystem::path& path,
+                                                  const std::function<void()>& afterKilled) override;
 
  private:
   Result<void> moveAcrossDisks(const std::filesystem::path& source, const std::filesystem::path& destination);

@@ -4,6 +4,7 @@
 #include <fcntl.h>
 #include <linux/fs.h>
 #include <linux/openat2.h>
+#include <sys/file.h>
 #include <sys/ioctl.h>
 #include <sys/stat.h>
 #include <sys/syscall.h>
@@ -65,6 +66,17 @@ int SystemCalls::truncate(int file, off_t size) {
 
 int SystemCalls::sync(int file) {
   return uninterrupted([&] { return ::fsync(file); });
+}
+
+int SystemCalls::setLock(int file, short kind) {
+  struct flock whole {};  // from 0 on, to wherever the file ends
+  whole.l_type = kind;
+  whole.l_whence = SEEK_SET;
+  return uninterrupted([&] { return ::fcntl(file, F_OFD_SETLK, &whole); });
+}
+
+int SystemCalls::setWholeLock(int file, int operation) {
+  return uninterrupted([&] { return ::flock(file, operation); });
 }
 
 int SystemCalls::changeMode(int file, mode_t mode) {

@@ -29,6 +29,11 @@ class SystemCalls {
   virtual int truncate(int file, off_t size);
   virtual int sync(int file);
 
+  /// fcntl's F_OFD_SETLK on the whole file: F_RDLCK, F_WRLCK or F_UNLCK. Never waits.
+  virtual int setLock(int file, short kind);
+  /// flock, of which LOCK_NB is the caller's to say.
+  virtual int setWholeLock(int file, int operation);
+
   virtual int changeMode(int file, mode_t mode);
   virtual int setTimes(int file, const timespec times[2]);
   virtual int setExtendedAttribute(int file, const char* name, const void* value, std::size_t size);

@@ -3,6 +3,7 @@
 
 #include <cstdint>
 #include <filesystem>
+#include <functional>
 #include <memory>
 #include <string>
 #include <string_view>
@@ -54,7 +55,8 @@ using CopyCallback = CopyAnswer (*)(int what, CopyStage stage, const CopyState& 
                                     const std::filesystem::path& source, const std::filesystem::path& destination,
                                     void* context);
 
-/// An exclusive lock on a file, given up by the destructor or the end of the process.
+/// A hold on a lock file, given up by the destructor or the end of the process. The last to give it up deletes the
+/// file.
 class QUILT_EXPORT FileLock {
  public:
   virtual ~FileLock() = default;
@@ -128,9 +130,35 @@ class QUILT_EXPORT FileManager {
   /// permissions of the file that it replaces.
   virtual Result<void> writeAtomically(const std::filesystem::path& path, std::string_view bytes) = 0;
 
-  /// Takes the lock without waiting, making the file when it is missing. `owner` is written into it for others to read.
-  /// Fails as Locked, with the holder's text in the message, while another process or lock holds it.
+  /// The state of a plain file; FileIdentity{} where there is none.
+  [[nodiscard]] FileIdentity stateOfFileAtPath(const std::filesystem::path& path) const;
+  /// writeAtomically, if the file at the path is still in the state `replaced` (stateOfFileAtPath's): Changed, and
+  /// nothing is written, when it is another. Answers the new state. Of several at once, in one process or several, each
+  /// sees what the one before it wrote, as far as the implementation can keep them apart; this one only looks before it
+  /// writes.
+  virtual Result<FileIdentity> replaceAtomically(const std::filesystem::path& path, std::string_view bytes,
+                                                 const FileIdentity& replaced);
+
+  /// What people know this process by: "process 12 on host". For the text in a lock.
+  [[nodiscard]] virtual std::string thisProcess() const { return "another process"; }
+
+  /// @{
+  /// Takes a lock without waiting, making its file when it is missing: for this holder alone, with `owner` in the file
+  /// for others to read, or shared with others. Locks by any way to the same file exclude each other, in one process
+  /// as between several, and on network file systems that lock, between machines. Locked, with the text of a sole
+  /// holder in the message and without the others, while it cannot be had; Unsupported when the file system does not
+  /// lock; Unsafe, and nothing is touched, when there is a link, a file of two names or anything else that is no lock
+  /// file in its place.
+  ///
+  /// Whom a shared lock finds alone with what a killed holder left runs `afterKilled` first, if given, with nobody
+  /// else holding the lock.
   virtual Result<std::unique_ptr<FileLock>> lockFile(const std::filesystem::path& path, std::string_view owner) = 0;
+  virtual Result<std::unique_ptr<FileLock>> shareLockFile(const std::filesystem::path& path,
+                                                          const std::function<void()>& afterKilled) = 0;
+  /// @}
 };
+
+/// The error of replaceAtomically, and of what is made of it, when somebody was faster.
+QUILT_EXPORT Error changedMeanwhile(const std::filesystem::path& path);
 
 }  // namespace quilt::platform

@@ -8,6 +8,7 @@
 #include "quilt/platform/base/Export.h"
 #include "quilt/platform/base/PropertyList.h"
 #include "quilt/platform/base/Result.h"
+#include "quilt/platform/interfaces/FileManager.h"
 
 namespace quilt::platform {
 
@@ -28,6 +29,11 @@ class QUILT_EXPORT PropertyLists {
 
   /// Replaces the file atomically.
   virtual Result<void> writeDictionary(const Dictionary& dictionary, const std::filesystem::path& path) = 0;
+
+  /// The same if the file is still in the state `replaced`; Changed when it is not. Answers the new state. As
+  /// FileManager::replaceAtomically.
+  virtual Result<FileIdentity> replaceDictionary(const Dictionary& dictionary, const std::filesystem::path& path,
+                                                 const FileIdentity& replaced);
 };
 
 }  // namespace quilt::platform

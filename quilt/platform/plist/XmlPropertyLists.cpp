@@ -52,4 +52,12 @@ Result<void> XmlPropertyLists::writeDictionary(const Dictionary& dictionary, con
   return notEnoughMemory(path);
 }
 
+Result<FileIdentity> XmlPropertyLists::replaceDictionary(const Dictionary& dictionary,
+                                                         const std::filesystem::path& path,
+                                                         const FileIdentity& replaced) try {
+  return services().files->replaceAtomically(path, writeXml(dictionary), replaced);
+} catch (const std::bad_alloc&) {
+  return notEnoughMemory(path);
+}
+
 }  // namespace quilt::platform

@@ -13,6 +13,8 @@ class XmlPropertyLists final : public PropertyLists {
   [[nodiscard]] std::string serialize(const PropertyList& value) const override;
   [[nodiscard]] Result<Dictionary> readDictionary(const std::filesystem::path& path) const override;
   Result<void> writeDictionary(const Dictionary& dictionary, const std::filesystem::path& path) override;
+  Result<FileIdentity> replaceDictionary(const Dictionary& dictionary, const std::filesystem::path& path,
+                                         const FileIdentity& replaced) override;
 };
 
 }  // namespace quilt::platform

@@ -87,4 +87,10 @@ Result<std::unique_ptr<FileLock>> FailNthFileManager::lockFile(const fs::path& p
   return ForwardingFileManager::lockFile(path, owner);
 }
 
+Result<std::unique_ptr<FileLock>> FailNthFileManager::shareLockFile(const fs::path& path,
+                                                                    const std::function<void()>& afterKilled) {
+  if (!admit(Which::Changes)) return error(path);
+  return ForwardingFileManager::shareLockFile(path, afterKilled);
+}
+
 }  // namespace quilt::platform

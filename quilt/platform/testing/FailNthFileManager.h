@@ -47,6 +47,8 @@ class FailNthFileManager final : public ForwardingFileManager {
   [[nodiscard]] Result<std::string> readFile(const std::filesystem::path& path, std::uint64_t maximum) const override;
   Result<void> writeAtomically(const std::filesystem::path& path, std::string_view bytes) override;
   Result<std::unique_ptr<FileLock>> lockFile(const std::filesystem::path& path, std::string_view owner) override;
+  Result<std::unique_ptr<FileLock>> shareLockFile(const std::filesystem::path& path,
+                                                  const std::function<void()>& afterKilled) override;
 
  private:
   bool admit(Which which) const;

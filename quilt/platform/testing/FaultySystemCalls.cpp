@@ -88,6 +88,14 @@ int FaultySystemCalls::truncate(int file, off_t size) {
 
 int FaultySystemCalls::sync(int file) { return admit(Call::Sync) ? SystemCalls::sync(file) : -1; }
 
+int FaultySystemCalls::setLock(int file, short kind) {
+  return admit(Call::Lock) ? SystemCalls::setLock(file, kind) : -1;
+}
+
+int FaultySystemCalls::setWholeLock(int file, int operation) {
+  return admit(Call::WholeLock) ? SystemCalls::setWholeLock(file, operation) : -1;
+}
+
 int FaultySystemCalls::changeMode(int file, mode_t mode) {
   return admit(Call::ChangeMode) ? SystemCalls::changeMode(file, mode) : -1;
 }

@@ -22,6 +22,8 @@ class FaultySystemCalls : public SystemCalls {
     CloneFile,
     Truncate,
     Sync,
+    Lock,       ///< the first way to lock
+    WholeLock,  ///< the other one
     ChangeMode,
     SetTimes,
     SetExtendedAttribute,
@@ -56,6 +58,8 @@ class FaultySystemCalls : public SystemCalls {
   int cloneFile(int from, int to) override;
   int truncate(int file, off_t size) override;
   int sync(int file) override;
+  int setLock(int file, short kind) override;
+  int setWholeLock(int file, int operation) override;
   int changeMode(int file, mode_t mode) override;
   int setTimes(int file, const timespec times[2]) override;
   int setExtendedAttribute(int file, const char* name, const void* value, std::size_t size) override;

@@ -55,8 +55,13 @@ class ForwardingFileManager : public FileManager {
   Result<void> writeAtomically(const std::filesystem::path& path, std::string_view bytes) override {
     return _target->writeAtomically(path, bytes);
   }
+  [[nodiscard]] std::string thisProcess() const override { return _target->thisProcess(); }
   Result<std::unique_ptr<FileLock>> lockFile(const std::filesystem::path& path, std::string_view owner) override {
     return _target->lockFile(path, owner);
+  }
+  Result<std::unique_ptr<FileLock>> shareLockFile(const std::filesystem::path& path,
+                                                  const std::function<void()>& afterKilled) override {
+    return _target->shareLockFile(path, afterKilled);
   }
 
  private:

@@ -2,6 +2,7 @@
 #include <fcntl.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -67,10 +68,10 @@ TEST_F(FileLockTest, IsRefusedWhileAnotherProcessHoldsIt) {
 
 TEST_F(FileLockTest, IsTakenOverWhenItsOwnerIsGone) {
   kill(startHolder("a much longer text, pid 123 on host"));
-  EXPECT_EQ("a much longer text, pid 123 on host", readPlainly(path));
+  EXPECT_EQ("quilt lock\na much longer text, pid 123 on host", readPlainly(path));
   const auto lock = files.lockFile(path, "me");
   ASSERT_TRUE(lock);
-  EXPECT_EQ("me", readPlainly(path));
+  EXPECT_EQ("quilt lock\nme", readPlainly(path));
 }
 
 TEST_F(FileLockTest, LeavesNoFileBehind) {
@@ -98,7 +99,7 @@ TEST_F(FileLockTest, HoldsThoughTheDiskIsTooFullForTheText) {
 TEST_F(FileLockTest, TellsWhetherItsLastHolderGaveItUp) {
   EXPECT_FALSE((*files.lockFile(path, "me"))->wasAbandoned());
   EXPECT_FALSE((*files.lockFile(path, "me"))->wasAbandoned());
-  support::writePlainly(path, "process 1 on a machine that lost power");
+  support::writePlainly(path, "quilt lock\nprocess 1 on a machine that lost power");
   EXPECT_TRUE((*files.lockFile(path, "me"))->wasAbandoned());
 }
 
@@ -128,8 +129,129 @@ class DeletedMeanwhile final : public SystemCalls {
 TEST_F(FileLockTest, IsNeverTakenOnAFileThatIsGone) {
   const auto lock = PosixFileManager(std::make_shared<DeletedMeanwhile>()).lockFile(path, "me");
   ASSERT_TRUE(lock);
-  EXPECT_EQ("me", readPlainly(path));
+  EXPECT_EQ("quilt lock\nme", readPlainly(path));
   EXPECT_FALSE(files.lockFile(path, "you"));
+}
+
+TEST_F(FileLockTest, SeveralShareItAndNobodyGetsItAloneMeanwhile) {
+  auto one = files.shareLockFile(path, nullptr);
+  auto other = files.shareLockFile(path, nullptr);
+  ASSERT_TRUE(one && other);
+  const auto refused = files.lockFile(path, "me");
+  ASSERT_FALSE(refused);
+  EXPECT_EQ("It is in use by another program", refused.error().text);
+  one->reset();
+  EXPECT_FALSE(files.lockFile(path, "me"));
+  other->reset();
+  EXPECT_THAT(namesIn(scratch.path()), IsEmpty());
+  EXPECT_TRUE(files.lockFile(path, "me"));
+}
+
+TEST_F(FileLockTest, NobodySharesWhatOneHasAlone) {
+  const pid_t holder = startHolder("pid 123 on host");
+  const auto shared = files.shareLockFile(path, nullptr);
+  ASSERT_FALSE(shared);
+  EXPECT_EQ("It is in use by pid 123 on host", shared.error().text);
+  kill(holder);
+  EXPECT_TRUE(files.shareLockFile(path, nullptr));
+}
+
+TEST_F(FileLockTest, WhoSharesWhatAKilledHolderLeftClearsUpAloneFirst) {
+  kill(startHolder("pid 123 on host"));
+  bool wasAlone = false;
+  const auto lock = files.shareLockFile(path, [&] { wasAlone = !files.lockFile(path, "you"); });
+  ASSERT_TRUE(lock);
+  EXPECT_TRUE(wasAlone);
+  EXPECT_TRUE((*lock)->wasAbandoned());
+  bool again = false;
+  EXPECT_TRUE(files.shareLockFile(path, [&again] { again = true; }));
+  EXPECT_FALSE(again) << "the first still shares it";
+}
+
+// What lies in the lock's place, and must lie there afterwards, untouched.
+class FileLockPlaceTest : public FileLockTest {
+ protected:
+  void expectRefused(ErrorKind kind) {
+    for (const auto& lock : {files.lockFile(path, "me").hasValue(), files.shareLockFile(path, nullptr).hasValue()})
+      EXPECT_FALSE(lock);
+    EXPECT_EQ(kind, files.lockFile(path, "me").error().kind);
+  }
+};
+
+TEST_F(FileLockPlaceTest, AForeignFileIsNotOverwritten) {
+  support::writePlainly(path, "somebody's notes");
+  expectRefused(ErrorKind::Unsafe);
+  EXPECT_EQ("somebody's notes", readPlainly(path));
+}
+
+TEST_F(FileLockPlaceTest, NorIsAFileOfTwoNames) {
+  support::writePlainly(scratch / "precious", "quilt lock\nkept");
+  std::filesystem::create_hard_link(scratch / "precious", path);
+  expectRefused(ErrorKind::Unsafe);
+  EXPECT_EQ("quilt lock\nkept", readPlainly(scratch / "precious"));
+  EXPECT_TRUE(std::filesystem::exists(path));
+}
+
+TEST_F(FileLockPlaceTest, APipeIsNotWaitedForAndAFolderStays) {
+  ASSERT_EQ(0, mkfifo(path.c_str(), 0600));
+  expectRefused(ErrorKind::Unsafe);
+  std::filesystem::remove(path);
+  std::filesystem::create_directory(path);
+  expectRefused(ErrorKind::Unsafe);
+  EXPECT_TRUE(std::filesystem::is_directory(path));
+}
+
+// As network file systems answer without a lock service, and old kernels to the first way of locking.
+class FileLockSupportTest : public FileLockTest {
+ protected:
+  using Call = FaultySystemCalls::Call;
+  const std::shared_ptr<FaultySystemCalls> system = std::make_shared<FaultySystemCalls>();
+  PosixFileManager faulty{system};
+};
+
+TEST_F(FileLockSupportTest, WithoutLocksItSaysSoAndLeavesNothing) {
+  for (const int error : {ENOLCK, EOPNOTSUPP, ENOSYS}) {
+    system->failEvery(Call::Lock, error);
+    const auto lock = faulty.lockFile(path, "me");
+    ASSERT_FALSE(lock);
+    EXPECT_EQ(ErrorKind::Unsupported, lock.error().kind);
+    EXPECT_THAT(lock.error().text, ::testing::HasSubstr("does not support locks"));
+    EXPECT_FALSE(faulty.shareLockFile(path, nullptr));
+    EXPECT_THAT(namesIn(scratch.path()), IsEmpty());
+  }
+}
+
+TEST_F(FileLockSupportTest, TheOtherWayServesWhereThereIsNoFirst) {
+  system->failEvery(Call::Lock, EINVAL);
+  {
+    const auto lock = faulty.lockFile(path, "me");
+    ASSERT_TRUE(lock);
+    EXPECT_EQ("It is in use by me", faulty.lockFile(path, "you").error().text);
+  }
+  {
+    const auto one = faulty.shareLockFile(path, nullptr);
+    const auto other = faulty.shareLockFile(path, nullptr);
+    EXPECT_TRUE(one && other);
+    EXPECT_FALSE(faulty.lockFile(path, "me"));
+  }
+  EXPECT_THAT(namesIn(scratch.path()), IsEmpty());
+}
+
+TEST_F(FileLockSupportTest, AnErrorOfTheDiskIsToldAsOne) {
+  system->failEvery(Call::Lock, EIO);
+  EXPECT_EQ(ErrorKind::InputOutput, faulty.lockFile(path, "me").error().kind);
+}
+
+TEST(FileLockThreadTest, ManyShareItAndTheLastLeavesNothing) {
+  const ScratchFolder scratch;
+  PosixFileManager files;
+  std::vector<std::thread> threads;
+  for (int t = 0; t < 4; ++t)
+    threads.emplace_back([&] {
+      for (int i = 0; i < 300; ++i) EXPECT_TRUE(files.shareLockFile(scratch / "lock", nullptr)) << i;
+    });
+  for (std::thread& thread : threads) thread.join();
+  EXPECT_THAT(namesIn(scratch.path()), IsEmpty());
 }
 
 TEST(FileLockThreadTest, OneHolderAtATime) {
